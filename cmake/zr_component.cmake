@@ -1,0 +1,40 @@
+# How every target of the project is built: language level, warnings as errors, sanitizers, and one
+# library a folder that links exactly what the folder may include.
+
+find_package(Threads REQUIRED)
+
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+
+add_library(zr_build_flags INTERFACE)
+target_compile_options(zr_build_flags INTERFACE -Wall -Wextra -Wpedantic -Werror)
+target_include_directories(zr_build_flags INTERFACE "${PROJECT_SOURCE_DIR}")
+target_link_libraries(zr_build_flags INTERFACE Threads::Threads)
+if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+  target_compile_options(zr_build_flags INTERFACE -Wthread-safety)
+endif()
+if(ZR_SANITIZER)
+  target_compile_options(zr_build_flags INTERFACE
+    -fsanitize=${ZR_SANITIZER} -fno-sanitize-recover=all -fno-omit-frame-pointer)
+  target_link_options(zr_build_flags INTERFACE -fsanitize=${ZR_SANITIZER})
+endif()
+if(ZR_BUILD_FUZZ)
+  target_compile_options(zr_build_flags INTERFACE -fsanitize=fuzzer-no-link)
+endif()
+if(ZR_COVERAGE)
+  target_compile_options(zr_build_flags INTERFACE --coverage)
+  target_link_options(zr_build_flags INTERFACE --coverage)
+endif()
+
+# zr_component(NAME SHARED|STATIC SOURCES file... [USES target...] [PRIVATE_USES target...])
+# A library of this folder. USES are the folders that its headers show; PRIVATE_USES stay inside.
+function(zr_component name type)
+  cmake_parse_arguments(PARSE_ARGV 2 arg "" "" "SOURCES;USES;PRIVATE_USES")
+  add_library(${name} ${type} ${arg_SOURCES})
+  target_link_libraries(${name} PUBLIC zr_build_flags ${arg_USES} PRIVATE ${arg_PRIVATE_USES})
+  if(type STREQUAL "SHARED")
+    set_target_properties(${name} PROPERTIES OUTPUT_NAME "zr_${name}")
+  endif()
+endfunction()

@@ -1,0 +1,40 @@
+// The display framebuffer service and the device registry, as far as the display's power state
+// needs them.
+#ifndef ZR_PLATFORM_DISPLAY_H
+#define ZR_PLATFORM_DISPLAY_H
+
+#include <cstdint>
+#include <string_view>
+
+#include "platform/value.h"
+
+namespace platform {
+
+using DisplayId = std::uint32_t;
+using RegistryObject = std::uint32_t;  // 0 is the empty object
+
+// Any thread.
+class DisplayService {
+  public:
+    virtual ~DisplayService() = default;
+
+    // Stores the main display in `display` and returns 0; on failure returns another status and
+    // leaves `display` alone.
+    virtual int mainDisplay(DisplayId& display) = 0;
+
+    // The registry object behind the display's frame buffer; the empty object when there is none.
+    virtual RegistryObject registryObject(DisplayId display) = 0;
+};
+
+// Any thread.
+class DeviceRegistry {
+  public:
+    virtual ~DeviceRegistry() = default;
+
+    // The object's property of that name; a Value that holds nothing when there is none.
+    virtual Value property(RegistryObject object, std::string_view name) = 0;
+};
+
+}  // namespace platform
+
+#endif

@@ -1,0 +1,82 @@
+// A mutex whose uses clang's thread-safety analysis checks, its scoped lock and its condition.
+//
+// Fields say which mutex guards them with ZR_GUARDED_BY; functions that need it held with
+// ZR_REQUIRES. Under other compilers the annotations are nothing.
+#ifndef ZR_PLATFORM_MUTEX_H
+#define ZR_PLATFORM_MUTEX_H
+
+#include <chrono>
+#include <condition_variable>
+#include <mutex>
+
+#if defined(__clang__)
+#define ZR_THREAD_ANNOTATION(x) __attribute__((x))
+#else
+#define ZR_THREAD_ANNOTATION(x)
+#endif
+#define ZR_CAPABILITY(name) ZR_THREAD_ANNOTATION(capability(name))
+#define ZR_SCOPED_CAPABILITY ZR_THREAD_ANNOTATION(scoped_lockable)
+#define ZR_GUARDED_BY(mutex) ZR_THREAD_ANNOTATION(guarded_by(mutex))
+#define ZR_REQUIRES(mutex) ZR_THREAD_ANNOTATION(requires_capability(mutex))
+#define ZR_ACQUIRE(...) ZR_THREAD_ANNOTATION(acquire_capability(__VA_ARGS__))
+#define ZR_RELEASE(...) ZR_THREAD_ANNOTATION(release_capability(__VA_ARGS__))
+
+namespace platform {
+
+class ZR_CAPABILITY("mutex") Mutex {
+  public:
+    Mutex() = default;
+    Mutex(const Mutex&) = delete;
+    Mutex& operator=(const Mutex&) = delete;
+
+    void lock() ZR_ACQUIRE() { _mutex.lock(); }
+    void unlock() ZR_RELEASE() { _mutex.unlock(); }
+
+  private:
+    friend class Condition;
+    std::mutex _mutex;
+};
+
+class ZR_SCOPED_CAPABILITY MutexLock {
+  public:
+    explicit MutexLock(Mutex& mutex) ZR_ACQUIRE(mutex) : _mutex(mutex) { _mutex.lock(); }
+    ~MutexLock() ZR_RELEASE() { _mutex.unlock(); }
+    MutexLock(const MutexLock&) = delete;
+    MutexLock& operator=(const MutexLock&) = delete;
+
+  private:
+    Mutex& _mutex;
+};
+
+// Waits give the mutex up and hold it again when they return; they may wake for no reason.
+class Condition {
+  public:
+    void wait(Mutex& mutex) ZR_REQUIRES(mutex) {
+        Held held(mutex._mutex);
+        _condition.wait(held.lock);
+    }
+    // Waits until notified or `deadline`; the clock's last time point means no limit.
+    void waitUntil(Mutex& mutex, std::chrono::steady_clock::time_point deadline)
+        ZR_REQUIRES(mutex) {
+        Held held(mutex._mutex);
+        if (deadline == std::chrono::steady_clock::time_point::max()) {
+            _condition.wait(held.lock);
+        } else {
+            _condition.wait_until(held.lock, deadline);
+        }
+    }
+    void notifyAll() { _condition.notify_all(); }
+
+  private:
+    // Lends an already locked mutex to the standard library and takes it back still locked.
+    struct Held {
+        explicit Held(std::mutex& mutex) : lock(mutex, std::adopt_lock) {}
+        ~Held() { lock.release(); }
+        std::unique_lock<std::mutex> lock;
+    };
+    std::condition_variable _condition;
+};
+
+}  // namespace platform
+
+#endif

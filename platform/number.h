@@ -1,0 +1,129 @@
+// Number: a boxed numeric value that keeps the kind it was made with.
+//
+// Parameters, capture metadata and result values travel as numbers. A number is a small value:
+// copy it. It may be absent; an absent number reads as zero in every conversion.
+//
+// Conversions are total, so that no input from a device or a host can be undefined behaviour:
+//   integer or boolean to an integer of width n   modulo 2^n, as C converts between integers
+//   floating point to an integer                  truncated toward zero, saturated at the target's
+//                                                 limits; NaN gives 0
+//   anything to double                            the nearest double
+#ifndef ZR_PLATFORM_NUMBER_H
+#define ZR_PLATFORM_NUMBER_H
+
+#include <bit>
+#include <concepts>
+#include <cstdint>
+#include <limits>
+#include <string>
+#include <type_traits>
+
+namespace platform {
+
+template <class T>
+concept Arithmetic = std::is_arithmetic_v<T> && sizeof(T) <= 8;
+
+class Number {
+  public:
+    enum class Kind : std::uint8_t {
+        Absent,
+        Boolean,
+        Int8,
+        Int16,
+        Int32,
+        Int64,
+        UInt8,
+        UInt16,
+        UInt32,
+        UInt64,
+        Float,
+        Double,
+    };
+
+    // An absent number.
+    constexpr Number() noexcept = default;
+
+    // Boxes `value` and keeps its kind. Implicit: a plain value serves wherever a number is asked.
+    template <Arithmetic T>
+    constexpr Number(T value) noexcept : _bits(_bitsOf(value)), _kind(kindOf<T>()) {}
+
+    constexpr Kind kind() const noexcept { return _kind; }
+    constexpr bool isPresent() const noexcept { return _kind != Kind::Absent; }
+    constexpr bool isFloating() const noexcept { return _kind >= Kind::Float; }
+    constexpr bool isSigned() const noexcept { return _kind >= Kind::Int8 && _kind <= Kind::Int64; }
+
+    // The value as an integer of type T, converted as the table above says.
+    template <std::integral T>
+        requires(!std::same_as<T, bool>)
+    constexpr T as() const noexcept {
+        return isFloating() ? _saturated<T>(std::bit_cast<double>(_bits)) : static_cast<T>(_bits);
+    }
+
+    constexpr double asDouble() const noexcept {
+        if (isFloating()) {
+            return std::bit_cast<double>(_bits);
+        }
+        return isSigned() ? static_cast<double>(static_cast<std::int64_t>(_bits))
+                          : static_cast<double>(_bits);
+    }
+
+    // Truth value: any present number other than zero, NaN included.
+    constexpr bool isTrue() const noexcept { return isFloating() ? asDouble() != 0.0 : _bits != 0; }
+
+    // Plain decimal for integers, 1 and 0 for booleans, the shortest text that reads back to the
+    // same value for floating point, "(null)" when absent.
+    std::string text() const;
+
+    // Same kind and same value; a NaN equals nothing, absent equals absent.
+    friend constexpr bool operator==(const Number& a, const Number& b) noexcept {
+        return a._kind == b._kind && (a.isFloating() ? a.asDouble() == b.asDouble()  //
+                                                     : a._bits == b._bits);
+    }
+
+    template <Arithmetic T>
+    static constexpr Kind kindOf() noexcept {
+        if constexpr (std::same_as<std::remove_cv_t<T>, bool>) {
+            return Kind::Boolean;
+        } else if constexpr (std::floating_point<T>) {
+            return sizeof(T) == 4 ? Kind::Float : Kind::Double;
+        } else {
+            constexpr Kind kFirst = std::is_signed_v<T> ? Kind::Int8 : Kind::UInt8;
+            return static_cast<Kind>(static_cast<int>(kFirst) + std::countr_zero(sizeof(T)));
+        }
+    }
+
+  private:
+    template <class T>
+    static constexpr std::uint64_t _bitsOf(T value) noexcept {
+        if constexpr (std::floating_point<T>) {
+            return std::bit_cast<std::uint64_t>(static_cast<double>(value));
+        } else {
+            return static_cast<std::uint64_t>(value);
+        }
+    }
+
+    template <class T>
+    static constexpr T _saturated(double value) noexcept {
+        using Limits = std::numeric_limits<T>;
+        constexpr double kPastMax = 2.0 * static_cast<double>(T{1} << (Limits::digits - 1));
+        if (value != value) {
+            return 0;
+        }
+        if (value >= kPastMax) {
+            return Limits::max();
+        }
+        if (value <= static_cast<double>(Limits::min())) {
+            return Limits::min();
+        }
+        return static_cast<T>(value);
+    }
+
+    // Integers: two's complement, extended to 64 bits. Floating point: the bits of a double, which
+    // holds every float exactly.
+    std::uint64_t _bits = 0;
+    Kind _kind = Kind::Absent;
+};
+
+}  // namespace platform
+
+#endif

@@ -1,0 +1,114 @@
+// RunLoop: one thread's loop over event sources.
+//
+// A thread that wants one asks for it with forThisThread(). Any thread may signal a source; only the
+// loop's own thread runs it. Sources and observers belong to modes; a run serves one mode, and also
+// what was added in kRunLoopCommonModes, of which kRunLoopDefaultMode is a member.
+//
+// Owner    The thread's storage holds the loop until the thread ends; others may hold references
+//          longer. Sources and observers are shared: the loop holds them while they are added.
+// Threads  forThisThread(), current(), run(): the loop's own thread. Everything else: any thread.
+//          Callbacks and observers run on the loop's thread, with no lock held; they may add and
+//          remove sources and observers, signal, stop, and run the loop again (a nested run).
+// Failure  An exception that leaves a callback or an observer leaves run(), after the exit
+//          observers were told.
+#ifndef ZR_PLATFORM_RUN_LOOP_H
+#define ZR_PLATFORM_RUN_LOOP_H
+
+#include <atomic>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <string_view>
+#include <vector>
+
+namespace platform {
+
+inline constexpr std::string_view kRunLoopDefaultMode = "platform.run-loop.default";
+inline constexpr std::string_view kRunLoopCommonModes = "platform.run-loop.common";
+
+// What a run loop is about to do, as flag bits; observers choose by a mask of them.
+enum RunLoopActivity : std::uint32_t {
+    RunLoopEntry = 1U << 0,
+    RunLoopBeforeSources = 1U << 2,
+    RunLoopBeforeWaiting = 1U << 5,
+    RunLoopAfterWaiting = 1U << 6,
+    RunLoopExit = 1U << 7,
+    RunLoopAllActivities = 0x0FFFFFFFU,
+};
+
+// How a run ended.
+enum class RunLoopOutcome {
+    Finished,  // the mode had no source (left)
+    Stopped,   // stop() was called
+    TimedOut,  // the time limit passed
+};
+
+class RunLoop;
+
+// A source: a callback that the loop runs once for a signal. Signals given before it runs are one.
+class RunLoopSource {
+  public:
+    explicit RunLoopSource(std::function<void()> callback);
+    ~RunLoopSource();
+    RunLoopSource(const RunLoopSource&) = delete;
+    RunLoopSource& operator=(const RunLoopSource&) = delete;
+
+    // Asks every loop that the source was added to, to run it. Kept until a run serves it, also when
+    // the source was not added yet.
+    void signal();
+
+  private:
+    friend class RunLoop;
+    class Wakers;
+    std::function<void()> _callback;
+    // Set by any thread, taken by the loop's.
+    std::atomic<bool> _signalled{false};
+    std::unique_ptr<Wakers> _wakers;
+};
+
+// An observer: told every activity of its mask, each time. Observers of one activity are told in
+// rising `order`, equal ones as they were added.
+struct RunLoopObserver {
+    std::uint32_t activities;
+    int order;
+    std::function<void(std::uint32_t activity)> callback;
+};
+
+class RunLoop {
+  public:
+    // The calling thread's loop; made by the first call on a thread.
+    static std::shared_ptr<RunLoop> forThisThread();
+    // The calling thread's loop, or null when the thread never asked for one.
+    static std::shared_ptr<RunLoop> current();
+
+    ~RunLoop();
+    RunLoop(const RunLoop&) = delete;
+    RunLoop& operator=(const RunLoop&) = delete;
+
+    // Adding twice in one mode, or removing what is not there, does nothing. A source that is removed
+    // is not run any more; a callback in progress finishes.
+    void addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode);
+    void removeSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode);
+    void addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
+    void removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
+
+    // Serves the mode for at most `seconds`: each signalled source once a turn, in the order added,
+    // then waits for the next signal. Ends at the first of: a stop, no source in the mode, the time
+    // limit. Sources that are ready when the run begins get one turn even with a limit of zero.
+    // A negative limit or NaN counts as zero; one beyond the clock's end means no limit.
+    // Observers are told the entry and the exit of every run, however it ends.
+    RunLoopOutcome run(std::string_view mode, double seconds);
+
+    // Ends the innermost run in progress as soon as the callback in progress returns; no further
+    // source is run before. Without a run in progress it does nothing.
+    void stop();
+
+  private:
+    RunLoop();
+    class State;
+    std::shared_ptr<State> _state;
+};
+
+}  // namespace platform
+
+#endif

@@ -1,0 +1,36 @@
+// The set of operating-system and device services that the process works with.
+//
+// Whoever starts the process installs it (the bench: its simulated device; a product: the real
+// ones), before any experiment runs. The operations of the support library's classes find their
+// facility here; a facility that is null counts as not available.
+#ifndef ZR_PLATFORM_SERVICES_H
+#define ZR_PLATFORM_SERVICES_H
+
+#include <memory>
+
+class WLISPCapturePlugIn;
+
+namespace platform {
+
+class DeviceRegistry;
+class DisplayService;
+class HidFacility;
+class MeterixFacility;
+
+struct Services {
+    std::shared_ptr<WLISPCapturePlugIn> capture;
+    std::shared_ptr<MeterixFacility> meterix;
+    std::shared_ptr<HidFacility> hid;
+    std::shared_ptr<DisplayService> display;
+    std::shared_ptr<DeviceRegistry> registry;
+};
+
+// Replaces the installed set. Any thread; what runs on the old set keeps it alive and goes on.
+void installServices(Services services);
+
+// The installed set. Any thread.
+Services services();
+
+}  // namespace platform
+
+#endif

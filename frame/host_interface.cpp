@@ -37,9 +37,8 @@ namespace {
 template <class Registry>
 auto findEntry(const Registry& registry, std::string_view name) {
     using Entry = typename Registry::value_type;
-    const auto found = std::find_if(registry.begin(), registry.end(), [name](const auto& entry) {
-        return entry.first == name;
-    });
+    const auto found = std::find_if(registry.begin(), registry.end(),
+                                    [name](const auto& entry) { return entry.first == name; });
     using Found = std::optional<typename Entry::second_type>;
     return found != registry.end() ? Found(found->second) : Found();
 }
@@ -60,9 +59,8 @@ void addEntry(Registry& registry,
 template <class Registry>
 std::vector<std::string> namesOf(const Registry& registry) {
     std::vector<std::string> names;
-    std::transform(registry.begin(), registry.end(), std::back_inserter(names), [](const auto& e) {
-        return e.first;
-    });
+    std::transform(registry.begin(), registry.end(), std::back_inserter(names),
+                   [](const auto& e) { return e.first; });
     return names;
 }
 
@@ -82,9 +80,7 @@ void ZRLab::addDiagnosticWithName(std::string_view name,
                                   std::string_view summary,
                                   std::string_view experimentName,
                                   std::string_view analysisName) {
-    Diagnostic diagnostic{std::string(name),
-                          std::string(summary),
-                          std::string(experimentName),
+    Diagnostic diagnostic{std::string(name), std::string(summary), std::string(experimentName),
                           std::string(analysisName)};
     const platform::MutexLock lock(_mutex);
     addEntry(_diagnostics, _refusals, "diagnostic", name, std::move(diagnostic));

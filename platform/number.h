@@ -54,8 +54,7 @@ class Number {
 
     // The value as an integer of type T, converted as the table above says.
     template <std::integral T>
-        requires(!std::same_as<T, bool>)
-    constexpr T as() const noexcept {
+    requires(!std::same_as<T, bool>) constexpr T as() const noexcept {
         return isFloating() ? _saturated<T>(std::bit_cast<double>(_bits)) : static_cast<T>(_bits);
     }
 

@@ -61,11 +61,8 @@ constexpr Placeholder readPlaceholder(std::string_view text) {
         Conversion conversion;
     };
     constexpr Known kKnown[] = {
-        {"%%", Conversion::Percent},
-        {"%@", Conversion::Object},
-        {"%d", Conversion::Signed},
-        {"%lu", Conversion::Unsigned},
-        {"%lf", Conversion::Double},
+        {"%%", Conversion::Percent},   {"%@", Conversion::Object},  {"%d", Conversion::Signed},
+        {"%lu", Conversion::Unsigned}, {"%lf", Conversion::Double},
     };
     for (const Known& known : kKnown) {
         if (text.starts_with(known.text)) {

@@ -1,6 +1,5 @@
 #include "simulator/meterix_facility.h"
 
-#include <algorithm>
 #include <atomic>
 #include <unordered_map>
 #include <utility>
@@ -63,21 +62,12 @@ class SimulatedMeterix final : public platform::MeterixFacility {
             if (start.isPresent() && channel.count().isPresent()) {
                 rise = channel.count().as<std::int64_t>() - start.as<std::int64_t>();
             }
-            // The samples share their descriptions with the report, which this object owns.
-            samples->emplace_back(WLMeterixChannel(_shared(channel.channelDescription()), rise));
+            samples->emplace_back(WLMeterixChannel(channel.sharedDescription(), rise));
         }
         return samples;
     }
 
   private:
-    WLMeterixChannelDescriptionRef _shared(const WLMeterixChannelDescription& description) const {
-        const auto known = std::find_if(_all->begin(), _all->end(), [&description](const auto& one) {
-            return one.get() == &description;
-        });
-        return known != _all->end() ? *known
-                                    : std::make_shared<WLMeterixChannelDescription>(description);
-    }
-
     platform::Number _countOf(const WLMeterixChannelDescription* description) const {
         const auto known = _channelOf.find(description);
         if (known == _channelOf.end() || !known->second->count.has_value()) {

@@ -9,8 +9,8 @@ namespace simulator {
 
 // Written by the capture threads, read by whoever takes a snapshot of the counters.
 struct StreamProgress {
-    std::atomic<std::uint64_t> frames{0};         // frames delivered since the device was made
-    std::atomic<std::uint64_t> microseconds{0};   // device time spent streaming, over all frames
+    std::atomic<std::uint64_t> frames{0};        // frames delivered since the device was made
+    std::atomic<std::uint64_t> microseconds{0};  // device time spent streaming, over all frames
 };
 
 }  // namespace simulator

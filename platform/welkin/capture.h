@@ -81,10 +81,8 @@ inline constexpr std::string_view kRylCaptureStreamVideoOutputHandlerKey_EventHa
     "ryl.output.event-handler";
 
 // Keys of the error counters: counts since the stream was started.
-inline constexpr std::string_view kRylCaptureStreamPropertyValue_I2CErrorCount =
-    "ryl.errors.i2c";
-inline constexpr std::string_view kRylCaptureStreamPropertyValue_MIPIErrorCount =
-    "ryl.errors.mipi";
+inline constexpr std::string_view kRylCaptureStreamPropertyValue_I2CErrorCount = "ryl.errors.i2c";
+inline constexpr std::string_view kRylCaptureStreamPropertyValue_MIPIErrorCount = "ryl.errors.mipi";
 
 // The attachment of a delivered buffer that holds the frame's metadata dictionary, and the two
 // metadata keys that are the service's own.

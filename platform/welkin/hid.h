@@ -40,15 +40,15 @@ class WLIOHIDDeviceInterface {
 
     // Sends a feature report; `data` begins with the report ID. On failure it may supply an error.
     virtual bool setFeatureReportWithID(std::int64_t reportID,
-                                  std::span<const std::byte> data,
-                                  platform::ErrorSlot error) = 0;
+                                        std::span<const std::byte> data,
+                                        platform::ErrorSlot error) = 0;
 
     // Starts and stops the delivery of callbacks on the run loop in the mode. Stopping what was not
     // started does nothing.
     virtual void scheduleWithRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
-                          std::string_view mode) = 0;
+                                     std::string_view mode) = 0;
     virtual void unscheduleFromRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
-                            std::string_view mode) = 0;
+                                       std::string_view mode) = 0;
 
     // Closes the device; false when it was not open or could not be closed.
     virtual bool close(platform::ErrorSlot error) = 0;

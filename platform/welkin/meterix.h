@@ -47,6 +47,8 @@ class WLMeterixChannel {
         : _description(std::move(description)), _count(count) {}
 
     const WLMeterixChannelDescription& channelDescription() const { return *_description; }
+    // The same, for a facility that makes another channel of it.
+    const WLMeterixChannelDescriptionRef& sharedDescription() const { return _description; }
     // The channel's value in the snapshot; absent when the channel has no count.
     const platform::Number& count() const { return _count; }
 

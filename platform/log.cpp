@@ -1,8 +1,8 @@
 #include "platform/log.h"
 
-#include <syslog.h>
-
 #include <atomic>
+
+#include <syslog.h>
 
 #include "platform/mutex.h"
 
@@ -13,14 +13,9 @@ namespace {
 class SystemLogSink final : public LogSink {
   public:
     void write(const LogLine& line) override {
-        syslog(_priority(line.level),
-               "[%.*s:%.*s] %.*s",
-               static_cast<int>(line.subsystem.size()),
-               line.subsystem.data(),
-               static_cast<int>(line.category.size()),
-               line.category.data(),
-               static_cast<int>(line.message.size()),
-               line.message.data());
+        syslog(_priority(line.level), "[%.*s:%.*s] %.*s", static_cast<int>(line.subsystem.size()),
+               line.subsystem.data(), static_cast<int>(line.category.size()), line.category.data(),
+               static_cast<int>(line.message.size()), line.message.data());
     }
 
   private:

@@ -31,31 +31,16 @@ Utc split(std::chrono::system_clock::time_point moment) {
 std::string Date::text() const {
     const Utc utc = split(_moment);
     char buffer[64];
-    std::snprintf(buffer,
-                  sizeof buffer,
-                  "%04d-%02u-%02u %02d:%02d:%02d +0000",
-                  utc.year,
-                  utc.month,
-                  utc.day,
-                  utc.hour,
-                  utc.minute,
-                  utc.second);
+    std::snprintf(buffer, sizeof buffer, "%04d-%02u-%02u %02d:%02d:%02d +0000", utc.year, utc.month,
+                  utc.day, utc.hour, utc.minute, utc.second);
     return buffer;
 }
 
 std::string Date::timestamp() const {
     const Utc utc = split(_moment);
     char buffer[64];
-    std::snprintf(buffer,
-                  sizeof buffer,
-                  "%04d-%02u-%02uT%02d:%02d:%02d.%03dZ",
-                  utc.year,
-                  utc.month,
-                  utc.day,
-                  utc.hour,
-                  utc.minute,
-                  utc.second,
-                  utc.millisecond);
+    std::snprintf(buffer, sizeof buffer, "%04d-%02u-%02uT%02d:%02d:%02d.%03dZ", utc.year, utc.month,
+                  utc.day, utc.hour, utc.minute, utc.second, utc.millisecond);
     return buffer;
 }
 

@@ -1,0 +1,16 @@
+#include "simulator/device.h"
+
+namespace simulator {
+
+platform::Services makeDevice(const DeviceProfile& profile,
+                              double speed,
+                              const std::weak_ptr<Observer>& observer) {
+    const auto progress = std::make_shared<StreamProgress>();
+    return {.capture = makeCapturePlugIn(profile.capture, speed, progress, observer),
+            .meterix = makeMeterixFacility(profile.meterix, progress),
+            .hid = makeHidFacility(profile.hid, speed, observer),
+            .display = makeDisplayService(profile.display),
+            .registry = makeDeviceRegistry(profile.display)};
+}
+
+}  // namespace simulator

@@ -34,6 +34,9 @@ struct MeterixProfile {
     Fault difference;
 };
 
+// The counters of a device without faults.
+MeterixProfile healthyMeterix();
+
 // Any thread. The difference leaves a count absent when either snapshot lacks it, and counts a
 // channel that the baseline does not have from zero.
 std::shared_ptr<platform::MeterixFacility> makeMeterixFacility(

@@ -1,8 +1,8 @@
 // RunLoop: one thread's loop over event sources.
 //
 // A thread that wants one asks for it with forThisThread(). Any thread may signal a source; only the
-// loop's own thread runs it. Sources and observers belong to modes; a run serves one mode, and also
-// what was added in kRunLoopCommonModes, of which kRunLoopDefaultMode is a member.
+// loop's own thread runs it. Sources and observers belong to modes, and a run serves one mode. The
+// common modes have one member, kRunLoopDefaultMode: either name stands for the other.
 //
 // Owner    The thread's storage holds the loop until the thread ends; others may hold references
 //          longer. Sources and observers are shared: the loop holds them while they are added.
@@ -53,8 +53,9 @@ class RunLoopSource {
     RunLoopSource(const RunLoopSource&) = delete;
     RunLoopSource& operator=(const RunLoopSource&) = delete;
 
-    // Asks every loop that the source was added to, to run it. Kept until a run serves it, also when
-    // the source was not added yet.
+    // Asks the loops that the source was added to to run it; the first to come does. Kept until a run
+    // serves it, also when the source was not added yet. What the caller did before is visible to the
+    // callback.
     void signal();
 
   private:
@@ -67,7 +68,7 @@ class RunLoopSource {
 };
 
 // An observer: told every activity of its mask, each time. Observers of one activity are told in
-// rising `order`, equal ones as they were added.
+// rising `order`, equal ones as they were added. Constant while it is added to a loop.
 struct RunLoopObserver {
     std::uint32_t activities;
     int order;
@@ -92,11 +93,14 @@ class RunLoop {
     void addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
     void removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
 
-    // Serves the mode for at most `seconds`: each signalled source once a turn, in the order added,
-    // then waits for the next signal. Ends at the first of: a stop, no source in the mode, the time
-    // limit. Sources that are ready when the run begins get one turn even with a limit of zero.
+    // Serves the mode for at most `seconds`. A turn runs each signalled source once, in the order
+    // added; what it adds waits for the next. When no source is ready after a turn, the loop waits for
+    // the next signal, and a turn follows. Ends before and after a turn when there was a stop, else
+    // when the mode has no source; after a turn also when the time has passed. So sources that are
+    // ready when the run begins get one turn even with a limit of zero.
     // A negative limit or NaN counts as zero; one beyond the clock's end means no limit.
-    // Observers are told the entry and the exit of every run, however it ends.
+    // Observers are told the entry and the exit of every run, however it ends; between them before
+    // each turn, and before and after each wait.
     RunLoopOutcome run(std::string_view mode, double seconds);
 
     // Ends the innermost run in progress as soon as the callback in progress returns; no further
@@ -104,6 +108,7 @@ class RunLoop {
     void stop();
 
   private:
+    friend class RunLoopSource;
     RunLoop();
     class State;
     std::shared_ptr<State> _state;

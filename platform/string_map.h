@@ -46,7 +46,10 @@ class StringMap {
     auto begin() const { return _entries.begin(); }
     auto end() const { return _entries.end(); }
 
-    friend bool operator==(const StringMap&, const StringMap&) = default;
+    // Written out: clang looks into T for a defaulted one, and T may be incomplete here.
+    friend bool operator==(const StringMap& a, const StringMap& b) {
+        return a._entries == b._entries;
+    }
 
   private:
     static bool _before(const Entry& entry, std::string_view key) { return entry.first < key; }

@@ -10,6 +10,8 @@
 // Cost     A queue without items has no thread. The thread starts with the first item and ends when
 //          the queue is empty and nobody holds it. All delayed items of the process wait on one
 //          further thread, which exists while there are any.
+// Failure  Queueing throws std::system_error when a thread is needed and there is none to be had; the
+//          item is then dropped. For a delayed item whose time has come that ends the process.
 // Exit     Neither a queued nor a delayed item keeps the process from exiting.
 #ifndef ZR_PLATFORM_WORK_QUEUE_H
 #define ZR_PLATFORM_WORK_QUEUE_H
@@ -23,9 +25,9 @@ namespace platform {
 
 class WorkQueue {
   public:
-    // How eagerly the operating system should run the thread. Where it grants no better priority
-    // (Linux without the right to raise it), UserInteractive runs as any other thread does;
-    // Background always yields to both.
+    // How eagerly the operating system should run the thread: at nice -5, or at nice 10. Without the
+    // right to raise a priority UserInteractive stays at that of the thread which queued the item
+    // that started it.
     enum class Priority { UserInteractive, Background };
 
     // An item owns what it captured; that is released right after it ran, on the queue's thread. An
@@ -49,6 +51,7 @@ class WorkQueue {
 
   private:
     class State;
+    class Timer;
     std::shared_ptr<State> _state;
 };
 

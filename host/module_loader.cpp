@@ -1,0 +1,46 @@
+#include "host/module_loader.h"
+
+#include <filesystem>
+#include <system_error>
+
+#include <dlfcn.h>
+
+#include "frame/host_interface.h"
+
+namespace host {
+
+namespace {
+
+std::size_t registeredCount() {
+    const ZRLab& lab = ZRLab::defaultLab();
+    return lab.experimentNames().size() + lab.analysisNames().size() + lab.diagnostics().size() +
+           lab.refusals().size();
+}
+
+}  // namespace
+
+std::optional<std::string> loadModule(const std::string& path) {
+    std::error_code noStatus;
+    const auto status = std::filesystem::status(path, noStatus);
+    if (!std::filesystem::exists(status)) {
+        return "plug-in module " + path + ": no such file";
+    }
+    if (!std::filesystem::is_regular_file(status)) {
+        return "plug-in module " + path + ": not a file";
+    }
+    // An absolute path keeps the loader from searching its own folders.
+    const std::string absolute = std::filesystem::absolute(path).string();
+    if (dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NOLOAD) != nullptr) {
+        return std::nullopt;
+    }
+    const std::size_t before = registeredCount();
+    if (dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
+        return "plug-in module " + path + ": cannot be loaded: " + dlerror();
+    }
+    if (registeredCount() == before) {
+        return "plug-in module " + path + ": it registers nothing";
+    }
+    return std::nullopt;
+}
+
+}  // namespace host

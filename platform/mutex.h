@@ -20,6 +20,8 @@
 #define ZR_REQUIRES(mutex) ZR_THREAD_ANNOTATION(requires_capability(mutex))
 #define ZR_ACQUIRE(...) ZR_THREAD_ANNOTATION(acquire_capability(__VA_ARGS__))
 #define ZR_RELEASE(...) ZR_THREAD_ANNOTATION(release_capability(__VA_ARGS__))
+#define ZR_TRY_ACQUIRE(...) ZR_THREAD_ANNOTATION(try_acquire_capability(__VA_ARGS__))
+#define ZR_RETURNS_MUTEX(mutex) ZR_THREAD_ANNOTATION(lock_returned(mutex))
 
 namespace platform {
 
@@ -31,6 +33,7 @@ class ZR_CAPABILITY("mutex") Mutex {
 
     void lock() ZR_ACQUIRE() { _mutex.lock(); }
     void unlock() ZR_RELEASE() { _mutex.unlock(); }
+    bool tryLock() ZR_TRY_ACQUIRE(true) { return _mutex.try_lock(); }
 
   private:
     friend class Condition;

@@ -1,0 +1,105 @@
+#include "host/terminal.h"
+
+#include <cerrno>
+#include <chrono>
+#include <csignal>
+#include <cstdlib>
+#include <thread>
+
+#include <pthread.h>
+#include <unistd.h>
+
+namespace host {
+
+namespace {
+
+constexpr std::string_view kClearLine = "\r\x1b[K";
+
+bool writeWhole(int file, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = ::write(file, text.data(), text.size());
+        if (written < 0 && errno == EINTR) {
+            continue;
+        }
+        if (written < 0) {
+            return false;
+        }
+        text.remove_prefix(static_cast<std::size_t>(written));
+    }
+    return true;
+}
+
+std::string_view environment(const char* name) {
+    const char* value = std::getenv(name);
+    return value != nullptr ? value : "";
+}
+
+}  // namespace
+
+Terminal::Terminal() : _errorIsTerminal(isatty(STDERR_FILENO) == 1) {}
+
+Terminal& Terminal::shared() {
+    static Terminal& terminal = *new Terminal;
+    return terminal;
+}
+
+void Terminal::endOnInterrupt() {
+    sigset_t signals;
+    sigemptyset(&signals);
+    sigaddset(&signals, SIGINT);
+    sigaddset(&signals, SIGTERM);
+    pthread_sigmask(SIG_BLOCK, &signals, nullptr);  // inherited by every thread started from now on
+    std::signal(SIGPIPE, SIG_IGN);                  // output() reports it
+    std::thread([this, signals] {
+        int signal = 0;
+        sigwait(&signals, &signal);
+        // A writer whose reader has stalled must not hold the program up for long.
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(500);
+        bool held = _mutex.tryLock();
+        while (!held && std::chrono::steady_clock::now() < deadline) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+            held = _mutex.tryLock();
+        }
+        if (_errorIsTerminal) {
+            writeWhole(STDERR_FILENO, kClearLine);
+        }
+        _exit(128 + signal);
+    }).detach();
+}
+
+bool Terminal::outputTakesColour(Colour asked) {
+    if (asked != Colour::Automatic) {
+        return asked == Colour::Always;
+    }
+    return isatty(STDOUT_FILENO) == 1 && environment("NO_COLOR").empty() &&
+           environment("TERM") != "dumb";
+}
+
+bool Terminal::output(std::string_view text) {
+    const platform::MutexLock lock(_mutex);
+    if (_statusShown) {
+        writeWhole(STDERR_FILENO, kClearLine);
+        _statusShown = false;
+    }
+    return writeWhole(STDOUT_FILENO, text);
+}
+
+void Terminal::line(std::string_view text) {
+    const platform::MutexLock lock(_mutex);
+    std::string whole(_statusShown ? kClearLine : "");
+    whole += text;
+    whole += '\n';
+    _statusShown = false;
+    writeWhole(STDERR_FILENO, whole);
+}
+
+void Terminal::status(std::string_view text) {
+    const platform::MutexLock lock(_mutex);
+    if (!_errorIsTerminal || (text.empty() && !_statusShown)) {
+        return;
+    }
+    writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(text));
+    _statusShown = !text.empty();
+}
+
+}  // namespace host

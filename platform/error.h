@@ -6,6 +6,7 @@
 #ifndef ZR_PLATFORM_ERROR_H
 #define ZR_PLATFORM_ERROR_H
 
+#include <concepts>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -47,7 +48,11 @@ class Error {
 
 // The result of an operation that failed: converts to whatever the operation returns for failure.
 struct Failure {
-    operator bool() const { return false; }
+    // To bool and to nothing that a bool converts to: an optional number would hold a zero.
+    template <std::same_as<bool> T>
+    operator T() const {
+        return false;
+    }
     template <class T>
     operator std::shared_ptr<T>() const {
         return nullptr;

@@ -1,0 +1,99 @@
+#include "platform/log.h"
+
+#include <atomic>
+#include <thread>
+#include <vector>
+
+#include <gmock/gmock.h>
+
+#include "platform/mutex.h"
+
+namespace {
+
+using platform::Log;
+using platform::LogLevel;
+using platform::LogLine;
+
+class RecordingSink final : public platform::LogSink {
+  public:
+    void write(const LogLine& line) override {
+        const platform::MutexLock lock(_mutex);
+        _lines.push_back(std::string(line.subsystem) + ':' + std::string(line.category) + ' ' +
+                         std::to_string(static_cast<int>(line.level)) + ' ' +
+                         std::string(line.message));
+    }
+    std::vector<std::string> lines() {
+        const platform::MutexLock lock(_mutex);
+        return _lines;
+    }
+
+  private:
+    platform::Mutex _mutex;
+    std::vector<std::string> _lines ZR_GUARDED_BY(_mutex);
+};
+
+class LogTest : public ::testing::Test {
+  protected:
+    ~LogTest() override { platform::setLogSink(nullptr, LogLevel::Default); }
+};
+
+TEST_F(LogTest, ComputesAMessageOnlyWhenItsLevelIsOn) {
+    constexpr LogLevel kLevels[] = {LogLevel::Debug, LogLevel::Default, LogLevel::Error};
+    const Log log("sub.system", "category");
+    for (const LogLevel minimum : kLevels) {
+        const auto sink = std::make_shared<RecordingSink>();
+        platform::setLogSink(sink, minimum);
+        std::vector<std::string> expected;
+        int computed = 0;
+        for (const LogLevel level : kLevels) {
+            EXPECT_EQ(Log::isEnabled(level), level >= minimum);
+            log.write(level, [&] { return "line " + std::to_string(++computed); });
+            if (level >= minimum) {
+                expected.push_back("sub.system:category " +
+                                   std::to_string(static_cast<int>(level)) + " line " +
+                                   std::to_string(expected.size() + 1));
+            }
+        }
+        EXPECT_EQ(sink->lines(), expected);
+        EXPECT_EQ(computed, static_cast<int>(expected.size()));
+    }
+}
+
+// Counts lines, and notices a line that reaches it after its end.
+class CountingSink final : public platform::LogSink {
+  public:
+    explicit CountingSink(std::atomic<int>& lines) : _lines(lines) {}
+    ~CountingSink() override { _alive = false; }
+    void write(const LogLine& line) override {
+        _lines += _alive && line.message == "a line" ? 1 : 0;
+    }
+
+  private:
+    std::atomic<int>& _lines;
+    bool _alive = true;
+};
+
+TEST_F(LogTest, LosesNoLineWhenItsSinkIsReplacedMeanwhile) {
+    constexpr int kThreads = 3;
+    constexpr int kLinesEach = 2000;
+    std::atomic<int> received = 0;
+    std::atomic<int> running = kThreads;
+    platform::setLogSink(std::make_shared<CountingSink>(received), LogLevel::Default);
+    std::vector<std::jthread> threads;
+    for (int i = 0; i < kThreads; ++i) {
+        threads.emplace_back([&running] {
+            const Log log("sub.system", "category");
+            for (int line = 0; line < kLinesEach; ++line) {
+                log.write(LogLevel::Error, [] { return "a line"; });
+            }
+            --running;
+        });
+    }
+    while (running > 0) {
+        platform::setLogSink(std::make_shared<CountingSink>(received), LogLevel::Default);
+    }
+    threads.clear();
+    EXPECT_EQ(received, kThreads * kLinesEach);
+}
+
+}  // namespace

@@ -1,0 +1,340 @@
+#include "platform/run_loop.h"
+
+#include <atomic>
+#include <bit>
+#include <chrono>
+#include <ctime>
+#include <functional>
+#include <limits>
+#include <map>
+#include <stdexcept>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+namespace {
+
+using platform::kRunLoopCommonModes;
+using platform::kRunLoopDefaultMode;
+using platform::RunLoop;
+using platform::RunLoopObserver;
+using platform::RunLoopOutcome;
+using platform::RunLoopSource;
+
+using enum RunLoopOutcome;
+
+constexpr double kForever = std::numeric_limits<double>::infinity();
+constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
+
+// A thread's loop on which everything that happens is written down: a letter for a source that runs,
+// '<' entry, '.' before a turn, 'w' before a wait, 'W' after it, '>' exit.
+struct Script {
+    const std::shared_ptr<RunLoop> loop = RunLoop::forThisThread();
+    std::map<char, std::shared_ptr<RunLoopSource>> sources;
+    std::string events;
+
+    // Adds a source of this name.
+    void source(char name,
+                const std::function<void()>& callback = nullptr,
+                std::string_view mode = kRunLoopDefaultMode) {
+        sources[name] = std::make_shared<RunLoopSource>([this, name, callback] {
+            events += name;
+            if (callback) {
+                callback();
+            }
+        });
+        loop->addSource(sources[name], mode);
+    }
+    // The same, ready when the run begins.
+    void ready(char name,
+               const std::function<void()>& callback = nullptr,
+               std::string_view mode = kRunLoopDefaultMode) {
+        source(name, callback, mode);
+        sources[name]->signal();
+    }
+    void remove(char name) { loop->removeSource(sources[name], kRunLoopDefaultMode); }
+    auto stopping() {
+        return [this] { loop->stop(); };
+    }
+    // Adds an observer that on `activities` does `act`.
+    void on(std::uint32_t activities, const std::function<void()>& act, int order = 0) {
+        observe(
+            activities, [act](std::uint32_t) { act(); }, order);
+    }
+    std::shared_ptr<RunLoopObserver> observe(std::uint32_t activities,
+                                             std::function<void(std::uint32_t)> callback,
+                                             int order = 0,
+                                             std::string_view mode = kRunLoopDefaultMode) {
+        auto made = std::make_shared<RunLoopObserver>(
+            RunLoopObserver{activities, order, std::move(callback)});
+        loop->addObserver(made, mode);
+        return made;
+    }
+    void writeDownActivities(std::string_view mode) {
+        observe(
+            platform::RunLoopAllActivities,
+            [this](std::uint32_t activity) {
+                constexpr char kLetters[] = "<-.--wW>";
+                events += kLetters[std::countr_zero(activity)];
+            },
+            -10, mode);
+    }
+};
+
+// Runs `body` on a thread of its own, and so on a loop of its own.
+void onNewThread(const std::function<void()>& body) {
+    std::jthread thread(body);
+}
+
+struct Row {
+    const char* name;
+    std::function<void(Script&)> prepare;
+    double seconds;
+    RunLoopOutcome outcome;
+    const char* events;
+};
+
+class ScriptedRunLoop : public ::testing::TestWithParam<Row> {};
+
+TEST_P(ScriptedRunLoop, DoesWhatTheScriptSays) {
+    onNewThread([] {
+        Script script;
+        script.writeDownActivities(kRunLoopCommonModes);
+        GetParam().prepare(script);
+        EXPECT_EQ(script.loop->run(kRunLoopDefaultMode, GetParam().seconds), GetParam().outcome);
+        EXPECT_EQ(script.events, GetParam().events);
+    });
+}
+
+const Row kRows[] = {
+    {"NoSource", [](Script&) {}, kForever, Finished, "<>"},
+    {"SourceOfAnotherMode", [](Script& s) { s.ready('a', {}, "other"); }, kForever, Finished, "<>"},
+    {"NothingReadyAndNoTime", [](Script& s) { s.source('a'); }, 0, TimedOut, "<.>"},
+    {"ReadyAndNoTime", [](Script& s) { s.ready('a'); }, 0, TimedOut, "<.a>"},
+    {"ReadyAndNegativeTime", [](Script& s) { s.ready('a'); }, -kForever, TimedOut, "<.a>"},
+    {"ReadyAndNanTime", [](Script& s) { s.ready('a'); }, kNan, TimedOut, "<.a>"},
+    {"InTheOrderAdded", [](Script& s) { s.ready('b'), s.source('x'), s.ready('a'); }, 0, TimedOut,
+     "<.ba>"},
+    {"SignalledTwice", [](Script& s) { s.ready('a'), s.sources['a']->signal(); }, 0, TimedOut,
+     "<.a>"},
+    {"AddedTwiceAndRemovedOnce",
+     [](Script& s) {
+         s.ready('a');
+         s.loop->addSource(s.sources['a'], kRunLoopCommonModes);
+         s.remove('a');
+     },
+     0, Finished, "<>"},
+    {"SignalledBeforeItIsAdded",
+     [](Script& s) {
+         s.source('a');
+         s.remove('a'), s.remove('a');
+         s.sources['a']->signal();
+         s.loop->addSource(s.sources['a'], kRunLoopCommonModes);
+     },
+     0, TimedOut, "<.a>"},
+    {"KeptByARunThatEndsBefore",
+     [](Script& s) {
+         s.ready('a', s.stopping()), s.ready('b');
+         s.loop->run(kRunLoopDefaultMode, kForever);
+     },
+     0, TimedOut, "<.a><.b>"},
+    {"SignalsItself", [](Script& s) { s.ready('a', [&s] { s.sources['a']->signal(); }); }, 0,
+     TimedOut, "<.a>"},
+    {"SignalsAnotherOfTheTurnAndANewOne",
+     [](Script& s) {
+         s.ready('a', [&s] { s.sources['b']->signal(), s.ready('c', s.stopping()); });
+         s.source('b');
+     },
+     kForever, Stopped, "<.ab.c>"},
+    {"RemovesAnother", [](Script& s) { s.ready('a', [&s] { s.remove('b'); }), s.ready('b'); }, 0,
+     TimedOut, "<.a>"},
+    {"RemovesTheLastOne", [](Script& s) { s.ready('a', [&s] { s.remove('a'); }); }, 0, Finished,
+     "<.a>"},
+    {"StopsAndRemovesTheLastOne",
+     [](Script& s) { s.ready('a', [&s] { s.loop->stop(), s.remove('a'); }); }, 0, Stopped, "<.a>"},
+    {"StoppedBeforeTheRun", [](Script& s) { s.loop->stop(), s.ready('a'); }, 0, TimedOut, "<.a>"},
+    {"StoppedAtItsEntry", [](Script& s) { s.on(platform::RunLoopEntry, s.stopping()); }, kForever,
+     Stopped, "<>"},
+    {"StoppedBeforeTheTurn",
+     [](Script& s) { s.ready('a'), s.on(platform::RunLoopBeforeSources, s.stopping()); }, kForever,
+     Stopped, "<.>"},
+    {"SignalledBeforeTheWait",
+     [](Script& s) {
+         s.source('a', s.stopping());
+         s.on(platform::RunLoopBeforeWaiting, [&s] { s.sources['a']->signal(); });
+     },
+     1e300, Stopped, "<.wW.a>"},
+    {"SignalledFromAnotherThread",
+     [](Script& s) {
+         s.source('a', s.stopping());
+         s.on(platform::RunLoopBeforeWaiting,
+              [&s] { std::thread([a = s.sources['a']] { a->signal(); }).detach(); });
+     },
+     kForever, Stopped, "<.wW.a>"},
+    {"StoppedFromAnotherThread",
+     [](Script& s) {
+         s.source('a');
+         s.on(platform::RunLoopBeforeWaiting,
+              [&s] { std::thread([loop = s.loop] { loop->stop(); }).detach(); });
+     },
+     kForever, Stopped, "<.wW>"},
+    {"RemovedFromAnotherThread",
+     [](Script& s) {
+         s.source('a');
+         s.on(platform::RunLoopBeforeWaiting, [&s] {
+             std::thread([loop = s.loop, a = s.sources['a']] {
+                 loop->removeSource(a, kRunLoopDefaultMode);
+             }).detach();
+         });
+     },
+     kForever, Finished, "<.wW>"},
+    {"ANestedRunTakesTheStop",
+     [](Script& s) {
+         s.writeDownActivities("inner");
+         s.ready('c', s.stopping(), "inner");
+         s.ready('a', [&s] { EXPECT_EQ(s.loop->run("inner", kForever), Stopped); });
+         s.ready('b', s.stopping());
+     },
+     kForever, Stopped, "<.a<.c>b>"},
+    {"ANestedRunOfTheSameMode",
+     [](Script& s) {
+         s.ready('a', [&s] { EXPECT_EQ(s.loop->run(kRunLoopDefaultMode, 0), TimedOut); });
+         s.ready('b');
+     },
+     0, TimedOut, "<.a<.b>>"},
+    {"ObserversByOrder",
+     [](Script& s) {
+         const auto write = [&s](char letter) { return [&s, letter] { s.events += letter; }; };
+         s.on(platform::RunLoopEntry, write('3'), 2);
+         s.on(platform::RunLoopEntry | platform::RunLoopExit, write('1'), 1);
+         s.on(platform::RunLoopEntry, write('2'), 1);
+     },
+     0, Finished, "<123>1"},
+};
+
+INSTANTIATE_TEST_SUITE_P(, ScriptedRunLoop, ::testing::ValuesIn(kRows), [](const auto& info) {
+    return info.param.name;
+});
+
+TEST(RunLoop, TellsTheExitWhenACallbackOrAnObserverThrows) {
+    onNewThread([] {
+        Script script;
+        script.writeDownActivities(kRunLoopDefaultMode);
+        script.ready('a', [] { throw std::runtime_error("callback"); });
+        EXPECT_THROW(script.loop->run(kRunLoopDefaultMode, 0), std::runtime_error);
+        const auto observer = script.observe(
+            platform::RunLoopEntry, [](std::uint32_t) { throw std::logic_error("observer"); });
+        EXPECT_THROW(script.loop->run(kRunLoopDefaultMode, 0), std::logic_error);
+        script.loop->removeObserver(observer, kRunLoopDefaultMode);
+        script.loop->stop();  // no run is left in progress that it could reach
+        EXPECT_EQ(script.loop->run(kRunLoopDefaultMode, 0), TimedOut);
+        EXPECT_EQ(script.events, "<.a><><.>");
+    });
+}
+
+TEST(RunLoop, WaitsForItsTimeLimitWithoutWork) {
+    onNewThread([] {
+        constexpr double kLimit = 0.2;
+        Script script;
+        script.source('a');
+        int waits = 0;
+        script.on(platform::RunLoopBeforeWaiting, [&waits] { ++waits; });
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_EQ(script.loop->run(kRunLoopDefaultMode, kLimit), TimedOut);
+        EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::duration<double>(kLimit));
+        EXPECT_LE(waits, 1);
+        timespec used{};
+        clock_gettime(CLOCK_THREAD_CPUTIME_ID, &used);
+        EXPECT_LT(static_cast<double>(used.tv_sec) + static_cast<double>(used.tv_nsec) * 1e-9,
+                  kLimit / 4);
+    });
+}
+
+TEST(RunLoop, BelongsToTheThreadThatAskedForIt) {
+    std::shared_ptr<RunLoop> kept;
+    const auto source = std::make_shared<RunLoopSource>([] {});
+    onNewThread([&] {
+        EXPECT_EQ(RunLoop::current(), nullptr);
+        kept = RunLoop::forThisThread();
+        EXPECT_EQ(RunLoop::current(), kept);
+        EXPECT_EQ(RunLoop::forThisThread(), kept);
+        onNewThread([] { EXPECT_EQ(RunLoop::current(), nullptr); });
+        kept->addSource(source, kRunLoopDefaultMode);
+        kept->addSource(source, "other");
+    });
+    source->signal();
+    EXPECT_EQ(source.use_count(), 3);
+    kept.reset();
+    EXPECT_EQ(source.use_count(), 1);
+    source->signal();
+}
+
+// Each signaller waits until its signal was served before it gives the next: one that is lost, or
+// that does not show what was done before it, hangs.
+TEST(RunLoop, LosesNoSignalOfManyThreads) {
+    constexpr int kSignallers = 3;
+    constexpr int kSignals = 2000;
+    const auto loop = RunLoop::forThisThread();
+    std::atomic<int> finished = 0;
+    const auto end = std::make_shared<RunLoopSource>([&] {
+        if (finished == kSignallers) {
+            loop->stop();
+        }
+    });
+    loop->addSource(end, kRunLoopDefaultMode);
+    struct Signaller {
+        int given = 0;  // no atomic: the signal and its answer are what orders the accesses
+        std::atomic<int> served = 0;
+    };
+    Signaller signallers[kSignallers];
+    std::vector<std::jthread> threads;
+    for (Signaller& self : signallers) {
+        threads.emplace_back([&] {
+            const auto source = std::make_shared<RunLoopSource>([&self] {
+                self.served = self.given;
+                self.served.notify_one();
+            });
+            for (int signal = 1; signal <= kSignals; ++signal) {
+                if (signal % 100 == 1) {
+                    loop->removeSource(source, kRunLoopDefaultMode);
+                    loop->addSource(source, kRunLoopDefaultMode);
+                }
+                self.given = signal;
+                source->signal();
+                self.served.wait(signal - 1);
+            }
+            loop->removeSource(source, kRunLoopDefaultMode);
+            ++finished;
+            end->signal();
+        });
+    }
+    EXPECT_EQ(loop->run(kRunLoopDefaultMode, kForever), Stopped);
+    threads.clear();
+    loop->removeSource(end, kRunLoopDefaultMode);
+    EXPECT_EQ(loop->run(kRunLoopDefaultMode, kForever), Finished);
+}
+
+TEST(RunLoop, MayEndWhileItsSourcesAreSignalled) {
+    std::atomic<bool> over = false;
+    std::atomic<int> served = 0;
+    const auto source = std::make_shared<RunLoopSource>([&] { ++served; });
+    std::jthread signaller([&] {
+        while (!over) {
+            source->signal();
+        }
+    });
+    for (int i = 0; i < 100; ++i) {
+        onNewThread([&] {
+            const auto loop = RunLoop::forThisThread();
+            loop->addSource(source, kRunLoopDefaultMode);
+            loop->run(kRunLoopDefaultMode, 0);
+        });
+    }
+    over = true;
+    signaller.join();
+    EXPECT_GT(served, 0);
+}
+
+}  // namespace

@@ -1,0 +1,160 @@
+#include "platform/value.h"
+
+#include <cmath>
+#include <limits>
+
+#include <gtest/gtest.h>
+
+namespace {
+
+using platform::Dictionary;
+using platform::List;
+using platform::MutableDictionary;
+using platform::Number;
+using platform::Value;
+using Kind = platform::Number::Kind;
+
+constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
+constexpr double kInfinity = std::numeric_limits<double>::infinity();
+constexpr std::int64_t kMin64 = std::numeric_limits<std::int64_t>::min();
+constexpr std::int64_t kMax64 = std::numeric_limits<std::int64_t>::max();
+constexpr std::uint64_t kMaxU64 = std::numeric_limits<std::uint64_t>::max();
+
+TEST(Number, KeepsItsKindAndConvertsTotally) {
+    constexpr std::int32_t kMin32 = std::numeric_limits<std::int32_t>::min();
+    constexpr std::int32_t kMax32 = std::numeric_limits<std::int32_t>::max();
+    constexpr std::uint32_t kMaxU32 = std::numeric_limits<std::uint32_t>::max();
+    const struct {
+        Number number;
+        Kind kind;
+        std::uint16_t u16;
+        std::int32_t i32;
+        std::uint32_t u32;
+        std::int64_t i64;
+        std::uint64_t u64;
+        double real;
+        const char* text;
+    } rows[] = {
+        {{}, Kind::Absent, 0, 0, 0, 0, 0, 0, "(null)"},
+        {true, Kind::Boolean, 1, 1, 1, 1, 1, 1, "1"},
+        {std::int8_t{-1}, Kind::Int8, 65535, -1, kMaxU32, -1, kMaxU64, -1, "-1"},
+        {std::int16_t{-32768}, Kind::Int16, 32768, -32768, 0xFFFF8000, -32768, kMaxU64 - 32767,
+         -32768, "-32768"},
+        {65536, Kind::Int32, 0, 65536, 65536, 65536, 65536, 65536, "65536"},
+        {kMin64, Kind::Int64, 0, 0, 0, kMin64, 1ULL << 63, -0x1p63, "-9223372036854775808"},
+        {std::uint8_t{255}, Kind::UInt8, 255, 255, 255, 255, 255, 255, "255"},
+        {std::uint16_t{65535}, Kind::UInt16, 65535, 65535, 65535, 65535, 65535, 65535, "65535"},
+        {0x80000000U, Kind::UInt32, 0, kMin32, 0x80000000U, 0x80000000, 0x80000000, 0x1p31,
+         "2147483648"},
+        {kMaxU64, Kind::UInt64, 65535, -1, kMaxU32, -1, kMaxU64, 0x1p64, "18446744073709551615"},
+        {0.1F, Kind::Float, 0, 0, 0, 0, 0, 0.1F, "0.1"},
+        {-1.9, Kind::Double, 0, -1, 0, -1, 0, -1.9, "-1.9"},
+        {65535.9, Kind::Double, 65535, 65535, 65535, 65535, 65535, 65535.9, "65535.9"},
+        {2147483648.0, Kind::Double, 65535, kMax32, 0x80000000U, 0x80000000, 0x80000000, 0x1p31,
+         "2147483648"},
+        {0x1p63, Kind::Double, 65535, kMax32, kMaxU32, kMax64, 1ULL << 63, 0x1p63,
+         "9223372036854775808"},
+        {0x1p64, Kind::Double, 65535, kMax32, kMaxU32, kMax64, kMaxU64, 0x1p64,
+         "18446744073709551616"},
+        {kInfinity, Kind::Double, 65535, kMax32, kMaxU32, kMax64, kMaxU64, kInfinity, "inf"},
+        {-kInfinity, Kind::Double, 0, kMin32, 0, kMin64, 0, -kInfinity, "-inf"},
+        {1e300, Kind::Double, 65535, kMax32, kMaxU32, kMax64, kMaxU64, 1e300, "1e+300"},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.text);
+        EXPECT_EQ(row.number.kind(), row.kind);
+        EXPECT_EQ(row.number.as<std::uint16_t>(), row.u16);
+        EXPECT_EQ(row.number.as<std::int32_t>(), row.i32);
+        EXPECT_EQ(row.number.as<std::uint32_t>(), row.u32);
+        EXPECT_EQ(row.number.as<std::int64_t>(), row.i64);
+        EXPECT_EQ(row.number.as<std::uint64_t>(), row.u64);
+        EXPECT_EQ(row.number.asDouble(), row.real);
+        EXPECT_EQ(row.number.isTrue(), row.real != 0);
+        EXPECT_EQ(row.number.text(), row.text);
+        EXPECT_EQ(row.number, Number(row.number));
+    }
+}
+
+TEST(Number, NanIsZeroAsAnIntegerTrueAndEqualToNothing) {
+    const Number nan(kNan);
+    EXPECT_EQ(nan.as<std::int64_t>(), 0);
+    EXPECT_EQ(nan.as<std::uint8_t>(), 0);
+    EXPECT_TRUE(std::isnan(nan.asDouble()));
+    EXPECT_TRUE(nan.isTrue());
+    EXPECT_FALSE(nan == nan);
+    EXPECT_EQ(nan.text(), "nan");
+}
+
+TEST(Number, EqualityIsByKindToo) {
+    EXPECT_NE(Number(1), Number(1U));
+    EXPECT_NE(Number(1), Number(1.0));
+    EXPECT_NE(Number(1.0F), Number(1.0));
+    EXPECT_NE(Number(), Number(0));
+    EXPECT_EQ(Number(0.0), Number(-0.0));
+}
+
+TEST(Value, YieldsNothingForWhatItDoesNotHold) {
+    const Dictionary inner{{"count", 5}, {"name", "x"}};
+    const Dictionary outer{{"inner", inner}, {"list", List{1, "two"}}};
+    const Value value(outer);
+
+    EXPECT_EQ(value["inner"]["count"].asNumber(), Number(5));
+    EXPECT_FALSE(value["inner"]["count"]["deeper"].isPresent());
+    EXPECT_FALSE(value["missing"]["count"].isPresent());
+    EXPECT_FALSE(value["list"]["count"].isPresent());
+    EXPECT_FALSE(Value()["count"].isPresent());
+    EXPECT_FALSE(Value(Number()).isPresent());
+    EXPECT_EQ(value["inner"]["name"].number(), nullptr);
+    EXPECT_EQ(value["inner"]["count"].string(), nullptr);
+    EXPECT_EQ(value["list"].dictionary(), nullptr);
+    EXPECT_EQ(value.list(), nullptr);
+    EXPECT_FALSE(inner.number("name").isPresent());
+    EXPECT_FALSE(inner.number("missing").isPresent());
+    EXPECT_TRUE(Dictionary().empty());
+    EXPECT_TRUE(List().empty());
+    EXPECT_EQ(List().begin(), List().end());
+}
+
+TEST(Value, CarriesAnObjectOfTheCallersType) {
+    struct Handler {
+        int id;
+    };
+    const Value value = Value::opaque(Handler{7});
+    const Value copy = value;
+    ASSERT_NE(copy.object<Handler>(), nullptr);
+    EXPECT_EQ(copy.object<Handler>()->id, 7);
+    EXPECT_EQ(copy.object<int>(), nullptr);
+    EXPECT_EQ(Value(7).object<Handler>(), nullptr);
+    EXPECT_EQ(copy, value);
+    EXPECT_NE(copy, Value::opaque(Handler{7}));
+}
+
+TEST(Value, EqualityLooksIntoListsAndDictionaries) {
+    const auto make = [](auto leaf) {
+        return Value(Dictionary{{"a", List{1, leaf}}, {"b", "text"}});
+    };
+    EXPECT_EQ(make(2), make(2));
+    EXPECT_NE(make(2), make(2U));
+    EXPECT_NE(make(2), make("2"));
+    EXPECT_NE(make(2), Value());
+    EXPECT_EQ(Value("text"), Value(std::string("text")));
+}
+
+TEST(Dictionary, IsSortedByKeyAndTheLastValueOfAKeyHolds) {
+    MutableDictionary growing;
+    for (const char* key : {"b", "", "ab", "B", "\xC3\xA9", "a", "b"}) {
+        growing.set(key, static_cast<int>(growing.size()));
+    }
+    const Dictionary dictionary(growing);
+    growing.set("later", 1);  // a copy was taken
+    std::string keys;
+    for (const auto& [key, value] : dictionary.entries()) {
+        keys += key + ',';
+    }
+    EXPECT_EQ(keys, ",B,a,ab,b,\xC3\xA9,");
+    EXPECT_EQ(dictionary["b"], Value(6));
+    EXPECT_TRUE(dictionary.contains(""));
+    EXPECT_FALSE(dictionary.contains("later"));
+}
+
+}  // namespace

@@ -1,0 +1,285 @@
+#include "platform/work_queue.h"
+
+#include <atomic>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <latch>
+#include <random>
+#include <thread>
+#include <vector>
+
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+
+#include "platform/log.h"
+
+namespace {
+
+using namespace std::chrono_literals;
+using platform::WorkQueue;
+using Clock = std::chrono::steady_clock;
+using Priority = platform::WorkQueue::Priority;
+using std::chrono::nanoseconds;
+
+int threadsNamed(const std::string& name) {
+    int count = 0;
+    std::error_code threadEnded;
+    for (const auto& task : std::filesystem::directory_iterator("/proc/self/task", threadEnded)) {
+        std::string line;
+        std::getline(std::ifstream(task.path() / "comm"), line);
+        count += line == name ? 1 : 0;
+    }
+    return count;
+}
+
+// Whether the condition comes true, with all the time that a loaded machine may need.
+bool eventually(const std::function<bool()>& condition) {
+    for (const auto limit = Clock::now() + 60s; Clock::now() < limit;
+         std::this_thread::sleep_for(1ms)) {
+        if (condition()) {
+            return true;
+        }
+    }
+    return false;
+}
+
+TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
+    constexpr int kThreads = 4;
+    constexpr int kItemsEach = 1000;
+    std::vector<std::vector<int>> ran(kThreads);  // touched by items only: the queue is the lock
+    std::latch done(1);
+    WorkQueue queue("order", Priority::UserInteractive);
+    {
+        std::vector<std::jthread> threads;
+        for (int thread = 0; thread < kThreads; ++thread) {
+            threads.emplace_back([&queue, &ran, thread] {
+                for (int i = 0; i < kItemsEach; ++i) {
+                    queue.async([&ran, thread, i] { ran[thread].push_back(i); });
+                }
+            });
+        }
+    }
+    queue.async([&done] { done.count_down(); });
+    done.wait();
+    for (const auto& items : ran) {
+        ASSERT_EQ(items.size(), static_cast<std::size_t>(kItemsEach));
+        EXPECT_TRUE(std::is_sorted(items.begin(), items.end()));
+    }
+}
+
+TEST(WorkQueue, ReleasesWhatAnItemCapturedBeforeTheNextStarts) {
+    std::vector<std::string> events;
+    std::vector<std::thread::id> threads;
+    std::latch done(1);
+    const auto note = [&](const char* event) {
+        events.emplace_back(event);
+        threads.push_back(std::this_thread::get_id());
+    };
+    WorkQueue queue("captures", Priority::UserInteractive);
+    // Queued from an item, so that both wait in the queue before the first runs.
+    queue.async([&] {
+        const auto captured = std::shared_ptr<void>(nullptr, [&](void*) { note("released"); });
+        queue.async([&, captured] { note("first"); });
+        queue.async([&] { note("second"), done.count_down(); });
+    });
+    done.wait();
+    EXPECT_THAT(events, ::testing::ElementsAre("first", "released", "second"));
+    EXPECT_THAT(threads, ::testing::Each(threads[0]));
+    EXPECT_NE(threads[0], std::this_thread::get_id());
+}
+
+TEST(WorkQueue, HasANamedThreadOnlyFromItsFirstItemUntilItsOwnerHasGone) {
+    const std::string name = "life of a threa";
+    const int inherited = getpriority(PRIO_PROCESS, static_cast<id_t>(gettid()));
+    for (const Priority priority : {Priority::UserInteractive, Priority::Background}) {
+        auto queue = std::make_unique<WorkQueue>("life of a thread", priority);
+        EXPECT_EQ(queue->label(), "life of a thread");
+        EXPECT_EQ(queue->priority(), priority);
+        EXPECT_EQ(threadsNamed(name), 0);
+        std::latch done(1);
+        int nice = 0;
+        queue->async([&] {
+            nice = getpriority(PRIO_PROCESS, static_cast<id_t>(gettid()));
+            done.count_down();
+        });
+        done.wait();
+        EXPECT_EQ(threadsNamed(name), 1);
+        if (priority == Priority::Background) {
+            EXPECT_GE(nice, 10);
+        } else {
+            EXPECT_TRUE(nice == -5 || nice == inherited) << nice;
+        }
+        queue.reset();
+        EXPECT_TRUE(eventually([&] { return threadsNamed(name) == 0; }));
+    }
+}
+
+TEST(WorkQueue, RunsWhatItHasWhenItsOwnerGoesInsideAnItem) {
+    std::latch done(3);
+    auto queue = std::make_unique<WorkQueue>("owner in item", Priority::UserInteractive);
+    std::latch queued(1);
+    queue->async([&] {
+        queued.wait();
+        queue->async([&] { done.count_down(); });
+        queue->after(1ms, [&] { done.count_down(); });
+        queue.reset();
+    });
+    queue->async([&] { done.count_down(); });
+    queued.count_down();
+    done.wait();
+    EXPECT_TRUE(eventually([] { return threadsNamed("owner in item") == 0; }));
+}
+
+TEST(WorkQueue, RunsADelayedItemAfterItsOwnerAndItsThreadHaveGone) {
+    std::latch done(1);
+    {
+        WorkQueue queue("gone", Priority::Background);
+        queue.async([] {});
+        queue.after(100ms, [&] { done.count_down(); });
+    }
+    EXPECT_TRUE(eventually([] { return threadsNamed("gone") == 0; }));
+    done.wait();
+    EXPECT_TRUE(
+        eventually([] { return threadsNamed("gone") == 0 && threadsNamed("delayed items") == 0; }));
+}
+
+TEST(WorkQueue, QueuesAtOnceWhatHasNoDelay) {
+    std::string order;
+    std::latch queued(1);
+    std::latch done(1);
+    WorkQueue queue("no delay", Priority::UserInteractive);
+    queue.async([&] { queued.wait(), order += 'a'; });
+    queue.after(0ns, [&] { order += 'b'; });
+    queue.after(-1ns, [&] { order += 'c'; });
+    queue.after(nanoseconds::min(), [&] { order += 'd'; });
+    queue.async([&] { done.count_down(); });
+    queued.count_down();
+    done.wait();
+    EXPECT_EQ(order, "abcd");
+}
+
+// Which of two items was due first is known when the times at which they were queued leave no doubt.
+TEST(WorkQueue, RunsDelayedItemsInTheOrderOfTheirTimes) {
+    struct Item {
+        Clock::time_point earliest;  // due, at the earliest and at the latest
+        Clock::time_point latest;
+        Clock::time_point ran;
+        int place = 0;
+    };
+    constexpr int kItems = 300;
+    std::vector<Item> items(kItems);
+    std::atomic<int> places[2] = {0, 0};
+    std::latch done(kItems);
+    WorkQueue queues[] = {{"delayed 0", Priority::UserInteractive},
+                          {"delayed 1", Priority::Background}};
+    std::mt19937 random(1);
+    for (int i = 0; i < kItems; ++i) {
+        const nanoseconds delay = std::chrono::microseconds(1 + random() % 20'000);
+        Item& item = items[i];
+        item.earliest = Clock::now() + delay;
+        // The item starts after this function has written its bounds: it waits for the last of them.
+        queues[i % 2].after(delay, [&item, &places, &done, i] {
+            item.ran = Clock::now();
+            item.place = places[i % 2]++;
+            done.count_down();
+        });
+        item.latest = Clock::now() + delay;
+    }
+    done.wait();
+    for (int i = 0; i < kItems; ++i) {
+        EXPECT_GE(items[i].ran, items[i].earliest);
+        for (int j = i % 2; j < kItems; j += 2) {
+            if (items[i].latest < items[j].earliest) {
+                EXPECT_LT(items[i].place, items[j].place) << i << ' ' << j;
+            }
+        }
+    }
+}
+
+// An object as experiments are: it owns its queues, its items own it, and it may end in any of them.
+class Relay : public std::enable_shared_from_this<Relay> {
+  public:
+    explicit Relay(std::latch& gone) : _gone(gone) {}
+    ~Relay() { _gone.count_down(); }
+
+    void start(int hops) {
+        _second.after(std::chrono::microseconds(hops * 37 % 1000),
+                      [self = shared_from_this()] { ++self->_timeouts; });
+        _hop(hops);
+    }
+
+  private:
+    void _hop(int left) {
+        (left % 2 == 0 ? _first : _second).async([self = shared_from_this(), left] {
+            if (left > 0) {
+                self->_hop(left - 1);
+            }
+        });
+    }
+
+    std::latch& _gone;
+    int _timeouts = 0;
+    WorkQueue _first{"relay", Priority::UserInteractive};
+    WorkQueue _second{"relay", Priority::Background};
+};
+
+TEST(WorkQueue, ItsOwnerMayEndInAnyOfItsItems) {
+    constexpr int kRelays = 100;
+    std::latch gone(kRelays);
+    for (int i = 0; i < kRelays; ++i) {
+        std::make_shared<Relay>(gone)->start(i);
+    }
+    gone.wait();
+    EXPECT_TRUE(eventually([] { return threadsNamed("relay") == 0; }));
+}
+
+// Leaves the process while items wait without end, are pending, and use what the process shares.
+void exitWithItemsUnderWay() {
+    std::latch never(1);
+    std::latch started(3);
+    WorkQueue stuck("stuck", Priority::UserInteractive);
+    stuck.async([&] {
+        started.count_down();
+        never.wait();
+    });
+    auto busy = std::make_shared<WorkQueue>("busy", Priority::Background);
+    busy->async([&, busy] {
+        started.count_down();
+        const platform::Log log("tests", "exit");
+        while (true) {
+            log.write(platform::LogLevel::Debug, [] { return "never"; });
+            busy->after(1h, [] { _exit(4); });
+            std::this_thread::sleep_for(1ms);
+        }
+    });
+    stuck.after(nanoseconds::max(), [] { _exit(3); });
+    WorkQueue other("other", Priority::UserInteractive);
+    other.after(nanoseconds::max(), [] { _exit(2); });
+    other.after(1h, [] { _exit(1); });
+    other.after(1ms, [&] { started.count_down(); });
+    started.wait();
+    std::exit(0);
+}
+
+TEST(WorkQueueDeathTest, NoItemKeepsTheProcessFromExitingAndNeverIsNotNow) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    const auto start = Clock::now();
+    EXPECT_EXIT(exitWithItemsUnderWay(), ::testing::ExitedWithCode(0), "");
+    EXPECT_LT(Clock::now() - start, 60s);
+}
+
+TEST(WorkQueueDeathTest, AnExceptionThatLeavesAnItemEndsTheProcess) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_DEATH(
+        {
+            WorkQueue queue("throws", Priority::UserInteractive);
+            queue.async([] { throw std::runtime_error("the culprit"); });
+            eventually([] { return false; });
+        },
+        "the culprit");
+}
+
+}  // namespace

@@ -4,23 +4,32 @@
 #include <cctype>
 #include <cstddef>
 #include <numeric>
+#include <utility>
 
 namespace host {
 
 namespace {
 
-// Levenshtein's distance, one row at a time.
+// The edit distance with neighbours swapped as one edit (optimal string alignment); of its table the
+// last three rows.
 std::size_t edits(std::string_view a, std::string_view b) {
+    std::vector<std::size_t> beforeLast;
+    std::vector<std::size_t> last(b.size() + 1);
     std::vector<std::size_t> row(b.size() + 1);
     std::iota(row.begin(), row.end(), std::size_t{0});
-    const auto lower = [](char c) { return std::tolower(static_cast<unsigned char>(c)); };
+    const auto same = [](char x, char y) {
+        return std::tolower(static_cast<unsigned char>(x)) ==
+               std::tolower(static_cast<unsigned char>(y));
+    };
     for (std::size_t i = 0; i < a.size(); ++i) {
-        std::size_t diagonal = row[0];
+        beforeLast = std::exchange(last, row);
         row[0] = i + 1;
         for (std::size_t j = 0; j < b.size(); ++j) {
-            const std::size_t replaced = diagonal + (lower(a[i]) == lower(b[j]) ? 0 : 1);
-            diagonal = row[j + 1];
-            row[j + 1] = std::min({row[j] + 1, row[j + 1] + 1, replaced});
+            row[j + 1] =
+                std::min({last[j] + (same(a[i], b[j]) ? 0 : 1), last[j + 1] + 1, row[j] + 1});
+            if (i > 0 && j > 0 && same(a[i], b[j - 1]) && same(a[i - 1], b[j])) {
+                row[j + 1] = std::min(row[j + 1], beforeLast[j - 1] + 1);
+            }
         }
     }
     return row.back();

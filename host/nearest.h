@@ -8,7 +8,7 @@
 
 namespace host {
 
-// The name with the fewest edits (insert, delete, replace, case does not count) from `given`, when
+// The name with the fewest edits (insert, delete, replace, swap; case does not count) from `given`, when
 // they are few enough to be a slip: at most a third of its length. Empty otherwise.
 std::string nearest(std::string_view given, const std::vector<std::string>& names);
 

@@ -1,0 +1,4 @@
+// A module that registers nothing.
+extern "C" int silentModule() {
+    return 0;
+}

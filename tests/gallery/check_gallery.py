@@ -1,0 +1,75 @@
+#!/usr/bin/python3
+"""Runs every diagnostic and experiment on every device of the gallery: the verdict must be the expected
+one, the exit status must follow from it, and the standard report must satisfy its schemas.
+
+check_gallery.py ZRLAB OUTPUT-FOLDER
+"""
+
+import concurrent.futures
+import json
+import pathlib
+import subprocess
+import sys
+
+HERE = pathlib.Path(__file__).resolve().parent
+EXPECTED = HERE.parent.parent / "profiles" / "expected-verdicts.json"
+VALIDATOR = HERE.parent / "reports" / "validate_jsonl.py"
+RUNS = {
+    "VantorMeterixDiagnostic": [],
+    "VantorFaultDiagnostic": ["--set", "frameCount=30", "--set", "timeout=3"],
+    "KirraImageExperiment": ["--set", "images=5", "--set", "timeout=2"],
+}
+STATUS = {"PASS": 0, "FAIL": 1, "ERROR": 2}
+
+
+def run(zrlab, folder, device, name):
+    """The problem with one run, or None."""
+    report = folder / f"{device}.{name}.jsonl"
+    command = [zrlab, "run", name, *RUNS[name], "--device", device, "--speed", "max", "--log", "off"]
+    command += ["--format", "json", "--report", str(report)]
+    done = subprocess.run(command, capture_output=True, text=True, timeout=120, check=False)
+    where = f"{device}: {name}"
+    try:
+        verdict = json.loads(done.stdout)["verdict"]
+    except (ValueError, KeyError):
+        return f"{where}: no report; exit status {done.returncode}: {done.stderr.strip()}"
+    expected = json.loads(EXPECTED.read_text())[device][name]
+    if verdict != expected:
+        return f"{where}: verdict {verdict}, expected {expected}"
+    if done.returncode != STATUS[verdict]:
+        return f"{where}: exit status {done.returncode} with verdict {verdict}"
+    return None
+
+
+def main():
+    zrlab, folder = sys.argv[1], pathlib.Path(sys.argv[2])
+    folder.mkdir(parents=True, exist_ok=True)
+    for old in folder.glob("*.jsonl"):
+        old.unlink()
+    devices = subprocess.run(
+        [zrlab, "devices", "--names"], capture_output=True, text=True, check=True
+    ).stdout.split()
+    unknown = set(devices) ^ set(json.loads(EXPECTED.read_text()))
+    problems = [f"{device}: not in both the gallery and {EXPECTED.name}" for device in sorted(unknown)]
+    jobs = [(device, name) for device in devices if device not in unknown for name in RUNS]
+    # Most of a run is waiting for a time-out, so more run at once than there are processors.
+    with concurrent.futures.ThreadPoolExecutor(6) as pool:
+        found = pool.map(lambda job: run(zrlab, folder, *job), jobs)
+        problems += [problem for problem in found if problem]
+    reports = sorted(folder.glob("*.jsonl"))
+    validation = subprocess.run(
+        ["/usr/bin/python3", str(VALIDATOR), *map(str, reports)],
+        capture_output=True,
+        text=True,
+        check=False,
+    )
+    if validation.returncode != 0:
+        problems.append((validation.stdout + validation.stderr).strip())
+    for problem in problems:
+        print(problem)
+    print(f"gallery: {len(jobs)} runs on {len(devices)} devices, {len(reports)} reports validated, "
+          f"{len(problems)} problems")
+    return 1 if problems or not jobs else 0
+
+
+sys.exit(main())

@@ -1,0 +1,90 @@
+#include "tests/program/program.h"
+
+#include <csignal>
+#include <stdexcept>
+
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace test {
+
+Program::Program(const std::vector<std::string>& arguments) {
+    int output[2];
+    int errors[2];
+    if (pipe2(output, O_CLOEXEC) != 0 || pipe2(errors, O_CLOEXEC) != 0) {
+        throw std::runtime_error("no pipe");
+    }
+    std::vector<char*> argv;
+    for (const std::string& argument : arguments) {
+        argv.push_back(const_cast<char*>(argument.c_str()));
+    }
+    argv.push_back(nullptr);
+    _process = fork();
+    if (_process == 0) {
+        dup2(output[1], STDOUT_FILENO);
+        dup2(errors[1], STDERR_FILENO);
+        execv(argv[0], argv.data());
+        _exit(127);
+    }
+    close(output[1]);
+    close(errors[1]);
+    _outputPipe = output[0];
+    _errorPipe = errors[0];
+}
+
+Program::~Program() {
+    if (_process > 0) {
+        kill(_process, SIGKILL);
+        finish();
+    }
+}
+
+bool Program::_read() {
+    pollfd files[] = {{_outputPipe, POLLIN, 0}, {_errorPipe, POLLIN, 0}};
+    if ((_outputPipe < 0 && _errorPipe < 0) || poll(files, 2, -1) < 0) {
+        return false;
+    }
+    const auto take = [](const pollfd& file, int& pipe, std::string& text) {
+        if (file.revents == 0) {
+            return;
+        }
+        char buffer[4096];
+        const ssize_t count = read(pipe, buffer, sizeof buffer);
+        if (count > 0) {
+            text.append(buffer, static_cast<std::size_t>(count));
+        } else {
+            close(pipe);
+            pipe = -1;  // poll() passes over it
+        }
+    };
+    take(files[0], _outputPipe, _outcome.output);
+    take(files[1], _errorPipe, _outcome.errors);
+    return true;
+}
+
+bool Program::waitForError(const std::string& text) {
+    while (_outcome.errors.find(text) == std::string::npos) {
+        if (!_read()) {
+            return false;
+        }
+    }
+    return true;
+}
+
+void Program::signal(int number) const {
+    kill(_process, number);
+}
+
+Outcome Program::finish() {
+    while (_read()) {
+    }
+    int status = 0;
+    waitpid(_process, &status, 0);
+    _process = -1;
+    _outcome.status = WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
+    return _outcome;
+}
+
+}  // namespace test

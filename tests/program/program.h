@@ -1,0 +1,47 @@
+// Runs a program and collects what it does.
+#ifndef ZR_TESTS_PROGRAM_PROGRAM_H
+#define ZR_TESTS_PROGRAM_PROGRAM_H
+
+#include <string>
+#include <vector>
+
+#include <sys/types.h>
+
+namespace test {
+
+struct Outcome {
+    int status = -1;  // the exit status; minus the signal's number when one ended the program
+    std::string output;
+    std::string errors;
+};
+
+// A program that runs, its standard output and standard error going to pipes.
+class Program {
+  public:
+    explicit Program(const std::vector<std::string>& arguments);
+    ~Program();
+    Program(const Program&) = delete;
+    Program& operator=(const Program&) = delete;
+
+    // Waits until standard error holds `text`, or the program ends.
+    bool waitForError(const std::string& text);
+    void signal(int number) const;
+    // Waits for the end.
+    Outcome finish();
+
+  private:
+    bool _read();
+
+    pid_t _process = -1;
+    int _outputPipe = -1;
+    int _errorPipe = -1;
+    Outcome _outcome;
+};
+
+inline Outcome runProgram(const std::vector<std::string>& arguments) {
+    return Program(arguments).finish();
+}
+
+}  // namespace test
+
+#endif

@@ -1,0 +1,218 @@
+#include "tests/program/program.h"
+
+#include <chrono>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+namespace fs = std::filesystem;
+using Json = nlohmann::json;
+using testing::AllOf;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::Not;
+using testing::StartsWith;
+
+test::Outcome zrlab(std::vector<std::string> arguments) {
+    arguments.insert(arguments.begin(), ZR_PROGRAM);
+    return test::runProgram(arguments);
+}
+
+const std::vector<std::string> kFaultRun = {
+    "run", "VantorFaultDiagnostic", "--set", "frameCount=5", "--set", "timeout=60", "--speed",
+    "max"};
+
+std::vector<std::string> with(std::vector<std::string> arguments,
+                              const std::vector<std::string>& more) {
+    arguments.insert(arguments.end(), more.begin(), more.end());
+    return arguments;
+}
+
+TEST(Program, RunsEveryDiagnosticAndExperiment) {
+    const test::Outcome counters = zrlab({"run", "VantorMeterixDiagnostic"});
+    EXPECT_EQ(counters.status, 0) << counters.errors;
+    EXPECT_THAT(counters.output, StartsWith("PASS  VantorMeterixDiagnostic  all 60 limits met"));
+    EXPECT_THAT(counters.errors, IsEmpty());
+
+    const test::Outcome fault = zrlab(kFaultRun);
+    EXPECT_EQ(fault.status, 0) << fault.errors;
+    EXPECT_THAT(fault.output, StartsWith("PASS  VantorFaultDiagnostic  all 64 limits met"));
+
+    const test::Outcome images = zrlab({"run", "KirraImageExperiment", "--set", "images=3", "--set",
+                                        "timeout=60", "--speed", "max", "--format", "json"});
+    EXPECT_EQ(images.status, 0) << images.errors;
+    const Json document = Json::parse(images.output);
+    EXPECT_EQ(document["verdict"], "PASS");
+    const Json& run = document["runs"][0];
+    ASSERT_GE(run["auxiliaryData"]["images"].size(), 3U);
+    const Json& image = run["auxiliaryData"]["images"][0];
+    EXPECT_EQ(image.size(), 5U);
+    EXPECT_EQ(image["dScanI"].size(), 48U);
+    EXPECT_TRUE(image["frameID"].is_number_unsigned());
+    EXPECT_TRUE(image["tmonDataInC"].is_number_float());
+    const Json kinds = {{"frameID", "uint32"},
+                        {"timestampInMilliseconds", "uint32"},
+                        {"tmonDataInC", "float"},
+                        {"dScanI", {"int32"}},
+                        {"dScanQ", {"int32"}}};
+    EXPECT_EQ(run["auxiliaryDataKinds"]["images"], Json::array({kinds}));
+}
+
+// The verdict, its reason and the exit status of a device that is wrong.
+TEST(Program, TellsWhatFailedAndWhy) {
+    const test::Outcome failed =
+        zrlab({"run", "VantorMeterixDiagnostic", "--device", "counter-stuck"});
+    EXPECT_EQ(failed.status, 1);
+    EXPECT_THAT(failed.output, AllOf(StartsWith("FAIL  VantorMeterixDiagnostic"),
+                                     HasSubstr("Max Reports: 0 … 0")));
+
+    const test::Outcome error = zrlab(with(kFaultRun, {"--device", "start-fails"}));
+    EXPECT_EQ(error.status, 2);
+    EXPECT_THAT(error.output, AllOf(StartsWith("ERROR  VantorFaultDiagnostic"),
+                                    HasSubstr("Failed to start streaming zorvel."),
+                                    HasSubstr("ZRCapturePlugInErrorDomain 204")));
+
+    const test::Outcome exception =
+        zrlab({"run", "KirraImageExperiment", "--device", "no-hid-manager", "--set", "images=1",
+               "--set", "timeout=1"});
+    EXPECT_EQ(exception.status, 2);
+    EXPECT_THAT(exception.output, HasSubstr("No HID Manager available?!"));
+}
+
+TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
+    struct Row {
+        std::vector<std::string> arguments;
+        int status;
+        const char* problem;
+    };
+    const Row rows[] = {
+        {{}, 64, "zrlab: no command given; zrlab --help lists them\n"},
+        {{"rnu"}, 64, "zrlab: unknown command \"rnu\"; did you mean run?\n"},
+        {{"run"}, 64, "zrlab: run: NAME is required\n"},
+        {{"run", "X", "--repaet", "3"},
+         64,
+         "zrlab: run: unknown option --repaet; did you mean --repeat?\n"},
+        {{"run", "VantorFaultDiagnostik"},
+         64,
+         "zrlab: unknown diagnostic or experiment \"VantorFaultDiagnostik\"; did you mean "
+         "VantorFaultDiagnostic?\n"},
+        {{"run", "VantorFaultDiagnostic", "--set", "frameCount=3"},
+         64,
+         "zrlab: VantorFaultDiagnostic: parameter \"timeout\" of its experiment has no value; give "
+         "one with --set timeout=NUMBER\n"},
+        {{"run", "VantorMeterixDiagnostic", "--report", "a.pdf"},
+         64,
+         "zrlab: --report a.pdf: its ending is none of .html, .json, .jsonl, .txt, .xml\n"},
+        {{"run", "VantorMeterixDiagnostic", "--speed", "-1"},
+         64,
+         "zrlab: --speed -1: neither \"max\" nor a factor above 0\n"},
+        {{"run", "VantorMeterixDiagnostic", "--output", "/no/such/folder/report"},
+         2,
+         "zrlab: cannot write /no/such/folder/report: No such file or directory\n"},
+        {{"list", "--plugin", "/no/such.so"},
+         2,
+         "zrlab: plug-in module /no/such.so: no such file\n"},
+        {{"describe", "Nothing"},
+         64,
+         "zrlab: unknown experiment, analysis or diagnostic \"Nothing\"\n"},
+        {{"help", "runn"}, 64, "zrlab: help: unknown command \"runn\"; did you mean run?\n"},
+    };
+    for (const Row& row : rows) {
+        const test::Outcome outcome = zrlab(row.arguments);
+        EXPECT_EQ(outcome.status, row.status) << row.problem;
+        EXPECT_EQ(outcome.errors, row.problem);
+        EXPECT_THAT(outcome.output, IsEmpty());
+    }
+    EXPECT_NE(zrlab({"run", "VantorMeterixDiagnostic", "--device", "helthy"}).status, 0);
+}
+
+TEST(Program, ExplainsItself) {
+    EXPECT_THAT(zrlab({"list"}).output, HasSubstr("VantorFaultAnalysis"));
+    EXPECT_THAT(zrlab({"describe", "VantorFaultDiagnostic"}).output,
+                AllOf(HasSubstr("experiment VantorFaultExperiment"),
+                      HasSubstr("The max time to wait for frameCount, in seconds."),
+                      HasSubstr("analysis VantorFaultAnalysis")));
+    EXPECT_THAT(zrlab({"--version"}).output, StartsWith("zrlab "));
+    EXPECT_EQ(zrlab({"help", "run"}).output, zrlab({"run", "--help"}).output);
+    EXPECT_THAT(zrlab({"manual"}).output, AllOf(StartsWith(".TH ZRLAB 1"), HasSubstr("\\-\\-set")));
+    EXPECT_THAT(zrlab({"devices", "--names"}).output, StartsWith("healthy\n"));
+    for (const char* shell : {"bash", "zsh"}) {
+        EXPECT_THAT(zrlab({"completion", shell}).output, HasSubstr("--until-fail"));
+    }
+}
+
+TEST(Program, ColourOnlyWhenAsked) {
+    const char* escape = "\x1b[";
+    EXPECT_THAT(zrlab({"run", "VantorMeterixDiagnostic"}).output, Not(HasSubstr(escape)));
+    EXPECT_THAT(zrlab({"run", "VantorMeterixDiagnostic", "--color", "always"}).output,
+                HasSubstr(escape));
+}
+
+TEST(Program, WritesSeveralReportsOfOneRun) {
+    const fs::path folder = fs::path(testing::TempDir()) / "zrlab-reports";
+    fs::remove_all(folder);
+    fs::create_directory(folder);
+    std::vector<std::string> arguments =
+        with(kFaultRun, {"--output", (folder / "out.txt").string()});
+    for (const char* ending : {"html", "json", "jsonl", "xml", "txt"}) {
+        arguments = with(arguments, {"--report", (folder / "report.").string() + ending});
+    }
+    const test::Outcome outcome = zrlab(arguments);
+    EXPECT_EQ(outcome.status, 0) << outcome.errors;
+    EXPECT_THAT(outcome.output, IsEmpty());
+    int files = 0;
+    for (const auto& entry : fs::directory_iterator(folder)) {
+        EXPECT_GT(fs::file_size(entry), 100U) << entry;
+        ++files;
+    }
+    EXPECT_EQ(files, 6);
+}
+
+TEST(Program, RepeatsAndCountsOrStopsAtTheFirstFailure) {
+    const test::Outcome repeated = zrlab(with(kFaultRun, {"--repeat", "20", "--format", "json"}));
+    EXPECT_EQ(repeated.status, 0) << repeated.errors;
+    const Json repeat = Json::parse(repeated.output)["repeats"][0];
+    EXPECT_EQ(repeat["runs"], 20);
+    EXPECT_EQ(repeat["passed"], 20);
+    EXPECT_EQ(repeat["results"].size(), 64U);
+
+    const test::Outcome stopped = zrlab({"run", "VantorMeterixDiagnostic", "--device",
+                                         "counter-stuck", "--until-fail", "--format", "json"});
+    EXPECT_EQ(stopped.status, 1);
+    EXPECT_EQ(Json::parse(stopped.output)["repeats"][0]["runs"], 1);
+}
+
+// A time-out of an hour is pending when the run is over: the program must not wait for it.
+TEST(Program, EndsAtOnceWithATimeOutPending) {
+    const auto start = std::chrono::steady_clock::now();
+    const test::Outcome outcome = zrlab({"run", "VantorFaultDiagnostic", "--set", "frameCount=2",
+                                         "--set", "timeout=3600", "--speed", "max"});
+    EXPECT_EQ(outcome.status, 0);
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::minutes(5));
+}
+
+TEST(Program, AnInterruptEndsItAtOnceAndLeavesNoFile) {
+    const fs::path folder = fs::path(testing::TempDir()) / "zrlab-interrupt";
+    fs::remove_all(folder);
+    fs::create_directory(folder);
+    for (const auto& [number, status] : {std::pair(SIGINT, 130), std::pair(SIGTERM, 143)}) {
+        test::Program program({ZR_PROGRAM, "run", "VantorFaultDiagnostic", "--set",
+                               "frameCount=1000000", "--set", "timeout=3600", "--log", "debug",
+                               "--output", (folder / "report").string()});
+        ASSERT_TRUE(program.waitForError("Received frame 2."));
+        program.signal(number);
+        const test::Outcome outcome = program.finish();
+        EXPECT_EQ(outcome.status, status);
+        EXPECT_THAT(outcome.output, IsEmpty());
+        EXPECT_TRUE(fs::is_empty(folder));
+    }
+}
+
+}  // namespace

@@ -161,10 +161,11 @@ TEST(WorkQueue, QueuesAtOnceWhatHasNoDelay) {
     EXPECT_EQ(order, "abcd");
 }
 
-// Which of two items was due first is known when the times at which they were queued leave no doubt.
+// Which of two items is due first is certain when the latest time of one lies before the earliest of
+// the other.
 TEST(WorkQueue, RunsDelayedItemsInTheOrderOfTheirTimes) {
     struct Item {
-        Clock::time_point earliest;  // due, at the earliest and at the latest
+        Clock::time_point earliest;  // when it may be due
         Clock::time_point latest;
         Clock::time_point ran;
         int place = 0;
@@ -180,7 +181,6 @@ TEST(WorkQueue, RunsDelayedItemsInTheOrderOfTheirTimes) {
         const nanoseconds delay = std::chrono::microseconds(1 + random() % 20'000);
         Item& item = items[i];
         item.earliest = Clock::now() + delay;
-        // The item starts after this function has written its bounds: it waits for the last of them.
         queues[i % 2].after(delay, [&item, &places, &done, i] {
             item.ran = Clock::now();
             item.place = places[i % 2]++;

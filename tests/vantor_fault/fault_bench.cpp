@@ -1,0 +1,120 @@
+#include "tests/vantor_fault/fault_bench.h"
+
+#include <thread>
+
+#include "simulator/frame_metadata.h"
+
+namespace test {
+
+class FaultTest::Witness final : public simulator::Observer {
+  public:
+    void misused(std::string_view what) override {
+        const platform::MutexLock lock(_mutex);
+        _misuses.emplace_back(what);
+    }
+    std::vector<std::string> misuses() {
+        const platform::MutexLock lock(_mutex);
+        return _misuses;
+    }
+
+  private:
+    platform::Mutex _mutex;
+    std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
+};
+
+bool eventually(const std::function<bool()>& condition) {
+    const auto deadline = platform::deadlineAfter(kGenerous);
+    while (!condition()) {
+        if (std::chrono::steady_clock::now() >= deadline) {
+            return false;
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    return true;
+}
+
+platform::ErrorRef serviceError(std::string_view text) {
+    return std::make_shared<const platform::Error>("service", 7, std::string(text));
+}
+
+FaultTest::FaultTest() : _witness(std::make_shared<Witness>()) {
+    capture = simulator::healthyCapture();
+    capture.streams = {capture.streams.back()};
+    camera().jitterMicroseconds = 0;
+    platform::setLogSink(log, platform::LogLevel::Debug);
+}
+
+FaultTest::~FaultTest() {
+    log->release();
+    for (const Made& made : _made) {  // so that none logs into the next test
+        EXPECT_TRUE(eventually([&] { return made.experiment.use_count() <= made.pending; }));
+    }
+    EXPECT_TRUE(eventually([&] { return liveBuffers() == 0; })) << liveBuffers() << " buffers held";
+    platform::installServices({});
+    _plugIn = nullptr;
+    EXPECT_THAT(misuses(), ::testing::IsEmpty());
+    platform::setLogSink(nullptr, platform::LogLevel::Error);
+}
+
+simulator::FrameOverride& FaultTest::from(std::uint64_t frame) {
+    simulator::FrameOverride& range = camera().overrides.emplace_back();
+    range.firstFrame = frame;
+    return range;
+}
+
+simulator::FrameOverride& FaultTest::at(std::uint64_t frame) {
+    simulator::FrameOverride& range = from(frame);
+    range.lastFrame = frame;
+    return range;
+}
+
+void FaultTest::install() {
+    const auto progress = std::make_shared<simulator::StreamProgress>();
+    auto plugIn = simulator::makeCapturePlugIn(capture, speed, progress, _witness);
+    _plugIn = std::dynamic_pointer_cast<simulator::SimulatedCapture>(plugIn);
+    platform::installServices({.capture = std::move(plugIn),
+                               .meterix = simulator::makeMeterixFacility(meterix, progress),
+                               .hid = nullptr,
+                               .display = nullptr,
+                               .registry = nullptr});
+}
+
+std::shared_ptr<ZRVantorFaultExperiment> FaultTest::make(double frameCount, double timeout) {
+    auto experiment = std::make_shared<Experiment>();
+    EXPECT_TRUE(experiment->setupWithParameters({{"frameCount", frameCount}, {"timeout", timeout}},
+                                                nullptr, nullptr));
+    return experiment;
+}
+
+ZRExperimentResultRef FaultTest::run(double frameCount, double timeout) {
+    install();
+    const auto experiment = make(frameCount, timeout);
+    auto result = experiment->run(&error);
+    experiment->teardown(nullptr);
+    return result;
+}
+
+WLRylFrameHandler FaultTest::frameHandler(const Experiment& experiment) {
+    const platform::Value handlers = experiment.stream()->valueForProperty(
+        kRylCaptureStreamProperty_VideoOutputHandlers, nullptr);
+    return *handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
+                    [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
+                        .object<WLRylFrameHandler>();
+}
+
+platform::ImageBufferRef FaultTest::buffer() {
+    const auto profile = simulator::healthyCapture().streams.back();
+    return std::make_shared<const platform::ImageBuffer>(
+        platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
+                              simulator::frameMetadata(profile, 1, 0)}});
+}
+
+std::size_t FaultTest::liveBuffers() const {
+    return _plugIn != nullptr ? _plugIn->liveBuffers() : 0;
+}
+
+std::vector<std::string> FaultTest::misuses() const {
+    return _witness->misuses();
+}
+
+}  // namespace test

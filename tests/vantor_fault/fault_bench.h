@@ -1,0 +1,153 @@
+// What the fault experiment's tests stand on: a simulated device, a log that can be waited for, and
+// a check after every test that nothing was misused or left behind.
+#ifndef ZR_TESTS_VANTOR_FAULT_FAULT_BENCH_H
+#define ZR_TESTS_VANTOR_FAULT_FAULT_BENCH_H
+
+#include <chrono>
+#include <functional>
+#include <limits>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "platform/deadline.h"
+#include "platform/log.h"
+#include "platform/mutex.h"
+#include "platform/services.h"
+#include "simulator/capture_service.h"
+#include "simulator/meterix_facility.h"
+#include "tests/support/is_error.h"
+#include "vantor_fault/fault_experiment.h"
+
+namespace test {
+
+inline constexpr std::chrono::seconds kGenerous{60};
+
+// A time-out in seconds that never comes.
+inline constexpr double kNever = std::numeric_limits<double>::infinity();
+
+// Records the log's lines, and can hold a thread in one of them.
+class LogRecorder final : public platform::LogSink {
+  public:
+    void write(const platform::LogLine& line) override {
+        const platform::MutexLock lock(_mutex);
+        _lines.push_back({line.level, std::string(line.message)});
+        _changed.notifyAll();
+        while (!_held.empty() && line.message.starts_with(_held)) {
+            _changed.wait(_mutex);
+        }
+    }
+
+    // The next threads that log a line with this beginning stay in it until release().
+    void hold(std::string beginning) {
+        const platform::MutexLock lock(_mutex);
+        _held = std::move(beginning);
+    }
+    void release() {
+        hold("");
+        _changed.notifyAll();
+    }
+
+    // Whether so many lines of that level with this beginning come, in a generous time.
+    bool waitFor(platform::LogLevel level, std::string_view beginning, std::size_t times = 1) {
+        const auto deadline = platform::deadlineAfter(kGenerous);
+        const platform::MutexLock lock(_mutex);
+        while (_count(level, beginning) < times) {
+            if (std::chrono::steady_clock::now() >= deadline) {
+                return false;
+            }
+            _changed.waitUntil(_mutex, deadline);
+        }
+        return true;
+    }
+    std::size_t count(platform::LogLevel level, std::string_view beginning) {
+        const platform::MutexLock lock(_mutex);
+        return _count(level, beginning);
+    }
+    std::vector<std::string> messages() {
+        const platform::MutexLock lock(_mutex);
+        std::vector<std::string> messages;
+        for (const Line& line : _lines) {
+            messages.push_back(line.message);
+        }
+        return messages;
+    }
+
+  private:
+    struct Line {
+        platform::LogLevel level;
+        std::string message;
+    };
+
+    std::size_t _count(platform::LogLevel level, std::string_view beginning) const
+        ZR_REQUIRES(_mutex) {
+        std::size_t count = 0;
+        for (const Line& line : _lines) {
+            count += line.level == level && line.message.starts_with(beginning) ? 1 : 0;
+        }
+        return count;
+    }
+
+    platform::Mutex _mutex;
+    platform::Condition _changed;
+    std::vector<Line> _lines ZR_GUARDED_BY(_mutex);
+    std::string _held ZR_GUARDED_BY(_mutex);
+};
+
+// Whether `condition` comes true in a generous time.
+bool eventually(const std::function<bool()>& condition);
+
+// An error as a device service would report it.
+platform::ErrorRef serviceError(std::string_view text);
+
+class FaultTest : public ::testing::Test {
+  protected:
+    using Experiment = ZRVantorFaultExperiment;
+
+    FaultTest();
+    ~FaultTest() override;
+
+    // The infrared camera of the profile.
+    simulator::StreamProfile& camera() { return capture.streams.back(); }
+    // What is different from some frame on.
+    simulator::FrameOverride& from(std::uint64_t frame);
+    simulator::FrameOverride& at(std::uint64_t frame);
+
+    // Makes the profiles the installed device. The one before must have all its buffers back.
+    void install();
+    // An experiment that was set up.
+    std::shared_ptr<Experiment> make(double frameCount, double timeout);
+    // Installs, runs an experiment and tears it down; the run's error ends up in `error`.
+    ZRExperimentResultRef run(double frameCount, double timeout);
+
+    // The handlers that a run installed: whoever calls them is the capture service.
+    static WLRylFrameHandler frameHandler(const Experiment& experiment);
+    static platform::ImageBufferRef buffer();  // of a lit frame
+
+    std::size_t liveBuffers() const;
+    std::vector<std::string> misuses() const;
+
+    simulator::CaptureProfile capture;  // one camera without jitter, a stream as fast as it goes
+    simulator::MeterixProfile meterix = simulator::healthyMeterix();
+    double speed = 0;
+    platform::ErrorRef error;
+    std::shared_ptr<LogRecorder> log = std::make_shared<LogRecorder>();
+
+  private:
+    class Witness;
+    std::shared_ptr<Witness> _witness;
+    std::shared_ptr<simulator::SimulatedCapture> _plugIn;
+    struct Made {
+        std::weak_ptr<Experiment> experiment;
+        long pending;  // references that stay: a time-out that never comes
+    };
+    std::vector<Made> _made;
+};
+
+}  // namespace test
+
+#endif

@@ -1,0 +1,129 @@
+// Who keeps the experiment alive, where it dies, and what is left behind.
+#include <cstdlib>
+#include <filesystem>
+#include <thread>
+
+#include "tests/vantor_fault/fault_bench.h"
+
+namespace {
+
+using platform::LogLevel;
+using test::FaultTest;
+
+std::size_t threads() {
+    const std::filesystem::directory_iterator tasks("/proc/self/task");
+    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
+}
+
+class FaultLifetime : public FaultTest {
+  protected:
+    // Drops the host's reference while another thread is held in that line of the log, in an item of
+    // the experiment's; then lets that thread go on.
+    void expectDeathInside(LogLevel level,
+                           std::string_view line,
+                           std::shared_ptr<Experiment> experiment) {
+        ASSERT_TRUE(log->waitFor(level, line));
+        const std::weak_ptr<Experiment> weak = experiment;
+        experiment = nullptr;
+        EXPECT_FALSE(weak.expired());
+        log->release();
+        EXPECT_TRUE(test::eventually([&] { return weak.expired(); }));
+    }
+};
+
+TEST_F(FaultLifetime, DiesInsideAProcessingItem) {
+    at(2).noMetadata = true;  // stops the run while frame 1 is being processed
+    install();
+    log->hold("Processing frame 1.");
+    std::shared_ptr<Experiment> experiment;
+    double timeout = 0.01;
+    do {  // until the second frame comes before the time-out
+        experiment = make(9, timeout *= 2);
+    } while (experiment->run(nullptr) != nullptr);
+    expectDeathInside(LogLevel::Debug, "Processing frame 1.", std::move(experiment));
+}
+
+TEST_F(FaultLifetime, DiesInsideAReceipt) {
+    camera().stallAfterFrame = 0;
+    install();
+    log->hold("Received frame that won't be counted");
+    auto experiment = make(9, 0);
+    EXPECT_NE(experiment->run(nullptr), nullptr);
+    frameHandler (*experiment)(buffer(), {});
+    expectDeathInside(LogLevel::Default, "Received frame that won't be counted",
+                      std::move(experiment));
+}
+
+TEST_F(FaultLifetime, DiesInsideItsTimeOut) {
+    at(1).noMetadata = true;  // stops the run on the other queue
+    install();
+    log->hold("Timeout has been reached.");
+    auto experiment = make(9, 0.01);
+    EXPECT_EQ(experiment->run(nullptr), nullptr);
+    expectDeathInside(LogLevel::Error, "Timeout has been reached.", std::move(experiment));
+}
+
+// The host lets go while frames keep coming, of a stream that does not even stop: the last reference
+// may go on any of the threads, the stream's own one included.
+TEST_F(FaultLifetime, DiesWhileFramesArrive) {
+    camera().stop = simulator::Fault::failing(nullptr);
+    install();
+    for (int round = 0; round < 100; ++round) {
+        auto experiment = make(1, 0);
+        const std::weak_ptr<Experiment> weak = experiment;
+        EXPECT_EQ(experiment->run(nullptr), nullptr);
+        experiment = nullptr;
+        EXPECT_TRUE(test::eventually([&] { return weak.expired(); }));
+    }
+}
+
+// The same with a thread of the test's as the capture service, which goes on until the handler
+// finds nobody any more.
+TEST_F(FaultLifetime, DiesInsideAHandler) {
+    camera().stallAfterFrame = 0;
+    install();
+    for (int round = 0; round < 100; ++round) {
+        auto experiment = make(1, 0);
+        const std::weak_ptr<Experiment> weak = experiment;
+        EXPECT_NE(experiment->run(nullptr), nullptr);
+        std::thread service([&weak, deliver = frameHandler(*experiment)] {
+            while (!weak.expired()) {
+                deliver(buffer(), {});
+            }
+            deliver(buffer(), {});
+        });
+        experiment = nullptr;
+        service.join();
+    }
+}
+
+TEST_F(FaultLifetime, LeavesNothingBehindOnceTimeOutsHavePassed) {
+    install();
+    const std::size_t threadsBefore = threads();
+    std::vector<std::weak_ptr<Experiment>> runs;
+    for (int round = 0; round < 30; ++round) {
+        const auto experiment = make(2, 0.05);
+        EXPECT_NE(experiment->run(nullptr), nullptr);
+        EXPECT_TRUE(experiment->teardown(nullptr));
+        runs.push_back(experiment);
+    }
+    EXPECT_TRUE(test::eventually([&] {
+        return std::all_of(runs.begin(), runs.end(), [](auto& run) { return run.expired(); });
+    }));
+    EXPECT_TRUE(test::eventually([&] { return threads() <= threadsBefore; })) << threads();
+    EXPECT_EQ(log->count(LogLevel::Error, "Timeout has been reached."), runs.size());
+}
+
+TEST_F(FaultLifetime, APendingTimeOutDoesNotKeepTheProcess) {
+    ::testing::GTEST_FLAG(death_test_style) = "threadsafe";
+    install();
+    EXPECT_EXIT(
+        {
+            const auto experiment = make(1, 3600);
+            const bool passed = experiment->run(nullptr) != nullptr;
+            std::exit(passed ? 0 : 1);
+        },
+        ::testing::ExitedWithCode(0), "");
+}
+
+}  // namespace

@@ -22,11 +22,11 @@ std::shared_ptr<ZRAnalysis> makeAnalysis() {
 // A row holds what it registers; a row with a summary is a diagnostic of the two that it names.
 struct Row {
     std::string_view name;
-    std::shared_ptr<ZRExperiment> (*experiment)();
-    std::shared_ptr<ZRAnalysis> (*analysis)();
-    std::string_view summary;
-    std::string_view experimentName;
-    std::string_view analysisName;
+    std::shared_ptr<ZRExperiment> (*experiment)() = nullptr;
+    std::shared_ptr<ZRAnalysis> (*analysis)() = nullptr;
+    std::string_view summary = {};
+    std::string_view experimentName = {};
+    std::string_view analysisName = {};
 };
 
 constexpr std::string_view kMeterixExperiment = "VantorMeterixExperiment";

@@ -18,11 +18,11 @@ class HidFacility;
 class MeterixFacility;
 
 struct Services {
-    std::shared_ptr<WLISPCapturePlugIn> capture;
-    std::shared_ptr<MeterixFacility> meterix;
-    std::shared_ptr<HidFacility> hid;
-    std::shared_ptr<DisplayService> display;
-    std::shared_ptr<DeviceRegistry> registry;
+    std::shared_ptr<WLISPCapturePlugIn> capture = nullptr;
+    std::shared_ptr<MeterixFacility> meterix = nullptr;
+    std::shared_ptr<HidFacility> hid = nullptr;
+    std::shared_ptr<DisplayService> display = nullptr;
+    std::shared_ptr<DeviceRegistry> registry = nullptr;
 };
 
 // Replaces the installed set. Any thread; what runs on the old set keeps it alive and goes on.

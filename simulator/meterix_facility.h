@@ -28,10 +28,10 @@ struct CounterChannel {
 
 struct MeterixProfile {
     std::vector<CounterChannel> channels;
-    Fault report;          // asking for the simple channels
-    Fault firstSnapshot;   // the first snapshot since the device was made
-    Fault laterSnapshots;  // every other
-    Fault difference;
+    Fault report = {};          // asking for the simple channels
+    Fault firstSnapshot = {};   // the first snapshot since the device was made
+    Fault laterSnapshots = {};  // every other
+    Fault difference = {};
 };
 
 // The counters of a device without faults.

@@ -7,6 +7,7 @@
 #include <functional>
 #include <limits>
 #include <map>
+#include <ostream>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -95,6 +96,10 @@ struct Row {
     RunLoopOutcome outcome;
     const char* events;
 };
+
+void PrintTo(const Row& row, std::ostream* out) {
+    *out << row.name;
+}
 
 class ScriptedRunLoop : public ::testing::TestWithParam<Row> {};
 

@@ -239,7 +239,7 @@ TEST(WorkQueue, ItsOwnerMayEndInAnyOfItsItems) {
 // Leaves the process while items wait without end, are pending, and use what the process shares.
 void exitWithItemsUnderWay() {
     std::latch never(1);
-    std::latch started(3);
+    std::latch started(2);
     WorkQueue stuck("stuck", Priority::UserInteractive);
     stuck.async([&] {
         started.count_down();
@@ -259,8 +259,12 @@ void exitWithItemsUnderWay() {
     WorkQueue other("other", Priority::UserInteractive);
     other.after(nanoseconds::max(), [] { _exit(2); });
     other.after(1h, [] { _exit(1); });
-    other.after(1ms, [&] { started.count_down(); });
     started.wait();
+    for (int i = 0; i < 20; ++i) {  // each comes while later ones are being waited for
+        std::latch ran(1);
+        other.after(1us, [&ran] { ran.count_down(); });
+        ran.wait();
+    }
     std::exit(0);
 }
 

@@ -10,6 +10,12 @@ namespace host {
 
 namespace {
 
+// One of these words. Its own description stays out of the help: the type's name lists the words.
+CLI::Validator oneOf(std::vector<std::string> words) {
+    CLI::Validator validator = CLI::IsMember(std::move(words));
+    return validator.description("");
+}
+
 // The module beside the program.
 std::string defaultPlugin() {
     std::error_code none;
@@ -57,8 +63,6 @@ CommandLine::CommandLine()
     _app.require_subcommand(1);
     _app.set_version_flag("--version", "zrlab " ZR_VERSION, "Print the version and exit");
     _app.set_help_flag("-h,--help", "Print this help and exit");
-    _app.footer(kExamples);
-
     CLI::App* list = _app.add_subcommand("list", "List experiments, analyses and diagnostics");
     list->add_flag("--names", namesOnly, "Only the names that can be run, one a line");
     _addPlugin(*list);
@@ -81,13 +85,16 @@ CommandLine::CommandLine()
         _app.add_subcommand("completion", "Print a completion script for a shell");
     completion->add_option("SHELL", shell, "The shell")
         ->required()
-        ->check(CLI::IsMember({"bash", "zsh"}));
+        ->type_name("bash|zsh")
+        ->check(oneOf({"bash", "zsh"}));
     completion->footer(
         "Examples:\n  source <(zrlab completion bash)\n"
         "  zrlab completion zsh > \"${fpath[1]}/_zrlab\"");
 
     CLI::App* manual = _app.add_subcommand("manual", "Print the manual page");
     manual->footer("Example:\n  zrlab manual | man -l -");
+
+    _app.footer(kExamples);  // last: a command added later would inherit it
 }
 
 void CommandLine::_addPlugin(CLI::App& command) {
@@ -101,8 +108,8 @@ void CommandLine::_addRun() {
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
         ->required();
     run.add_option("--set", session.settings,
-                   "Give a parameter to every part that declares it; experiment:PARAM=VALUE or "
-                   "analysis:PARAM=VALUE gives it to one part only")
+                   "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
+                   "analysis:PARAM=VALUE\ngives it to one part only")
         ->type_name("PARAM=VALUE")
         ->take_all()
         ->allow_extra_args(false);
@@ -114,7 +121,7 @@ void CommandLine::_addRun() {
         ->type_name("FACTOR|max")
         ->capture_default_str();
     run.add_option("--format", session.format, "Form of the report")
-        ->check(CLI::IsMember({"text", "json", "jsonl", "junit"}))
+        ->check(oneOf({"text", "json", "jsonl", "junit"}))
         ->type_name("text|json|jsonl|junit")
         ->capture_default_str();
     run.add_option("--output", session.output, "Write the report to this file, whole or not at all")
@@ -128,7 +135,8 @@ void CommandLine::_addRun() {
         ->allow_extra_args(false);
     run.add_option("--repeat", session.repeat, "Run each name this many times and show the spread")
         ->type_name("N")
-        ->check(CLI::Range(std::uint64_t{1}, std::uint64_t{1'000'000'000}));
+        ->check(CLI::Validator(CLI::Range(std::uint64_t{1}, std::uint64_t{1'000'000'000}))
+                    .description(""));
     run.add_flag("--until-fail", session.untilFail,
                  "Repeat until a run does not pass; with --repeat at most N times");
     run.add_flag("-v,--verbose", session.verbose, "Show what the text report folds");
@@ -140,9 +148,9 @@ void CommandLine::_addRun() {
                              : value == "never" ? Colour::Never
                                                 : Colour::Automatic;
         })
-        ->check(CLI::IsMember({"auto", "always", "never"}));
+        ->check(oneOf({"auto", "always", "never"}));
     run.add_option("--log", session.logLevel, "The least level of log lines on standard error")
-        ->check(CLI::IsMember({"debug", "default", "error", "off"}))
+        ->check(oneOf({"debug", "default", "error", "off"}))
         ->type_name("debug|default|error|off")
         ->capture_default_str();
     _addPlugin(run);

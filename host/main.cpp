@@ -112,16 +112,18 @@ int devices(bool namesOnly) {
     return print(out);
 }
 
-int help(const CommandLine& commandLine) {
-    const CLI::App* command = commandLine.helpTopic.empty()
-                                  ? &commandLine.app()
-                                  : commandLine.find(commandLine.helpTopic);
-    if (command == nullptr) {
-        return complain(kExitUsage,
-                        "help: unknown command \"" + commandLine.helpTopic + "\"" +
-                            didYouMean(commandLine.helpTopic, commandLine.commandNames()));
+int help(const std::string& topic) {
+    // A command line of its own: one that has read a command explains only that.
+    const CommandLine commandLine;
+    if (topic.empty()) {
+        return print(commandLine.app().help());
     }
-    return print(command->help());
+    const CLI::App* command = commandLine.find(topic);
+    if (command == nullptr) {
+        return complain(kExitUsage, "help: unknown command \"" + topic + "\"" +
+                                        didYouMean(topic, commandLine.commandNames()));
+    }
+    return print(command->help(commandLine.app().get_name()));
 }
 
 int withPlugin(const CommandLine& commandLine) {
@@ -155,7 +157,7 @@ int run(int count, const char* const* arguments) {
         return devices(commandLine.namesOnly);
     }
     if (command == "help") {
-        return help(commandLine);
+        return help(commandLine.helpTopic);
     }
     if (command == "completion") {
         return print(completionScript(commandLine.app(), commandLine.shell));

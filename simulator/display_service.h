@@ -1,0 +1,29 @@
+// The simulated display framebuffer service and device registry.
+#ifndef ZR_SIMULATOR_DISPLAY_SERVICE_H
+#define ZR_SIMULATOR_DISPLAY_SERVICE_H
+
+#include <memory>
+
+#include "platform/display.h"
+#include "platform/value.h"
+
+namespace simulator {
+
+// A display that is on, and what may be wrong with telling so.
+struct DisplayProfile {
+    int mainDisplayStatus = 0;       // other than 0: there is no main display
+    bool registryService = true;     // whether the display has a registry object
+    bool property = true;            // whether the object has the debug property
+    bool powerInfo = true;           // whether the property has the entry "Quorm power info"
+    bool powerPanel = true;          // whether that has the entry "Quorm power info panel"
+    platform::Value powered = true;  // of that entry: a display that is on has a true number
+};
+
+DisplayProfile healthyDisplay();
+
+std::shared_ptr<platform::DisplayService> makeDisplayService(const DisplayProfile& profile);
+std::shared_ptr<platform::DeviceRegistry> makeDeviceRegistry(const DisplayProfile& profile);
+
+}  // namespace simulator
+
+#endif

@@ -4,7 +4,7 @@
 #include <filesystem>
 #include <system_error>
 
-#include "host/nearest.h"
+#include "platform/nearest.h"
 
 namespace host {
 
@@ -167,7 +167,7 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
             given = find(argument);
             if (given == nullptr) {
                 return "unknown command \"" + argument + "\"" +
-                       didYouMean(argument, commandNames());
+                       platform::didYouMean(argument, commandNames());
             }
         } else if (argument.starts_with("-") && given != nullptr) {
             const std::string option = argument.substr(0, argument.find('='));
@@ -177,7 +177,7 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
                     options.push_back(one->get_name());
                 }
                 return given->get_name() + ": unknown option " + option +
-                       didYouMean(option, options);
+                       platform::didYouMean(option, options);
             }
         }
     }

@@ -8,10 +8,10 @@
 #include "frame/host_interface.h"
 #include "host/command_line.h"
 #include "host/module_loader.h"
-#include "host/nearest.h"
 #include "host/run_plan.h"
 #include "host/session.h"
 #include "host/terminal.h"
+#include "platform/nearest.h"
 #include "simulator/profile_reader.h"
 
 namespace host {
@@ -91,7 +91,7 @@ int describe(const std::vector<std::string>& names) {
             const auto analyses = lab.analysisNames();
             known.insert(known.end(), analyses.begin(), analyses.end());
             return complain(kExitUsage, "unknown experiment, analysis or diagnostic \"" + name +
-                                            "\"" + didYouMean(name, known));
+                                            "\"" + platform::didYouMean(name, known));
         }
         out += (out.empty() ? "" : "\n") + text;
     }
@@ -121,7 +121,7 @@ int help(const std::string& topic) {
     const CLI::App* command = commandLine.find(topic);
     if (command == nullptr) {
         return complain(kExitUsage, "help: unknown command \"" + topic + "\"" +
-                                        didYouMean(topic, commandLine.commandNames()));
+                                        platform::didYouMean(topic, commandLine.commandNames()));
     }
     return print(command->help(commandLine.app().get_name()));
 }

@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <system_error>
 
-#include "host/nearest.h"
+#include "platform/nearest.h"
 
 namespace host {
 
@@ -123,7 +123,7 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
         std::optional<RunPlan> plan = planOf(lab, name);
         if (!plan.has_value()) {
             problem = "unknown diagnostic or experiment \"" + name + "\"" +
-                      didYouMean(name, runnableNames(lab));
+                      platform::didYouMean(name, runnableNames(lab));
             return std::nullopt;
         }
         std::vector<std::pair<Part, PartPlan*>> parts{{Part::Experiment, &plan->experiment}};
@@ -165,7 +165,7 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
     for (std::size_t i = 0; i < settings.size(); ++i) {
         if (!used[i]) {
             problem = "no part of what is to be run declares a parameter \"" + settings[i].name +
-                      "\"" + didYouMean(settings[i].name, declared);
+                      "\"" + platform::didYouMean(settings[i].name, declared);
             return std::nullopt;
         }
     }

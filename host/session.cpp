@@ -16,7 +16,6 @@
 #include "host/jsonl_report.h"
 #include "host/judge.h"
 #include "host/junit_report.h"
-#include "host/nearest.h"
 #include "host/output_file.h"
 #include "host/progress.h"
 #include "host/repeat_statistics.h"

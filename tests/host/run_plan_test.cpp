@@ -6,7 +6,7 @@
 
 #include <gmock/gmock.h>
 
-#include "host/nearest.h"
+#include "platform/nearest.h"
 
 namespace {
 
@@ -156,13 +156,13 @@ TEST(RunPlan, RefusesBeforeAnythingRuns) {
 
 TEST(Nearest, FindsASlipAndNothingElse) {
     const std::vector<std::string> names = {"healthy", "counter-stuck", "run"};
-    EXPECT_EQ(host::nearest("helthy", names), "healthy");
-    EXPECT_EQ(host::nearest("HEALTHY", names), "healthy");
-    EXPECT_EQ(host::nearest("counterstuck", names), "counter-stuck");
-    EXPECT_EQ(host::nearest("rnu", names), "run");
-    EXPECT_EQ(host::nearest("rxy", names), "");
-    EXPECT_EQ(host::nearest("something", names), "");
-    EXPECT_EQ(host::nearest("", names), "");
+    EXPECT_EQ(platform::nearest("helthy", names), "healthy");
+    EXPECT_EQ(platform::nearest("HEALTHY", names), "healthy");
+    EXPECT_EQ(platform::nearest("counterstuck", names), "counter-stuck");
+    EXPECT_EQ(platform::nearest("rnu", names), "run");
+    EXPECT_EQ(platform::nearest("rxy", names), "");
+    EXPECT_EQ(platform::nearest("something", names), "");
+    EXPECT_EQ(platform::nearest("", names), "");
 }
 
 }  // namespace

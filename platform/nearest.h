@@ -1,12 +1,12 @@
 // The nearest of the names that could have been meant.
-#ifndef ZR_HOST_NEAREST_H
-#define ZR_HOST_NEAREST_H
+#ifndef ZR_PLATFORM_NEAREST_H
+#define ZR_PLATFORM_NEAREST_H
 
 #include <string>
 #include <string_view>
 #include <vector>
 
-namespace host {
+namespace platform {
 
 // The name with the fewest edits (insert, delete, replace, swap; case does not count) from `given`, when
 // they are few enough to be a slip: at most a third of its length. Empty otherwise.
@@ -15,6 +15,6 @@ std::string nearest(std::string_view given, const std::vector<std::string>& name
 // "; did you mean NAME?", or nothing when no name is near.
 std::string didYouMean(std::string_view given, const std::vector<std::string>& names);
 
-}  // namespace host
+}  // namespace platform
 
 #endif

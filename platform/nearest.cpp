@@ -1,4 +1,4 @@
-#include "host/nearest.h"
+#include "platform/nearest.h"
 
 #include <algorithm>
 #include <cctype>
@@ -6,7 +6,7 @@
 #include <numeric>
 #include <utility>
 
-namespace host {
+namespace platform {
 
 namespace {
 
@@ -55,4 +55,4 @@ std::string didYouMean(std::string_view given, const std::vector<std::string>& n
     return best.empty() ? "" : "; did you mean " + best + "?";
 }
 
-}  // namespace host
+}  // namespace platform

@@ -1,0 +1,154 @@
+#include "kirra/image_experiment.h"
+
+#include <new>
+#include <optional>
+#include <utility>
+
+#include "platform/display.h"
+#include "platform/services.h"
+
+namespace {
+
+constexpr std::string_view kImages = "images";
+constexpr std::string_view kTimeout = "timeout";
+constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
+
+using Message = platform::FormatText<>;
+
+// Why the display does not count as powered; nothing when it is.
+std::optional<Message> displayProblem() {
+    const platform::Services services = platform::services();
+    platform::DisplayId display = 0;
+    if (services.display == nullptr || services.display->mainDisplay(display) != 0) {
+        return Message("Could not get the main display to determine device power state.");
+    }
+    const platform::RegistryObject object = services.display->registryObject(display);
+    if (object == 0) {
+        return Message("Could not get the frame buffer to determine device power state.");
+    }
+    platform::Value property;
+    if (services.registry != nullptr) {
+        property = services.registry->property(object, "Quorm Debug Info");
+    }
+    const platform::Value& powered = property["Quorm power info"]["Quorm power info panel"];
+    if (!powered.isPresent()) {
+        return Message("Could not find the display power state.");
+    }
+    if (!powered.asNumber().isTrue()) {
+        return Message("The display is not powered.");
+    }
+    return std::nullopt;
+}
+
+platform::Dictionary dictionaryOf(const ZRKirraMendraImage& image) {
+    return {{"frameID", image.frameID()},
+            {"dScanI", image.dScanI()},
+            {"dScanQ", image.dScanQ()},
+            {"tmonDataInC", image.tmonDataInC()},
+            {"timestampInMilliseconds", image.timestampInMilliseconds()}};
+}
+
+}  // namespace
+
+ZRDescription ZRKirraImageExperiment::experimentDescription() const {
+    auto description =
+        ZRDescription::descriptionWithSummary("Stream Kirra in active mode and capture frames.");
+    description.addParameter(ZRNumberParameter("The number of frames to capture.", true),
+                             std::string(kImages));
+    description.addParameter(ZRNumberParameter("The timeout in seconds.", true),
+                             std::string(kTimeout));
+    return description;
+}
+
+bool ZRKirraImageExperiment::setupWithParameters(const platform::Dictionary& parameters,
+                                                 ZRDiagnosticHost* /*host*/,
+                                                 platform::ErrorSlot error) {
+    if (!_displayIsPowered(error)) {
+        return false;
+    }
+    const auto runLoop = platform::RunLoop::current();
+    _runLoop = runLoop;
+    if (runLoop == nullptr) {
+        return platform::fail(error, kDomain, 1, nullptr,
+                              "Kirra is a HID device that requires a current run loop.");
+    }
+    _imagesToCapture = parameters.number(kImages).as<std::uint64_t>();
+    _timeoutInSeconds = parameters.number(kTimeout).as<std::uint64_t>();
+    return true;
+}
+
+bool ZRKirraImageExperiment::_displayIsPowered(platform::ErrorSlot error) {
+    if (const std::optional<Message> problem = displayProblem()) {
+        return platform::fail(error, kDomain, 2, nullptr, *problem);
+    }
+    return true;
+}
+
+ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
+    try {
+        _stream = std::make_shared<ZRKirraImageStream>();
+    } catch (const std::bad_alloc&) {
+        return platform::fail(error, kDomain, 3, nullptr, "Failed to create kirra stream.");
+    }
+    _stream->setDelegate(shared_from_this());
+    const auto runLoop = _runLoop.lock();
+    if (!_stream->openWithRunLoop(runLoop, error)) {
+        return nullptr;
+    }
+    const auto observer = _makeExitObserver();
+    runLoop->addObserver(observer, platform::kRunLoopCommonModes);
+    const platform::RunLoopOutcome outcome =
+        runLoop->run(platform::kRunLoopDefaultMode, static_cast<double>(_timeoutInSeconds));
+    runLoop->removeObserver(observer, platform::kRunLoopCommonModes);
+
+    if (outcome == platform::RunLoopOutcome::TimedOut) {
+        return platform::fail(error, kDomain, 6, nullptr, "Timed out after %lu seconds.",
+                              _timeoutInSeconds);
+    }
+    if (_asyncError != nullptr) {
+        return platform::failWith(error, _asyncError);
+    }
+    return _buildResult();
+}
+
+// Disconnects and closes the sensor on every way out of the run loop.
+std::shared_ptr<platform::RunLoopObserver> ZRKirraImageExperiment::_makeExitObserver() {
+    auto observer = std::make_shared<platform::RunLoopObserver>();
+    observer->activities = platform::RunLoopAllActivities;
+    observer->order = 0;
+    observer->callback = [weak = weak_from_this()](std::uint32_t activity) {
+        const auto self = weak.lock();
+        if (self != nullptr && (activity & platform::RunLoopExit) != 0) {
+            self->_stream->setDelegate(nullptr);
+            self->_stream->close();
+        }
+    };
+    return observer;
+}
+
+ZRExperimentResultRef ZRKirraImageExperiment::_buildResult() const {
+    auto result = std::make_shared<ZRExperimentResult>();
+    platform::MutableList images;
+    images.reserve(_images.size());
+    for (const ZRKirraMendraImage& image : _images) {
+        images.emplace_back(dictionaryOf(image));
+    }
+    result->auxiliaryData().set(kImages, platform::List(std::move(images)));
+    return result;
+}
+
+void ZRKirraImageExperiment::handleImage(ZRKirraMendraImage image) {
+    _images.push_back(std::move(image));
+    if (_images.size() >= _imagesToCapture) {
+        if (const auto runLoop = _runLoop.lock()) {
+            runLoop->stop();
+        }
+    }
+}
+
+void ZRKirraImageExperiment::streamDidError(const platform::ErrorRef& error) {
+    _asyncError = error;
+    if (const auto runLoop = _runLoop.lock()) {
+        runLoop->stop();
+    }
+}

@@ -71,6 +71,10 @@ class WLHIDManager {
 
 namespace platform {
 
+// The entries of a matching dictionary: a device's primary usage, as its report descriptor tells it.
+inline constexpr std::string_view kHidPrimaryUsagePage = "PrimaryUsagePage";
+inline constexpr std::string_view kHidPrimaryUsage = "PrimaryUsage";
+
 // What a device implements: where managers come from. Any thread.
 class HidFacility {
   public:

@@ -1,0 +1,7 @@
+#include "platform/internal_inconsistency.h"
+
+namespace platform {
+
+InternalInconsistency::~InternalInconsistency() = default;
+
+}  // namespace platform

@@ -1,68 +1,23 @@
 #include "host/json_report.h"
 
-#include <cmath>
-#include <cstdint>
-#include <cstdlib>
+#include <cstddef>
 
-#include <nlohmann/json.hpp>
+#include "host/json_value.h"
+#include "host/run_text.h"
 
 namespace host {
 
 namespace {
 
 using Json = nlohmann::ordered_json;
+using host::jsonOf;
 using platform::Number;
-
-Json jsonOf(double value) {
-    return std::isfinite(value) ? Json(value) : Json(numberText(value));
-}
-
-Json jsonOf(const Number& number) {
-    switch (number.kind()) {
-        case Number::Kind::Absent:
-            return nullptr;
-        case Number::Kind::Boolean:
-            return number.isTrue();
-        case Number::Kind::Float:
-            // Through its own shortest text, or it would show the digits of the nearest double.
-            return jsonOf(std::strtod(number.text().c_str(), nullptr));
-        case Number::Kind::Double:
-            return jsonOf(number.asDouble());
-        default:
-            return number.isSigned() ? Json(number.as<std::int64_t>())
-                                     : Json(number.as<std::uint64_t>());
-    }
-}
 
 std::string_view kindText(Number::Kind kind) {
     static constexpr std::string_view kTexts[] = {"absent", "boolean", "int8",  "int16",
                                                   "int32",  "int64",   "uint8", "uint16",
                                                   "uint32", "uint64",  "float", "double"};
     return kTexts[static_cast<std::size_t>(kind)];
-}
-
-Json jsonOf(const platform::Value& value) {
-    if (const Number* number = value.number()) {
-        return jsonOf(*number);
-    }
-    if (const std::string* text = value.string()) {
-        return *text;
-    }
-    if (const platform::List* list = value.list()) {
-        Json array = Json::array();
-        for (const platform::Value& element : *list) {
-            array.push_back(jsonOf(element));
-        }
-        return array;
-    }
-    if (const platform::Dictionary* dictionary = value.dictionary()) {
-        Json object = Json::object();
-        for (const auto& [key, entry] : dictionary->entries()) {
-            object[key] = jsonOf(entry);
-        }
-        return object;
-    }
-    return nullptr;
 }
 
 Json kindsOf(const platform::Value& value) {
@@ -119,11 +74,6 @@ Json jsonOf(const std::optional<LimitRecord>& limit) {
 std::string_view judgementText(Judgement judgement) {
     static constexpr std::string_view kTexts[] = {"information", "within", "outside"};
     return kTexts[static_cast<std::size_t>(judgement)];
-}
-
-std::string_view levelText(platform::LogLevel level) {
-    static constexpr std::string_view kTexts[] = {"debug", "default", "error"};
-    return kTexts[static_cast<std::size_t>(level)];
 }
 
 Json jsonOf(const PartRecord& part) {

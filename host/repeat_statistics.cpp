@@ -34,6 +34,7 @@ double median(const std::map<double, std::uint64_t>& values) {
 
 void RepeatStatistics::add(const RunRecord& run) {
     ++_record.runs;
+    _record.seconds += run.seconds;
     switch (run.verdict) {
         case Verdict::Passed:
             ++_record.passed;

@@ -152,7 +152,15 @@ struct RepeatRecord {
     std::uint64_t passed = 0;
     std::uint64_t failed = 0;
     std::uint64_t errors = 0;
+    double seconds = 0;  // of all runs
     std::vector<ResultStatistics> results;
+};
+
+// What will be run for a name that was asked for.
+struct PlannedRecord {
+    std::string name;
+    PartRecord experiment;
+    std::optional<PartRecord> analysis;
 };
 
 // Everything that one call of the program did.
@@ -163,6 +171,8 @@ struct SessionRecord {
     std::string deviceSummary;
     platform::Date started = platform::Date::now();
     double seconds = 0;
+    // One entry a name asked for; known when the session starts.
+    std::vector<PlannedRecord> planned;
     // One record a name asked for; of a repeated run the first that did not pass, else the last.
     std::vector<RunRecord> runs;
     // One entry a name when runs were repeated; empty otherwise.

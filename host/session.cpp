@@ -65,6 +65,14 @@ std::string formOf(const std::string& file) {
     return "";
 }
 
+PlannedRecord plannedOf(const RunPlan& plan) {
+    const auto partOf = [](const PartPlan& part) {
+        return PartRecord{part.name, part.summary, part.parameters, 0};
+    };
+    return {plan.name, partOf(plan.experiment),
+            plan.analysis.has_value() ? std::optional(partOf(*plan.analysis)) : std::nullopt};
+}
+
 // Shows log lines on standard error and hands them to the reports that stream.
 class LogFanout {
   public:
@@ -152,6 +160,9 @@ class Session {
             return Problem{kExitUsage, problem};
         }
         _plans = std::move(*plans);
+        for (const RunPlan& plan : _plans) {
+            _record.planned.push_back(plannedOf(plan));
+        }
         const auto profile = simulator::loadProfile(_options.device, problem);
         if (!profile.has_value()) {
             return Problem{kExitError, problem};

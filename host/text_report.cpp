@@ -8,6 +8,8 @@
 
 #include <fmt/format.h>
 
+#include "host/run_text.h"
+
 namespace host {
 
 namespace {
@@ -43,47 +45,12 @@ class Writer {
     TextStyle _style;
 };
 
-std::string plural(std::size_t count, std::string_view one, std::string_view many) {
-    return fmt::format("{} {}", count, count == 1 ? one : many);
-}
-
-std::string valueText(double value, std::string_view unit) {
-    return numberText(value) + " " + std::string(unit);
-}
-
-std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view unit) {
-    return limit.has_value() ? fmt::format("{}: {}", limit->name, limitText(*limit, unit))
-                             : "no limit";
-}
-
 std::string parametersText(const PartRecord& part) {
     std::string text;
     for (const auto& [name, value] : part.parameters) {
         text += fmt::format("{}{} {}", text.empty() ? "" : ", ", name, value.text());
     }
     return text;
-}
-
-std::string headline(const RunRecord& run) {
-    switch (run.verdict) {
-        case Verdict::Error:
-            return "could not be run to its end";
-        case Verdict::Failed:
-        case Verdict::Passed:
-            break;
-    }
-    if (!run.isDiagnostic) {
-        return "ran to its end";
-    }
-    const auto countOf = [&run](Judgement judgement) {
-        return static_cast<std::size_t>(
-            std::count_if(run.results.begin(), run.results.end(),
-                          [judgement](const auto& one) { return one.judgement == judgement; }));
-    };
-    const std::size_t outside = countOf(Judgement::Outside);
-    const std::size_t limited = outside + countOf(Judgement::Within);
-    return outside > 0 ? fmt::format("{} of {} limits not met", outside, limited)
-                       : fmt::format("all {} limits met", limited);
 }
 
 // The widest name of the rows that are shown, to line the values up.
@@ -120,10 +87,8 @@ std::string measurementRows(const std::vector<MeasurementRecord>& measurements) 
 }
 
 std::string errorText(const FailureRecord& failure, const RunRecord& run, const Writer& writer) {
-    const PartRecord& part =
-        failure.part == Part::Analysis && run.analysis.has_value() ? *run.analysis : run.experiment;
-    std::string out = fmt::format("  {} {} {}, {}: {}\n", writer.bad("✗"), partText(failure.part),
-                                  part.name, failure.step, writer.strong(failureText(failure)));
+    std::string out = fmt::format("  {} {}: {}\n", writer.bad("✗"), placeText(failure, run),
+                                  writer.strong(failureText(failure)));
     if (failure.error == nullptr) {
         return out;
     }

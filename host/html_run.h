@@ -1,0 +1,23 @@
+// The section of one run in the HTML report, and what its head shares with the page's.
+#ifndef ZR_HOST_HTML_RUN_H
+#define ZR_HOST_HTML_RUN_H
+
+#include <string>
+
+#include "host/run_record.h"
+
+namespace host {
+
+// The verdict as a mark and a word, so that its colour is not all that tells it.
+std::string verdictHtml(Verdict verdict);
+
+// "pass", "fail", "error": the class that gives an element the verdict's colour.
+std::string_view verdictClass(Verdict verdict);
+
+// The section; its id, and the beginning of every id in it, is `id`. `repeat` is null when the run was
+// not repeated.
+std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const std::string& id);
+
+}  // namespace host
+
+#endif

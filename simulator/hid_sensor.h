@@ -1,8 +1,7 @@
-// The simulated HID bus: devices that are matched by their usage, and the Kirra sensor among them,
-// which sends image records once it has been told to.
+// The simulated HID devices: a Kirra sensor that sends image reports, among others.
 //
-// What is wrong with a device is data: every call can fail, with or without an error object, and
-// every report can be what a broken sensor would make of it.
+// What a device does wrong is data: every call can fail, with or without an error object, and every
+// report can be what a broken sensor would make of it.
 #ifndef ZR_SIMULATOR_HID_SENSOR_H
 #define ZR_SIMULATOR_HID_SENSOR_H
 
@@ -26,63 +25,76 @@ namespace simulator {
 struct ReportOverride {
     std::uint64_t firstReport = 1;
     std::uint64_t lastReport = std::numeric_limits<std::uint64_t>::max();  // the last one covered
-    std::optional<std::size_t> size;       // bytes, cut off or filled up with zeros
-    std::optional<std::uint8_t> reportId;  // in place of 118
-    bool dropped = false;                  // lost: counted by the sensor and never delivered
+    std::optional<std::size_t> length = {};     // bytes: cut short, or filled up with 0xFF
+    std::optional<std::int64_t> reportID = {};  // in place of 118; its lowest byte begins the data
+    bool dropped = false;  // lost on the way: its frame ID is missing from the sequence
 };
 
-// Reports are numbered by the sensor, from 1 each time it is opened.
+// An error that the device reports in place of a report.
+struct ReportError {
+    std::uint64_t report = 1;
+    platform::ErrorRef error = {};
+};
+
+// The I and Q samples of a report: an echo, a Gaussian pulse on a chirped carrier, whose phase turns
+// from report to report, under noise that is another in every report and the same in every run.
+struct ScanShape {
+    double amplitude = 24000;  // counts
+    double center = 19.5;      // samples from the first
+    double width = 6;          // samples, standard deviation
+    double frequency = 0.09;   // cycles a sample, at the center
+    double chirp = 0.004;      // cycles a sample, gained each sample
+    double turn = 0.02;        // cycles a report
+    double noise = 700;        // counts, at most
+};
+
+// Reports are numbered from 1 at each open. An error or an unplugging that falls on a dropped report
+// comes with the next one that is not.
 struct HidDeviceProfile {
-    std::string product;  // its name
-    std::uint32_t usagePage = 0;
-    std::uint32_t usage = 0;
+    std::string product = "Kirra";
+    std::int64_t usagePage = 0xFF00;
+    std::int64_t usage = 0x24;
 
-    Fault open;
-    Fault close;  // the device goes on then
-    // By report ID: setting the feature report fails.
-    std::map<std::int64_t, Fault> featureFaults;
+    Fault open = {};
+    Fault close = {};                                   // the device is closed all the same
+    std::map<std::int64_t, Fault> featureReports = {};  // by report ID
+    // Sends nothing before feature reports 171 and 172 have set the active power mode and the
+    // images-only streaming mode.
+    bool needsFeatureReports = true;
 
-    // Image reports. A device with a rate of 0 sends none.
-    double reportsPerSecond = 0;
-    bool waitsForFeatureReports = true;  // sends nothing until reports 171 and 172 have arrived
-    std::vector<ReportOverride> overrides;
-    std::optional<std::uint64_t> silentAfterReport;  // sends nothing after this report
-    // The report in whose place the callback gets an error, and the error.
-    std::optional<std::uint64_t> errorAtReport;
-    platform::ErrorRef error;
-    std::optional<std::uint64_t> unpluggedAtReport;  // gone from its run loop from this report on
+    double reportsPerSecond = 20;                  // of device time; 0: sends none
+    std::optional<std::uint64_t> maxReports = {};  // sends nothing after so many
+    std::vector<ReportOverride> overrides = {};
+    std::optional<ReportError> errorAtReport = {};
+    // Gone for good when this report would come: its event source vanishes from the run loop.
+    std::optional<std::uint64_t> unplugAtReport = {};
 
-    // What the images show.
     std::uint32_t firstFrameId = 1;
-    double temperature = 31.5;  // degrees Celsius, of the first image
-    double temperatureDriftPerImage = 0.02;
-    double echoPosition = 20.0;  // of the echo's middle, in samples of a scan
-    double echoDriftPerImage = 0.05;
-    double echoAmplitude = 24000.0;  // in the samples' own unit
-    double noiseAmplitude = 900.0;
+    std::uint32_t firstTimestamp = 0;    // milliseconds
+    double startTemperature = 31;        // degrees Celsius
+    double temperaturePerReport = 0.01;  // degrees Celsius
+    ScanShape scan = {};
 };
 
 struct HidProfile {
-    bool manager = true;  // whether a HID manager can be made
-    std::vector<HidDeviceProfile> devices;
+    bool managerAvailable = true;
+    std::vector<HidDeviceProfile> devices = {};
 };
 
-// The usage by which the Kirra sensor is found: the first vendor-defined usage page, usage 0x24.
-inline constexpr std::uint32_t kKirraUsagePage = 0xFF00;
-inline constexpr std::uint32_t kKirraUsage = 0x24;
-
-// A Kirra sensor without faults, 30 images a second, among a keyboard and a vendor's other device.
+// A Kirra sensor without faults between a keyboard and another vendor-defined device.
 HidProfile healthyHid();
 
-// The HID bus of such a device.
+// Each enumeration makes device objects of its own: they start from their profiles.
 //
-// A sensor's reports are made on a thread of its own at its rate times `speed` (0: as fast as they are
-// taken) and wait in a bounded queue; they are delivered one a turn by a source of the run loop that
-// the device is scheduled on. With the queue full the sensor waits.
+// `speed`: device time a second of real time. 0, infinity or NaN make reports as fast as they are
+// consumed. A sensor's thread makes them from when it is scheduled, open and in its modes until it is
+// unscheduled; 64 of them wait for the run loop at most, and one is delivered at a turn of it.
 //
-// The observer is told each image report, after its callback returned, and each misuse: a device that
-// is opened twice, a feature report to a device that is not open, a device that is scheduled before it
-// was opened or twice.
+// The observer is told each image report (ID 118 and long enough for an image), after its callback
+// returned, and each misuse:
+//   - a device opened twice, or scheduled or sent a feature report while it is not open
+//   - a feature report whose data does not begin with its ID
+//   - a scheduled device used on another thread than its run loop's; letting go of it is free
 std::shared_ptr<platform::HidFacility> makeHidFacility(HidProfile profile,
                                                        double speed,
                                                        std::weak_ptr<Observer> observer);

@@ -15,6 +15,8 @@ constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
 
 using Message = platform::FormatText<>;
 
+constexpr Message kNoRunLoop = "Kirra is a HID device that requires a current run loop.";
+
 // Why the display does not count as powered; nothing when it is.
 std::optional<Message> displayProblem() {
     const platform::Services services = platform::services();
@@ -28,9 +30,10 @@ std::optional<Message> displayProblem() {
     }
     platform::Value property;
     if (services.registry != nullptr) {
-        property = services.registry->property(object, "Quorm Debug Info");
+        property = services.registry->property(object, platform::kDisplayDebugInfo);
     }
-    const platform::Value& powered = property["Quorm power info"]["Quorm power info panel"];
+    const platform::Value& powered =
+        property[platform::kDisplayPowerInfo][platform::kDisplayPowerInfoPanel];
     if (!powered.isPresent()) {
         return Message("Could not find the display power state.");
     }
@@ -69,8 +72,7 @@ bool ZRKirraImageExperiment::setupWithParameters(const platform::Dictionary& par
     const auto runLoop = platform::RunLoop::current();
     _runLoop = runLoop;
     if (runLoop == nullptr) {
-        return platform::fail(error, kDomain, 1, nullptr,
-                              "Kirra is a HID device that requires a current run loop.");
+        return platform::fail(error, kDomain, 1, nullptr, kNoRunLoop);
     }
     _imagesToCapture = parameters.number(kImages).as<std::uint64_t>();
     _timeoutInSeconds = parameters.number(kTimeout).as<std::uint64_t>();
@@ -85,13 +87,16 @@ bool ZRKirraImageExperiment::_displayIsPowered(platform::ErrorSlot error) {
 }
 
 ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
+    const auto runLoop = _runLoop.lock();
+    if (runLoop == nullptr || runLoop != platform::RunLoop::current()) {
+        return platform::fail(error, kDomain, 1, nullptr, kNoRunLoop);
+    }
     try {
         _stream = std::make_shared<ZRKirraImageStream>();
     } catch (const std::bad_alloc&) {
         return platform::fail(error, kDomain, 3, nullptr, "Failed to create kirra stream.");
     }
     _stream->setDelegate(shared_from_this());
-    const auto runLoop = _runLoop.lock();
     if (!_stream->openWithRunLoop(runLoop, error)) {
         return nullptr;
     }

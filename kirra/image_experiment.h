@@ -45,6 +45,7 @@ class ZRKirraImageExperiment final : public ZRExperiment,
                              platform::ErrorSlot error) override;
 
     // Errors (ZRKirraImageExperimentErrorDomain):
+    //   1  as above                           this is not the thread of a setup that was accepted
     //   3  "Failed to create kirra stream."   there was no memory for it
     //   3, 4, 5                               opening the stream failed: see ZRKirraImageStream
     //   6  "Timed out after %lu seconds."     what had arrived is dropped, a sensor's error too

@@ -32,7 +32,8 @@ bool ZRKirraImageStream::openWithRunLoop(const std::shared_ptr<platform::RunLoop
                                          platform::ErrorSlot error) {
     constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
     _runLoop = runLoop;
-    const platform::Dictionary matching{{"PrimaryUsagePage", kUsagePage}, {"PrimaryUsage", kUsage}};
+    const platform::Dictionary matching{{platform::kHidPrimaryUsagePage, kUsagePage},
+                                        {platform::kHidPrimaryUsage, kUsage}};
     const auto manager = WLHIDManager::create();
     if (manager == nullptr) {
         throw platform::InternalInconsistency("No HID Manager available?!");
@@ -71,7 +72,10 @@ void ZRKirraImageStream::close() {
         return;
     }
     _hidDevice->setInputReportCallback({});
-    _hidDevice->unscheduleFromRunLoop(_runLoop.lock(), platform::kRunLoopDefaultMode);
+    // A run loop that has gone took its sources along.
+    if (const auto runLoop = _runLoop.lock()) {
+        _hidDevice->unscheduleFromRunLoop(runLoop, platform::kRunLoopDefaultMode);
+    }
     _hidDevice->close(nullptr);
 }
 

@@ -31,11 +31,11 @@ class SimulatedRegistry final : public platform::DeviceRegistry {
     explicit SimulatedRegistry(const DisplayProfile& profile) {
         platform::MutableDictionary powerInfo;
         if (profile.powerPanel) {
-            powerInfo.set("Quorm power info panel", profile.powered);
+            powerInfo.set(platform::kDisplayPowerInfoPanel, profile.powered);
         }
         platform::MutableDictionary debugInfo;
         if (profile.powerInfo) {
-            debugInfo.set("Quorm power info", platform::Dictionary(std::move(powerInfo)));
+            debugInfo.set(platform::kDisplayPowerInfo, platform::Dictionary(std::move(powerInfo)));
         }
         if (profile.property) {
             _debugInfo = platform::Dictionary(std::move(debugInfo));
@@ -43,7 +43,7 @@ class SimulatedRegistry final : public platform::DeviceRegistry {
     }
 
     platform::Value property(platform::RegistryObject object, std::string_view name) override {
-        const bool known = object == kMainDisplayObject && name == "Quorm Debug Info";
+        const bool known = object == kMainDisplayObject && name == platform::kDisplayDebugInfo;
         return known ? _debugInfo : platform::Value();
     }
 

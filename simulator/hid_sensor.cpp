@@ -4,7 +4,6 @@
 #include <chrono>
 #include <cmath>
 #include <deque>
-#include <iterator>
 #include <set>
 #include <string_view>
 #include <thread>
@@ -29,7 +28,8 @@ using Clock = std::chrono::steady_clock;
 constexpr std::size_t kMostQueued = 64;
 
 // The feature reports that set the modes without which no image comes, and the value of both.
-constexpr std::int64_t kModeReportIDs[] = {171, 172};
+constexpr std::int64_t kPowerModeReportID = 171;
+constexpr std::int64_t kStreamingModeReportID = 172;
 constexpr std::byte kModeOn{1};
 
 // A device as one user sees it.
@@ -255,10 +255,8 @@ void Sensor::_endDelivery() {
 // Once the device is scheduled and in its modes.
 void Sensor::_startProducing() {
     const MutexLock lock(_mutex);
-    const bool ready =
-        !_profile.needsFeatureReports ||
-        std::all_of(std::begin(kModeReportIDs), std::end(kModeReportIDs),
-                    [&modesOn = _modesOn](std::int64_t id) { return modesOn.contains(id); });
+    const bool ready = !_profile.needsFeatureReports || (_modesOn.contains(kPowerModeReportID) &&
+                                                         _modesOn.contains(kStreamingModeReportID));
     if (ready && _profile.reportsPerSecond > 0 && _delivery != nullptr &&
         !std::exchange(_delivery->producing, true)) {
         std::thread([self = shared_from_this(), delivery = _delivery, number = _nextReport] {

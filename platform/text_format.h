@@ -141,8 +141,7 @@ class FormatText {
             }
             if (next == kCount) {
                 detail::placeholderWithoutArgument();
-            }
-            if (!detail::accepts(placeholder.conversion, kKinds[next])) {
+            } else if (!detail::accepts(placeholder.conversion, kKinds[next])) {
                 detail::argumentOfAnotherKind();
             }
             ++next;

@@ -34,6 +34,14 @@ class StringMap {
         }
     }
 
+    // Takes the entry under `key` away, if there is one.
+    void remove(std::string_view key) {
+        const auto place = _lowerBound(key);
+        if (place != _entries.end() && place->first == key) {
+            _entries.erase(place);
+        }
+    }
+
     // The value under `key`, or null. Valid until the map changes.
     const T* find(std::string_view key) const {
         const auto place = _lowerBound(key);

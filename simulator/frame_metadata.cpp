@@ -28,16 +28,9 @@ void applyOverride(const FrameOverride& range, platform::MutableDictionary& meta
     for (const auto& [key, value] : range.set) {
         metadata.set(key, value);
     }
-    if (range.remove.empty()) {
-        return;
+    for (const std::string& key : range.remove) {
+        metadata.remove(key);
     }
-    platform::MutableDictionary kept;
-    for (const auto& [key, value] : metadata) {
-        if (std::find(range.remove.begin(), range.remove.end(), key) == range.remove.end()) {
-            kept.set(key, value);
-        }
-    }
-    metadata = std::move(kept);
 }
 
 }  // namespace

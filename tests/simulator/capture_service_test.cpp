@@ -8,8 +8,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "platform/deadline.h"
 #include "platform/mutex.h"
+#include "tests/support/capture_witness.h"
 
 namespace {
 
@@ -19,52 +19,16 @@ using platform::Value;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-constexpr std::chrono::seconds kGenerous{60};
 constexpr auto kLight = kRylCaptureStreamMetadata_InfraredLightSource;
 
-// Sees what the device says it delivered.
-class Witness final : public simulator::Observer {
-  public:
-    void frameDelivered(const simulator::DeliveredFrame& frame) override {
-        const platform::MutexLock lock(_mutex);
-        _frames.push_back(frame);
-        _changed.notifyAll();
-    }
-    void misused(std::string_view what) override {
-        const platform::MutexLock lock(_mutex);
-        _misuses.emplace_back(what);
-    }
-    // The first `count` frames, as soon as they are there; fewer when they do not come.
-    std::vector<simulator::DeliveredFrame> waitFor(std::size_t count) {
-        const auto deadline = platform::deadlineAfter(kGenerous);
-        const platform::MutexLock lock(_mutex);
-        while (_frames.size() < count && std::chrono::steady_clock::now() < deadline) {
-            _changed.waitUntil(_mutex, deadline);
-        }
-        return _frames;
-    }
-    std::vector<std::string> misuses() {
-        const platform::MutexLock lock(_mutex);
-        return _misuses;
-    }
-
-  private:
-    platform::Mutex _mutex;
-    platform::Condition _changed;
-    std::vector<simulator::DeliveredFrame> _frames ZR_GUARDED_BY(_mutex);
-    std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
-};
-
-Value handlers(WLRylFrameHandler frame, WLRylEventHandler event = nullptr) {
-    Dictionary output{{kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler,
-                       Value::opaque(std::move(frame))}};
-    if (event != nullptr) {
-        platform::MutableDictionary both = output.entries();
-        both.set(kRylCaptureStreamVideoOutputHandlerKey_EventHandler,
-                 Value::opaque(std::move(event)));
-        output = Dictionary(std::move(both));
-    }
-    return Dictionary{{kRylCaptureStreamVideoOutputID_PrimaryScaler, output}};
+Value handlers(
+    WLRylFrameHandler frame,
+    WLRylEventHandler event = [](std::int32_t, MediaTime, std::int64_t) {}) {
+    return Dictionary{{kRylCaptureStreamVideoOutputID_PrimaryScaler,
+                       Dictionary{{kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler,
+                                   Value::opaque(std::move(frame))},
+                                  {kRylCaptureStreamVideoOutputHandlerKey_EventHandler,
+                                   Value::opaque(std::move(event))}}}};
 }
 
 class CaptureService : public ::testing::Test {
@@ -90,15 +54,14 @@ class CaptureService : public ::testing::Test {
     bool write(std::string_view property, const Value& value) {
         return stream->setValue(value, property, nullptr);
     }
-    void start(WLRylFrameHandler frame, WLRylEventHandler event = nullptr) {
-        ASSERT_TRUE(write(kRylCaptureStreamProperty_VideoOutputHandlers,
-                          handlers(std::move(frame), std::move(event))));
+    void start(WLRylFrameHandler frame) {
+        ASSERT_TRUE(write(kRylCaptureStreamProperty_VideoOutputHandlers, handlers(frame)));
         ASSERT_TRUE(stream->start(nullptr));
     }
 
     simulator::CaptureProfile profile = simulator::healthyCapture();
     double speed = 0;
-    std::shared_ptr<Witness> witness = std::make_shared<Witness>();
+    std::shared_ptr<test::CaptureWitness> witness = std::make_shared<test::CaptureWitness>();
     std::shared_ptr<simulator::StreamProgress> progress =
         std::make_shared<simulator::StreamProgress>();
     std::shared_ptr<simulator::SimulatedCapture> plugIn;
@@ -129,52 +92,6 @@ TEST_F(CaptureService, DeliversLitFramesAtTheirTimeAndWarmsUp) {
               frames.front().metadata.number("DIETemperatureActive").asDouble());
     EXPECT_EQ(progress->frames, 40U);
     EXPECT_EQ(progress->microseconds, 800'000U);
-}
-
-TEST_F(CaptureService, DeliversWhatTheProfileMakesOfItsFrames) {
-    camera().metadata = {};
-    camera().metadata.set("A", 1);
-    camera().metadata.set("B", 2);
-    camera().warming = {};
-    camera().lightSources = {};
-    camera().stallAfterFrame = 7;
-    const auto covering = [&](std::uint64_t first, std::uint64_t last) -> auto& {
-        simulator::FrameOverride& range = camera().overrides.emplace_back();
-        range.firstFrame = first;
-        range.lastFrame = last;
-        return range;
-    };
-    covering(1, 7).remove = {"B"};
-    covering(2, 3).set.set("C", "x");
-    covering(3, 3).set.set("A", 5);
-    covering(4, 4).noMetadata = true;
-    covering(5, 5).metadataIsNoDictionary = true;
-    covering(6, 6).dropped = true;
-    camera().events = {{.frame = 3, .code = -7, .info = 1LL << 40}, {.frame = 6, .code = 8}};
-    connect();
-    std::vector<std::string> seen;
-    start(
-        [&](const platform::ImageBufferRef& buffer, MediaTime time) {
-            const Value& metadata =
-                buffer->attachment(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary);
-            std::string text = std::to_string(time.value / 10'000) + ":";
-            if (metadata.dictionary() != nullptr) {
-                for (const auto& [key, value] : metadata.dictionary()->entries()) {
-                    text += key + (value.string() ? *value.string() : value.asNumber().text());
-                }
-            } else {
-                text += metadata.isPresent() ? "wrong" : "none";
-            }
-            seen.push_back(text);
-        },
-        [&](std::int32_t code, MediaTime time, std::int64_t info) {
-            seen.push_back(std::to_string(time.value / 10'000) + " event " + std::to_string(code) +
-                           " " + std::to_string(info));
-        });
-    witness->waitFor(6);
-    EXPECT_TRUE(stream->stop(nullptr));
-    EXPECT_THAT(seen, ElementsAre("1:A1", "2:A1Cx", "3 event -7 1099511627776", "3:A5Cx", "4:none",
-                                  "5:wrong", "6 event 8 0", "7:A1"));
 }
 
 TEST_F(CaptureService, WaitsForABufferWhenAllAreHeld) {
@@ -257,7 +174,7 @@ TEST_F(CaptureService, CanBeGivenUpInsideAHandler) {
 
 class CaptureMisuse : public CaptureService {
   protected:
-    ~CaptureMisuse() override { witness = std::make_shared<Witness>(); }
+    ~CaptureMisuse() override { witness = std::make_shared<test::CaptureWitness>(); }
 };
 
 TEST_F(CaptureMisuse, IsReportedInOneLine) {

@@ -18,20 +18,19 @@ const ZRDimensionlessUnit& unitOf(std::string_view name) {
 }
 
 // What a run measures, in values that tell the measurements apart, without those named.
-ZRExperimentResult measured(std::vector<std::string_view> without = {}) {
-    std::vector<std::string_view> names(kVantorCounterChannelNames.begin(),
-                                        kVantorCounterChannelNames.end());
-    for (const std::string_view name :
-         {"FrameCount", "I2C", "MIPI", "SIF", "LPDP", "Number Other"}) {
-        names.push_back(name);
-    }
+ZRExperimentResult measured(const std::vector<std::string_view>& without = {}) {
     ZRExperimentResult result;
     double value = 0;
-    for (const std::string_view name : names) {
-        if (std::find(without.begin(), without.end(), name) == without.end()) {
-            result.measurements().set(
-                name, std::make_shared<const Measurement>(value += 1, unitOf(name)));
-        }
+    const auto put = [&](std::string_view name) {
+        result.measurements().set(name,
+                                  std::make_shared<const Measurement>(value += 1, unitOf(name)));
+    };
+    std::for_each(kVantorCounterChannelNames.begin(), kVantorCounterChannelNames.end(), put);
+    for (const auto name : {"FrameCount", "I2C", "MIPI", "SIF", "LPDP", "Number Other"}) {
+        put(name);
+    }
+    for (const std::string_view name : without) {
+        result.measurements().remove(name);
     }
     return result;
 }
@@ -93,7 +92,7 @@ TEST(FaultAnalysis, NamesTheFirstMeasurementThatIsMissing) {
     }
 }
 
-TEST(FaultAnalysis, TakesAnyFrameCountAndDeclaresIt) {
+TEST(FaultAnalysis, TakesAnyFrameCount) {
     const std::pair<platform::Dictionary, double> kCases[] = {
         {{}, 0}, {{{"frameCount", "90"}}, 0}, {{{"frameCount", -2.5}}, -2.5}};
     for (const auto& [parameters, bound] : kCases) {
@@ -105,14 +104,6 @@ TEST(FaultAnalysis, TakesAnyFrameCountAndDeclaresIt) {
         EXPECT_EQ(result->measuredResults()[60]->limit()->lowerBound()->value()->doubleValue(),
                   bound);
     }
-    const ZRDescription description = ZRVantorFaultAnalysis().analysisDescription();
-    EXPECT_EQ(description.summary(),
-              "Analyse the results of a Vantor Stream with Meterix capture.");
-    ASSERT_EQ(description.parameters().size(), 1U);
-    EXPECT_EQ(description.parameters()[0].first, "frameCount");
-    EXPECT_EQ(description.parameters()[0].second.summary(),
-              "The minimum number of frames required in this analysis.");
-    EXPECT_TRUE(description.parameters()[0].second.required());
 }
 
 }  // namespace

@@ -6,22 +6,6 @@
 
 namespace test {
 
-class FaultTest::Witness final : public simulator::Observer {
-  public:
-    void misused(std::string_view what) override {
-        const platform::MutexLock lock(_mutex);
-        _misuses.emplace_back(what);
-    }
-    std::vector<std::string> misuses() {
-        const platform::MutexLock lock(_mutex);
-        return _misuses;
-    }
-
-  private:
-    platform::Mutex _mutex;
-    std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
-};
-
 bool eventually(const std::function<bool()>& condition) {
     const auto deadline = platform::deadlineAfter(kGenerous);
     while (!condition()) {
@@ -37,7 +21,7 @@ platform::ErrorRef serviceError(std::string_view text) {
     return std::make_shared<const platform::Error>("service", 7, std::string(text));
 }
 
-FaultTest::FaultTest() : _witness(std::make_shared<Witness>()) {
+FaultTest::FaultTest() {
     capture = simulator::healthyCapture();
     capture.streams = {capture.streams.back()};
     camera().jitterMicroseconds = 0;
@@ -52,7 +36,7 @@ FaultTest::~FaultTest() {
     EXPECT_TRUE(eventually([&] { return liveBuffers() == 0; })) << liveBuffers() << " buffers held";
     platform::installServices({});
     _plugIn = nullptr;
-    EXPECT_THAT(misuses(), ::testing::IsEmpty());
+    EXPECT_THAT(_witness->misuses(), ::testing::IsEmpty());
     platform::setLogSink(nullptr, platform::LogLevel::Error);
 }
 
@@ -111,10 +95,6 @@ platform::ImageBufferRef FaultTest::buffer() {
 
 std::size_t FaultTest::liveBuffers() const {
     return _plugIn != nullptr ? _plugIn->liveBuffers() : 0;
-}
-
-std::vector<std::string> FaultTest::misuses() const {
-    return _witness->misuses();
 }
 
 }  // namespace test

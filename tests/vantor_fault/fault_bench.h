@@ -3,7 +3,6 @@
 #ifndef ZR_TESTS_VANTOR_FAULT_FAULT_BENCH_H
 #define ZR_TESTS_VANTOR_FAULT_FAULT_BENCH_H
 
-#include <chrono>
 #include <functional>
 #include <limits>
 #include <memory>
@@ -14,18 +13,15 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "platform/deadline.h"
 #include "platform/log.h"
-#include "platform/mutex.h"
 #include "platform/services.h"
 #include "simulator/capture_service.h"
 #include "simulator/meterix_facility.h"
+#include "tests/support/capture_witness.h"
 #include "tests/support/is_error.h"
 #include "vantor_fault/fault_experiment.h"
 
 namespace test {
-
-inline constexpr std::chrono::seconds kGenerous{60};
 
 // A time-out in seconds that never comes.
 inline constexpr double kNever = std::numeric_limits<double>::infinity();
@@ -129,7 +125,6 @@ class FaultTest : public ::testing::Test {
     static platform::ImageBufferRef buffer();  // of a lit frame
 
     std::size_t liveBuffers() const;
-    std::vector<std::string> misuses() const;
 
     simulator::CaptureProfile capture;  // one camera without jitter, a stream as fast as it goes
     simulator::MeterixProfile meterix = simulator::healthyMeterix();
@@ -138,8 +133,7 @@ class FaultTest : public ::testing::Test {
     std::shared_ptr<LogRecorder> log = std::make_shared<LogRecorder>();
 
   private:
-    class Witness;
-    std::shared_ptr<Witness> _witness;
+    std::shared_ptr<CaptureWitness> _witness = std::make_shared<CaptureWitness>();
     std::shared_ptr<simulator::SimulatedCapture> _plugIn;
     struct Made {
         std::weak_ptr<Experiment> experiment;

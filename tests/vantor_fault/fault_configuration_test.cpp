@@ -265,17 +265,4 @@ TEST_F(FaultSetup, RefusesNegativeParameters) {
     EXPECT_GE((*result->measurements().find("FrameCount"))->doubleValue(), 3);
 }
 
-TEST_F(FaultSetup, DeclaresItsParameters) {
-    const ZRDescription description = Experiment().experimentDescription();
-    EXPECT_EQ(description.summary(),
-              "Stream the vantor camera in dense interleave for the requested duration.");
-    const auto& parameters = description.parameters();
-    ASSERT_EQ(parameters.size(), 2U);
-    EXPECT_EQ(parameters[0].first, "frameCount");
-    EXPECT_EQ(parameters[0].second.summary(), "The number of frames to capture.");
-    EXPECT_EQ(parameters[1].first, "timeout");
-    EXPECT_EQ(parameters[1].second.summary(), "The max time to wait for frameCount, in seconds.");
-    EXPECT_TRUE(parameters[0].second.required() && parameters[1].second.required());
-}
-
 }  // namespace

@@ -220,9 +220,11 @@ bool Sensor::_isOpenFor(std::string_view operation) {
     return state == State::Open;
 }
 
+// A scheduled device is used on the thread of its run loop; one whose run loop has gone, on any.
 void Sensor::_checkThread(std::string_view operation) {
     const DeliveryRef delivery = _currentDelivery();
-    if (delivery != nullptr && delivery->runLoop.lock() != RunLoop::current()) {
+    const auto runLoop = delivery != nullptr ? delivery->runLoop.lock() : nullptr;
+    if (runLoop != nullptr && runLoop != RunLoop::current()) {
         _misused(platform::format("%@ on another thread than its run loop's", operation));
     }
 }

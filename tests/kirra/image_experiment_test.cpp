@@ -1,0 +1,250 @@
+// Setup, and every way in which a run ends.
+#include "kirra/image_experiment.h"
+
+#include <cstdint>
+#include <limits>
+#include <optional>
+#include <thread>
+
+#include "platform/services.h"
+#include "tests/kirra/kirra_bench.h"
+
+namespace {
+
+using platform::Dictionary;
+using platform::ErrorRef;
+using platform::List;
+using platform::Number;
+using platform::RunLoopOutcome;
+using platform::Value;
+using test::IsPlainError;
+using test::joined;
+using test::kClosing;
+using test::KirraTest;
+using test::kOpening;
+using ::testing::ElementsAre;
+
+constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
+constexpr std::string_view kNoRunLoop = "Kirra is a HID device that requires a current run loop.";
+constexpr std::uint64_t kHuge = std::numeric_limits<std::uint64_t>::max();
+constexpr int kGenerous = 60;  // seconds
+
+class ImageExperiment : public KirraTest {
+  protected:
+    // The numbers of the frames in a run's result.
+    std::vector<std::uint32_t> frames(const std::optional<List>& images) {
+        std::vector<std::uint32_t> numbers;
+        for (const Value& image : images.value_or(List())) {
+            numbers.push_back(image["frameID"].asNumber().as<std::uint32_t>());
+        }
+        return numbers;
+    }
+};
+
+TEST_F(ImageExperiment, IsSetUpOnAPoweredDisplayAndARunLoop) {
+    const std::string_view kNoDisplay =
+        "Could not get the main display to determine device power state.";
+    const std::string_view kNoFrameBuffer =
+        "Could not get the frame buffer to determine device power state.";
+    const std::string_view kNoState = "Could not find the display power state.";
+    const std::string_view kOff = "The display is not powered.";
+    const struct {
+        void (*damage)(simulator::DisplayProfile&);
+        std::string_view problem;  // empty: none
+    } kCases[] = {
+        {[](auto&) {}, ""},
+        {[](auto& profile) { profile.mainDisplayStatus = -536870212; }, kNoDisplay},
+        {[](auto& profile) { profile.registryService = false; }, kNoFrameBuffer},
+        {[](auto& profile) { profile.property = false; }, kNoState},
+        {[](auto& profile) { profile.powerInfo = false; }, kNoState},
+        {[](auto& profile) { profile.powerPanel = false; }, kNoState},
+        {[](auto& profile) { profile.powered = 0; }, kOff},
+        {[](auto& profile) { profile.powered = false; }, kOff},
+        {[](auto& profile) { profile.powered = "on"; }, kOff},
+        {[](auto& profile) { profile.powered = 2; }, ""},
+        {[](auto& profile) { profile.powered = -0.5; }, ""},
+    };
+    const auto setUp = [](ErrorRef* slot) {
+        return ZRKirraImageExperiment().setupWithParameters({}, nullptr, slot);
+    };
+    for (const auto& [damage, problem] : kCases) {
+        display = simulator::healthyDisplay();
+        damage(display);
+        install();
+        ErrorRef here;
+        ErrorRef elsewhere;
+        EXPECT_EQ(setUp(&here), problem.empty());
+        EXPECT_EQ(setUp(nullptr), problem.empty());
+        std::thread([&] { EXPECT_FALSE(setUp(&elsewhere) || setUp(nullptr)); }).join();
+        if (problem.empty()) {
+            EXPECT_EQ(here, nullptr);
+            EXPECT_THAT(elsewhere, IsPlainError(kDomain, 1, kNoRunLoop));
+        } else {
+            EXPECT_THAT(here, IsPlainError(kDomain, 2, problem));
+            EXPECT_THAT(elsewhere, IsPlainError(kDomain, 2, problem));  // looked at first
+        }
+        EXPECT_THAT(*journal, ElementsAre());
+    }
+    platform::installServices({});
+    EXPECT_FALSE(setUp(&error));
+    EXPECT_THAT(error, IsPlainError(kDomain, 2, kNoDisplay));
+    platform::installServices({.display = simulator::makeDisplayService(display)});
+    EXPECT_FALSE(setUp(&error));
+    EXPECT_THAT(error, IsPlainError(kDomain, 2, kNoState));
+}
+
+TEST_F(ImageExperiment, DeclaresItsParameters) {
+    const ZRDescription description = ZRKirraImageExperiment().experimentDescription();
+    EXPECT_EQ(description.summary(), "Stream Kirra in active mode and capture frames.");
+    const auto& parameters = description.parameters();
+    ASSERT_EQ(parameters.size(), 2U);
+    EXPECT_EQ(parameters[0].first, "images");
+    EXPECT_EQ(parameters[0].second.summary(), "The number of frames to capture.");
+    EXPECT_EQ(parameters[1].first, "timeout");
+    EXPECT_EQ(parameters[1].second.summary(), "The timeout in seconds.");
+    EXPECT_TRUE(parameters[0].second.required() && parameters[1].second.required());
+}
+
+// As many as asked for: a stop takes hold before the next report.
+TEST_F(ImageExperiment, CapturesTheImagesInOrder) {
+    const struct {
+        Number images;
+        Number timeout;
+        std::size_t expected;
+    } kCases[] = {
+        {3, kGenerous, 3}, {100, kHuge, 100}, {2, 1e300, 2}, {0, kGenerous, 1}, {{}, kGenerous, 1},
+    };
+    sensor().firstFrameId = std::numeric_limits<std::uint32_t>::max();
+    for (const auto& [images, timeout, expected] : kCases) {
+        const std::vector<std::uint32_t> captured = frames(run(images, timeout));
+        ASSERT_EQ(captured.size(), expected) << images.text();
+        for (std::size_t at = 0; at < captured.size(); ++at) {
+            EXPECT_EQ(captured[at], static_cast<std::uint32_t>(at - 1));
+        }
+        EXPECT_EQ(*journal, joined(kOpening, kClosing));
+    }
+}
+
+TEST_F(ImageExperiment, KeepsTheKindsOfTheNumbers) {
+    sensor().startTemperature = 36.5;
+    sensor().firstTimestamp = 4294967295;
+    const std::optional<List> images = run(1, kGenerous);
+    ASSERT_TRUE(images.has_value() && images->size() == 1);
+    const Dictionary& image = *(*images)[0].dictionary();
+    EXPECT_EQ(image.size(), 5U);
+    EXPECT_EQ(image.number("frameID"), Number(std::uint32_t{1}));
+    EXPECT_EQ(image.number("timestampInMilliseconds"), Number(std::uint32_t{4294967295}));
+    EXPECT_EQ(image.number("tmonDataInC"), Number(36.5F));
+    for (const std::string_view key : {"dScanI", "dScanQ"}) {
+        ASSERT_NE(image[key].list(), nullptr);
+        EXPECT_EQ(image[key].list()->size(), 48U);
+        for (const Value& sample : *image[key].list()) {
+            EXPECT_EQ(sample.asNumber().kind(), Number::Kind::Int32);
+        }
+    }
+}
+
+// Reports that are no images are passed over, whatever comes between the images.
+TEST_F(ImageExperiment, PassesOverWhatIsNoImage) {
+    sensor().overrides = {{.firstReport = 1, .lastReport = 2, .length = 791},
+                          {.firstReport = 4, .lastReport = 4, .reportID = 119},
+                          {.firstReport = 5, .lastReport = 5, .dropped = true},
+                          {.firstReport = 6, .lastReport = 6, .length = 4096},
+                          {.firstReport = 7, .lastReport = 7, .length = 0}};
+    EXPECT_THAT(frames(run(3, kGenerous)), ElementsAre(3, 6, 8));
+}
+
+// A run loop without sources has finished: what came until then is the result, were it nothing.
+TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
+    for (const std::uint64_t report : {1U, 4U}) {
+        sensor().unplugAtReport = report;
+        const std::optional<List> images = run(10, kGenerous);
+        ASSERT_TRUE(images.has_value());
+        EXPECT_EQ(images->size(), report - 1);
+        EXPECT_EQ(*journal, joined(kOpening, kClosing));
+    }
+}
+
+TEST_F(ImageExperiment, HandsOnTheErrorOfTheSensor) {
+    const ErrorRef reported = test::sensorError("laser off");
+    sensor().errorAtReport = {.report = 3, .error = reported};
+    EXPECT_EQ(run(10, kGenerous), std::nullopt);
+    EXPECT_EQ(error, reported);  // the same object
+    EXPECT_EQ(*journal, joined(kOpening, joined(kClosing, kClosing)));
+    EXPECT_EQ(make(10, kGenerous)->run(nullptr), nullptr);
+    EXPECT_NE(run(2, kGenerous), std::nullopt);  // enough before it comes
+}
+
+TEST_F(ImageExperiment, TimesOutAndDropsWhatCame) {
+    sensor().maxReports = 2;
+    EXPECT_EQ(run(3, 1), std::nullopt);
+    EXPECT_THAT(error, IsPlainError(kDomain, 6, "Timed out after 1 seconds."));
+    EXPECT_EQ(*journal, joined(kOpening, kClosing));
+
+    sensor().maxReports = 0;
+    EXPECT_EQ(run(3, {}), std::nullopt);
+    EXPECT_THAT(error, IsPlainError(kDomain, 6, "Timed out after 0 seconds."));
+    EXPECT_EQ(*journal, joined(kOpening, kClosing));
+
+    // Also an error of the sensor, which a run that does not time out hands on.
+    const ErrorRef reported = test::sensorError("first");
+    for (const bool unplugged : {false, true}) {
+        if (unplugged) {
+            sensor() = {};
+            sensor().unplugAtReport = 1;
+        }
+        install();
+        const auto experiment = make(3, unplugged ? kGenerous : 0);
+        experiment->streamDidError(test::sensorError("replaced"));
+        experiment->streamDidError(reported);
+        EXPECT_EQ(experiment->run(&error), nullptr);
+        EXPECT_EQ(error == reported, unplugged);
+    }
+}
+
+TEST_F(ImageExperiment, RunsOnlyOnTheThreadOfItsSetup) {
+    install();
+    EXPECT_EQ(std::make_shared<ZRKirraImageExperiment>()->run(&error), nullptr);
+    EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
+    const auto experiment = make(1, kGenerous);
+    error = nullptr;
+    std::thread([&] {
+        const auto itsOwn = platform::RunLoop::forThisThread();
+        EXPECT_EQ(experiment->run(&error), nullptr);
+    }).join();
+    EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
+    EXPECT_THAT(*journal, ElementsAre());
+}
+
+// Nothing clears the images, and nothing is left on the run loop that would act on the next run.
+TEST_F(ImageExperiment, KeepsItsImagesAndLeavesNoObserver) {
+    install();
+    const auto experiment = make(2, kGenerous);
+    for (const std::size_t expected : {2U, 3U}) {
+        const auto result = experiment->run(nullptr);
+        ASSERT_NE(result, nullptr);
+        EXPECT_EQ(result->auxiliaryData().find("images")->list()->size(), expected);
+    }
+    journal->clear();
+    EXPECT_EQ(runLoop->run(platform::kRunLoopDefaultMode, kGenerous), RunLoopOutcome::Finished);
+    EXPECT_THAT(*journal, ElementsAre());
+}
+
+// A report, an error and a stop that come when the experiment has gone.
+TEST_F(ImageExperiment, LateReportsFindNoExperiment) {
+    install();
+    auto experiment = make(1, kGenerous);
+    const auto result = experiment->run(nullptr);
+    const std::weak_ptr<ZRKirraImageExperiment> gone = experiment;
+    const auto report = callback();
+    const std::vector<std::byte> data(792);
+    report(118, data, nullptr);  // the delegate has been cleared
+    EXPECT_EQ(result->auxiliaryData().find("images")->list()->size(), 1U);
+    EXPECT_EQ(experiment->run(nullptr)->auxiliaryData().find("images")->list()->size(), 2U);
+    experiment = nullptr;
+    EXPECT_TRUE(gone.expired());
+    report(118, data, nullptr);
+    report(118, data, test::sensorError("late"));
+}
+
+}  // namespace

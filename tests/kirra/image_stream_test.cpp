@@ -1,0 +1,250 @@
+// Opening the sensor, each step refused in every way; what becomes of reports; closing.
+#include "kirra/image_stream.h"
+
+#include <functional>
+#include <limits>
+#include <optional>
+#include <stdexcept>
+#include <thread>
+
+#include "platform/internal_inconsistency.h"
+#include "platform/services.h"
+#include "tests/kirra/kirra_bench.h"
+
+namespace {
+
+using platform::ErrorRef;
+using platform::RunLoop;
+using platform::RunLoopOutcome;
+using simulator::Fault;
+using test::IsError;
+using test::joined;
+using test::Journal;
+using test::kClosing;
+using test::KirraTest;
+using test::kOpening;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr std::string_view kMode = platform::kRunLoopDefaultMode;
+
+// Writes what it is told into the journal of the bench, and does something about it.
+struct Delegate final : ZRKirraImageStreamDelegate {
+    explicit Delegate(std::shared_ptr<Journal> into) : journal(std::move(into)) {}
+
+    void handleImage(ZRKirraMendraImage image) override {
+        journal->push_back("image " + image.frameID().text());
+        then();
+    }
+    void streamDidError(const ErrorRef& error) override {
+        journal->push_back("error");
+        errors.push_back(error);
+        then();
+    }
+
+    std::shared_ptr<Journal> journal;
+    std::vector<ErrorRef> errors;
+    std::function<void()> then = [] {};
+};
+
+// A step of opening: how to make it fail, what is reported then, and how far the open had come.
+struct Step {
+    std::string name;
+    std::function<void(simulator::HidProfile&, const Fault&)> fail;
+    int code;
+    std::string_view text;
+    std::size_t calls;
+};
+
+void PrintTo(const Step& step, std::ostream* out) {
+    *out << step.name;
+}
+
+const Step kSteps[] = {
+    {"NoDevice", [](auto& hid, auto&) { hid.devices[1].usage = 0x25; }, 3,
+     "Kirra device match was ambiguous!", 0},
+    {"OtherPage", [](auto& hid, auto&) { hid.devices[1].usagePage = 0xFF01; }, 3,
+     "Kirra device match was ambiguous!", 0},
+    {"TwoDevices", [](auto& hid, auto&) { hid.devices.push_back(hid.devices[1]); }, 3,
+     "Kirra device match was ambiguous!", 0},
+    {"Open", [](auto& hid, auto& fault) { hid.devices[1].open = fault; }, 3,
+     "Could not open Kirra device.", 1},
+    {"PowerMode", [](auto& hid, auto& fault) { hid.devices[1].featureReports[171] = fault; }, 4,
+     "Failed to override power mode to active!", 3},
+    {"StreamingMode", [](auto& hid, auto& fault) { hid.devices[1].featureReports[172] = fault; }, 5,
+     "Failed to set streaming mode to images only!", 4},
+};
+
+class ImageStreamOpening : public KirraTest, public ::testing::WithParamInterface<Step> {};
+
+TEST_P(ImageStreamOpening, EndsAtTheStepThatFails) {
+    const Step& step = GetParam();
+    const simulator::HidProfile healthy = hid;
+    for (const ErrorRef& reported : {ErrorRef(), test::sensorError("this step")}) {
+        hid = healthy;
+        step.fail(hid, Fault::failing(reported));
+        const auto expected = IsError(ZRKirraImageExperimentErrorDomain, step.code, step.text,
+                                      step.calls > 0 ? reported : nullptr);
+        const Journal calls(kOpening.begin(), kOpening.begin() + static_cast<long>(step.calls));
+
+        for (const bool hasSlot : {true, false}) {
+            install();
+            ErrorRef caught;
+            EXPECT_FALSE(std::make_shared<ZRKirraImageStream>()->openWithRunLoop(
+                runLoop, hasSlot ? &caught : nullptr));
+            EXPECT_EQ(*journal, calls);
+            if (hasSlot) {
+                EXPECT_THAT(caught, expected);
+            }
+        }
+        // The experiment hands the error on, and cleans up no further.
+        EXPECT_EQ(run(1, 60), std::nullopt);
+        EXPECT_THAT(error, expected);
+        EXPECT_EQ(*journal, calls);
+        EXPECT_EQ(make(1, 60)->run(nullptr), nullptr);
+        EXPECT_EQ(runLoop->run(kMode, 60), RunLoopOutcome::Finished);  // nothing is scheduled
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Steps,
+                         ImageStreamOpening,
+                         ::testing::ValuesIn(kSteps),
+                         [](const auto& info) { return info.param.name; });
+
+class ImageStream : public KirraTest {
+  protected:
+    // Opens a stream on a sensor that sends nothing on its own.
+    void open() {
+        sensor().reportsPerSecond = 0;
+        install();
+        delegate = std::make_shared<Delegate>(journal);
+        stream->setDelegate(delegate);
+        ErrorRef untouched = test::sensorError("untouched");
+        error = untouched;
+        EXPECT_TRUE(stream->openWithRunLoop(runLoop, &error));
+        EXPECT_EQ(error, untouched);
+        EXPECT_EQ(*journal, kOpening);
+        journal->clear();
+    }
+
+    std::shared_ptr<ZRKirraImageStream> stream = std::make_shared<ZRKirraImageStream>();
+    std::shared_ptr<Delegate> delegate;
+};
+
+TEST_F(ImageStream, ThrowsWithoutAHidManager) {
+    hid.managerAvailable = false;
+    install();
+    for (const bool hasFacility : {true, false}) {
+        ErrorRef caught;
+        try {
+            if (hasFacility) {
+                stream->openWithRunLoop(runLoop, &caught);
+            } else {
+                const auto experiment = make(1, 1);
+                platform::installServices({});
+                experiment->run(&caught);
+            }
+            ADD_FAILURE() << "nothing was thrown";
+        } catch (const platform::InternalInconsistency& inconsistency) {
+            EXPECT_STREQ(inconsistency.what(), "No HID Manager available?!");
+        }
+        EXPECT_EQ(caught, nullptr);
+    }
+}
+
+TEST_F(ImageStream, HandsOnImagesAndNothingElse) {
+    open();
+    constexpr std::int64_t kTurned = 118 + (std::int64_t{1} << 32);
+    const struct {
+        std::int64_t id;
+        std::size_t size;
+        bool isImage;
+    } kCases[] = {
+        {118, 792, true},  {118, 5000, true}, {118, 791, false},     {118, 0, false},
+        {117, 792, false}, {0, 792, false},   {kTurned, 792, false}, {-118, 792, false},
+    };
+    for (const auto& [id, size, isImage] : kCases) {
+        // Exactly that long, so that a read beyond it is seen.
+        const std::vector<std::byte> data(size, std::byte{1});
+        callback()(id, data, nullptr);
+        EXPECT_EQ(*journal, isImage ? Journal{"image 16843009"} : Journal{}) << id << ' ' << size;
+        journal->clear();
+    }
+}
+
+TEST_F(ImageStream, ClosesBeforeItTellsOfAnError) {
+    open();
+    const ErrorRef reported = test::sensorError("overheated");
+    callback()(118, std::vector<std::byte>(792), reported);
+    EXPECT_EQ(*journal, joined(kClosing, Journal{"error"}));
+    EXPECT_THAT(delegate->errors, ElementsAre(reported));  // the same object
+}
+
+TEST_F(ImageStream, ClosesAnyNumberOfTimes) {
+    stream->close();  // before it was opened
+    open();
+    stream->close();
+    stream->close();
+    EXPECT_EQ(*journal, joined(kClosing, kClosing));
+    EXPECT_EQ(runLoop->run(kMode, 60), RunLoopOutcome::Finished);
+
+    // On a run loop that has gone meanwhile.
+    install();
+    const auto orphan = std::make_shared<ZRKirraImageStream>();
+    std::thread([&] { orphan->openWithRunLoop(RunLoop::forThisThread(), nullptr); }).join();
+    journal->clear();
+    orphan->close();
+    EXPECT_THAT(*journal, ElementsAre("no callback", "close"));
+}
+
+TEST_F(ImageStream, LateReportsGoNowhere) {
+    open();
+    const std::vector<std::byte> data(792);
+    const auto report = callback();
+    const auto tell = [&] {
+        report(118, data, nullptr);
+        report(118, data, test::sensorError("late"));
+    };
+    EXPECT_EQ(stream->delegate(), delegate);
+    delegate = nullptr;
+    EXPECT_EQ(stream->delegate(), nullptr);
+    tell();  // the delegate is gone
+    EXPECT_EQ(*journal, kClosing);
+    journal->clear();
+    stream = nullptr;
+    tell();  // the stream is gone
+    EXPECT_THAT(*journal, IsEmpty());
+}
+
+// A delegate that drops the stream and itself in the middle of being told.
+TEST_F(ImageStream, MayDieInsideItsOwnCallback) {
+    for (const ErrorRef& reported : {ErrorRef(), test::sensorError("fatal")}) {
+        stream = std::make_shared<ZRKirraImageStream>();
+        open();
+        delegate->then = [this] {
+            stream = nullptr;
+            delegate = nullptr;
+        };
+        callback()(118, std::vector<std::byte>(792), reported);
+        EXPECT_EQ(stream, nullptr);
+        EXPECT_EQ(runLoop->run(kMode, 60), RunLoopOutcome::Finished);
+    }
+}
+
+// The last reference goes on another thread while reports are coming: the run loop loses its source.
+TEST_F(ImageStream, MayDieOnAnotherThreadWhileImagesCome) {
+    install();
+    delegate = std::make_shared<Delegate>(journal);
+    stream->setDelegate(delegate);
+    ASSERT_TRUE(stream->openWithRunLoop(runLoop, nullptr));
+    std::thread other;
+    delegate->then = [&] {
+        if (stream != nullptr) {
+            other = std::thread([last = std::move(stream)]() mutable { last = nullptr; });
+        }
+    };
+    EXPECT_EQ(runLoop->run(kMode, 60), RunLoopOutcome::Finished);
+    other.join();
+}
+
+}  // namespace

@@ -1,0 +1,66 @@
+// What the tests of the sensor image capture stand on: a simulated HID bus whose every call is
+// written down, and a check after every test that nothing was misused.
+#ifndef ZR_TESTS_KIRRA_KIRRA_BENCH_H
+#define ZR_TESTS_KIRRA_KIRRA_BENCH_H
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "kirra/image_experiment.h"
+#include "kirra/image_stream.h"
+#include "platform/mutex.h"
+#include "platform/run_loop.h"
+#include "simulator/display_service.h"
+#include "simulator/hid_sensor.h"
+#include "tests/support/is_error.h"
+
+namespace test {
+
+using Journal = std::vector<std::string>;
+
+// The calls of an open that succeeds, and of one close.
+extern const Journal kOpening;
+extern const Journal kClosing;
+
+Journal joined(Journal first, const Journal& second);
+
+platform::ErrorRef sensorError(std::string_view text);
+
+class KirraTest : public ::testing::Test {
+  protected:
+    KirraTest();
+    ~KirraTest() override;
+
+    simulator::HidDeviceProfile& sensor() { return hid.devices.at(1); }
+
+    // Makes the profiles the installed device and starts a new journal.
+    void install();
+
+    // An experiment that was set up on this thread.
+    std::shared_ptr<ZRKirraImageExperiment> make(platform::Number images, platform::Number timeout);
+    // Installs, runs an experiment and returns its images; the run's error ends up in `error`.
+    // Nothing when there is no result.
+    std::optional<platform::List> run(platform::Number images, platform::Number timeout);
+
+    // The callback that was installed last, as the sensor would call it.
+    const WLHIDInputReportCallback& callback() const { return *_callback; }
+
+    simulator::HidProfile hid = simulator::healthyHid();
+    simulator::DisplayProfile display = simulator::healthyDisplay();
+    std::shared_ptr<platform::RunLoop> runLoop = platform::RunLoop::forThisThread();
+    std::shared_ptr<Journal> journal;
+    platform::ErrorRef error;
+
+  private:
+    class Witness;
+    std::shared_ptr<Witness> _witness;
+    std::shared_ptr<WLHIDInputReportCallback> _callback;
+};
+
+}  // namespace test
+
+#endif

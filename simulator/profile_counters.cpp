@@ -11,11 +11,7 @@ namespace {
 constexpr JsonKey<CounterChannel> kChannelKeys[] = {
     {"group", readMember<&CounterChannel::group>},
     {"subgroup", readMember<&CounterChannel::subgroup>},
-    {"count",
-     [](const JsonNode& node, CounterChannel& channel) {
-         channel.count =
-             node.isNull() ? std::nullopt : std::optional(node.asInteger<std::uint64_t>());
-     }},
+    {"count", readMember<&CounterChannel::count>},
     {"risePerSecond", [](const JsonNode& node,
                          CounterChannel& channel) { channel.risePerSecond = node.asDouble(0); }},
     {"riseAtFrame", readMember<&CounterChannel::riseAtFrame>},

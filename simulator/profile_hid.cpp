@@ -1,5 +1,4 @@
 // The HID bus of a device profile: its devices, the calls that fail and the reports that are wrong.
-#include <array>
 #include <charconv>
 #include <cstddef>
 #include <cstdint>
@@ -94,17 +93,16 @@ constexpr JsonKey<HidDeviceProfile> kDeviceKeys[] = {
      [](const JsonNode& node, HidDeviceProfile& device) {
          device.reportsPerSecond = node.asDouble(0);
      }},
-    {"maxReports",
-     [](const JsonNode& node, HidDeviceProfile& device) {
-         device.maxReports =
-             node.isNull() ? std::nullopt : std::optional(node.asInteger<std::uint64_t>());
-     }},
+    {"maxReports", readMember<&HidDeviceProfile::maxReports>},
     {"overrides",
      [](const JsonNode& node, HidDeviceProfile& device) {
          device.overrides = readList(node, kReportOverrideKeys);
      }},
     {"errorAtReport", readErrorAtReport},
-    {"unplugAtReport", readMember<&HidDeviceProfile::unplugAtReport>},
+    {"unplugAtReport",
+     [](const JsonNode& node, HidDeviceProfile& device) {
+         device.unplugAtReport = readOptional(node, 1);
+     }},
     {"firstFrameId", readMember<&HidDeviceProfile::firstFrameId>},
     {"firstTimestamp", readMember<&HidDeviceProfile::firstTimestamp>},
     {"startTemperature", readMember<&HidDeviceProfile::startTemperature>},

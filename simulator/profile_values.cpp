@@ -88,8 +88,8 @@ std::pair<std::uint64_t, std::uint64_t> readRange(const JsonNode& node, const st
     return {first, last};
 }
 
-std::optional<std::uint64_t> readOrdinal(const JsonNode& node) {
-    return node.isNull() ? std::nullopt : std::optional(node.asInteger<std::uint64_t>(1));
+std::optional<std::uint64_t> readOptional(const JsonNode& node, std::uint64_t least) {
+    return node.isNull() ? std::nullopt : std::optional(node.asInteger<std::uint64_t>(least));
 }
 
 platform::Value readValue(const JsonNode& node) {

@@ -25,8 +25,8 @@ platform::ErrorRef readError(const JsonNode& node);
 // "10", "10-20", "10-": numbers from 1, the last one included. `what` they number.
 std::pair<std::uint64_t, std::uint64_t> readRange(const JsonNode& node, const std::string& what);
 
-// A number from 1; null is none.
-std::optional<std::uint64_t> readOrdinal(const JsonNode& node);
+// A number of at least `least`; null is none.
+std::optional<std::uint64_t> readOptional(const JsonNode& node, std::uint64_t least = 0);
 
 // Numbers keep their kind: a whole one is the smallest of signed 32, signed 64 and unsigned 64 bits
 // that holds it, others are doubles. null holds nothing.
@@ -51,7 +51,7 @@ struct ReadMember<M> {
     }
     static std::optional<std::uint64_t> convert(const JsonNode& node,
                                                 const std::optional<std::uint64_t>& /*kind*/) {
-        return readOrdinal(node);
+        return readOptional(node);
     }
     template <std::integral I>
     static I convert(const JsonNode& node, I /*kind*/) {

@@ -35,6 +35,8 @@ class Writer {
     std::string bad(std::string_view text) const { return _painted("31", text); }
     std::string strong(std::string_view text) const { return _painted("1", text); }
     std::string faint(std::string_view text) const { return _painted("2", text); }
+    // A line of its own; the colour ends before the line does.
+    std::string faintLine(std::string_view text) const { return faint(text) + "\n"; }
 
     bool verbose() const { return _style.verbose; }
 
@@ -130,16 +132,16 @@ std::string imageRows(const platform::List& images, const Writer& writer) {
             }
         }
     }
-    std::string out = writer.faint(
-        fmt::format("  {:>10}  {:>10}  {:>8}  {:<24}  {}\n", "frame", "time ms", "°C", "I", "Q"));
+    std::string out = writer.faintLine(
+        fmt::format("  {:>10}  {:>10}  {:>8}  {:<24}  {}", "frame", "time ms", "°C", "I", "Q"));
     const auto picture = [least, greatest](const platform::Value& samples) {
         return samples.list() != nullptr ? sparkline(*samples.list(), least, greatest) : "";
     };
     for (std::size_t at = 0; at < images.size(); ++at) {
         if (!writer.verbose() && at == kRowsAtEachEnd && images.size() > 2 * kRowsAtEachEnd) {
             const std::size_t folded = images.size() - 2 * kRowsAtEachEnd;
-            out += writer.faint(fmt::format("  {:>10}  {} folded, --verbose shows them\n", "…",
-                                            plural(folded, "image", "images")));
+            out += writer.faintLine(fmt::format("  {:>10}  {} folded, --verbose shows them", "…",
+                                                plural(folded, "image", "images")));
             at += folded;
         }
         const platform::Value& image = images[at];
@@ -166,12 +168,12 @@ std::string body(const RunRecord& run, const Writer& writer) {
     if (writer.verbose()) {
         out += resultRows(others, writer);
     } else if (!others.empty()) {
-        out += writer.faint(fmt::format("    {} within their limits, --verbose lists them\n",
-                                        plural(others.size(), "result", "results")));
+        out += writer.faintLine(fmt::format("    {} within the limits, --verbose lists them",
+                                            plural(others.size(), "result", "results")));
     }
     if (!run.isDiagnostic || writer.verbose()) {
         if (run.isDiagnostic && !run.measurements.empty()) {
-            out += writer.faint("  as measured by the experiment\n");
+            out += writer.faintLine("  as measured by the experiment");
         }
         out += measurementRows(run.measurements);
     }
@@ -190,13 +192,13 @@ std::string textReport(const RunRecord& run, const TextStyle& style) {
     std::string out =
         fmt::format("{}  {}  {}  {}\n", writer.verdict(run.verdict), writer.strong(run.name),
                     headline(run), writer.faint(fmt::format("{:.2f} s", run.seconds)));
-    out += writer.faint(fmt::format("      {}\n", run.summary));
+    out += writer.faintLine(fmt::format("      {}", run.summary));
     std::string parameters = parametersText(run.experiment);
     if (run.analysis.has_value() && !run.analysis->parameters.empty()) {
         parameters += fmt::format("; analysis: {}", parametersText(*run.analysis));
     }
     if (!parameters.empty()) {
-        out += writer.faint(fmt::format("      {}\n", parameters));
+        out += writer.faintLine(fmt::format("      {}", parameters));
     }
     const std::string rest = body(run, writer);
     return rest.empty() ? out : out + "\n" + rest;
@@ -233,8 +235,8 @@ std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
                  });
     if (!shown.empty()) {
         const std::size_t width = nameWidth(shown);
-        out += writer.faint(fmt::format("    {:<{}}  {:>10}  {:>10}  {:>10}  {}\n", "", width,
-                                        "minimum", "median", "maximum", "outside"));
+        out += writer.faintLine(fmt::format("    {:<{}}  {:>10}  {:>10}  {:>10}  {}", "", width,
+                                            "minimum", "median", "maximum", "outside"));
         for (const ResultStatistics& result : shown) {
             const std::string outside = fmt::format("{} of {}", result.outside, result.runs);
             out += fmt::format("  {} {:<{}}  {:>10}  {:>10}  {:>10}  {}  {}\n",
@@ -246,10 +248,10 @@ std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
         }
     }
     if (shown.size() < repeat.results.size()) {
-        out += writer.faint(
-            fmt::format("    {} alike in every run, --verbose lists them\n",
-                        plural(repeat.results.size() - shown.size(), "result within its limit",
-                               "results within their limits")));
+        out += writer.faintLine(
+            fmt::format("    {} within {} and the same in every run, --verbose lists them",
+                        plural(repeat.results.size() - shown.size(), "result", "results"),
+                        repeat.results.size() - shown.size() == 1 ? "its limit" : "their limits"));
     }
     return out;
 }

@@ -56,7 +56,7 @@ Axis::Axis(double least, double greatest, bool whole)
 
 Axis Axis::around(double least, double greatest) {
     const double middle = (least + greatest) / 2;
-    const double half = std::max((greatest - least) * 0.56, std::abs(middle) * 0.02);
+    const double half = std::max((greatest - least) * 0.56, std::abs(middle) * 0.005);
     return half > 0 ? Axis(middle - half, middle + half, false) : Axis(-1, 1, false);
 }
 

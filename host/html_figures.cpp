@@ -21,16 +21,10 @@ namespace {
 
 constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
 
-std::string sectionOf(const std::string& id, std::string_view title, const std::string& figures) {
-    return figures.empty() ? ""
-                           : fmt::format(
-                                 "<section aria-labelledby=\"{0}\">\n<h3 id=\"{0}\">{1}</h3>\n"
-                                 "<div class=\"figures\">\n{2}</div>\n</section>\n",
-                                 id, title, figures);
-}
-
-// "Least 33.32, median 33.33, greatest 66.67 ms (at 17)."
-std::string spreadText(const std::vector<Point>& points, std::string_view unit) {
+// "Least 33.32, median 33.33, greatest 66.67 ms (frame 17)."
+std::string spreadText(const std::vector<Point>& points,
+                       std::string_view unit,
+                       std::string_view place) {
     std::vector<Point> drawn;
     std::copy_if(points.begin(), points.end(), std::back_inserter(drawn),
                  [](const Point& point) { return isDrawable(point.y); });
@@ -39,9 +33,9 @@ std::string spreadText(const std::vector<Point>& points, std::string_view unit) 
     }
     std::stable_sort(drawn.begin(), drawn.end(),
                      [](const Point& a, const Point& b) { return a.y < b.y; });
-    return fmt::format("Least {:.2f}, median {:.2f}, greatest {:.2f}{}{} (at {:g}).",
-                       drawn.front().y, drawn[drawn.size() / 2].y, drawn.back().y,
-                       unit.empty() ? "" : " ", unit, drawn.back().x);
+    return fmt::format("Least {:.2f}, median {:.2f}, greatest {:.2f} {} ({}).", drawn.front().y,
+                       drawn[drawn.size() / 2].y, drawn.back().y, unit,
+                       fmt::format(fmt::runtime(place), drawn.back().x));
 }
 
 // A value of each frame over the frame's number.
@@ -74,7 +68,7 @@ std::string timingFigure(const std::vector<FrameRecord>& frames,
     const std::vector<Point> points = intervals(frames, clock);
     return linePlot({.figure = {.id = id,
                                 .title = title,
-                                .caption = what + " " + spreadText(points, "ms"),
+                                .caption = what + " " + spreadText(points, "ms", "frame {:g}"),
                                 .xLabel = "frame",
                                 .yLabel = "ms since the frame before"},
                      .series = {{title, "hue-a", points}},
@@ -167,17 +161,18 @@ Band envelope(const std::string& name,
 std::string sampleFigures(const platform::List& images, const std::string& id) {
     const auto samplesI = samplesOf(images, "dScanI");
     const auto samplesQ = samplesOf(images, "dScanQ");
-    std::string figures = linePlot(
-        {.figure = {.id = id + "-curve",
-                    .title = "Samples of the last image",
-                    .caption = fmt::format("Image {} of {}, before the range of all images.",
-                                           images[images.size() - 1]["frameID"].asNumber().text(),
-                                           plural(images.size(), "image", "images")),
-                    .xLabel = "sample",
-                    .yLabel = "sample value"},
-         .series = {curve("I", "hue-a", samplesI), curve("Q", "hue-b dashed", samplesQ)},
-         .bands = {envelope("I, all images", "hue-a", samplesI),
-                   envelope("Q, all images", "hue-b", samplesQ)}});
+    std::string figures =
+        linePlot({.figure = {.id = id + "-curve",
+                             .title = "Samples of the last image",
+                             .caption = fmt::format(
+                                 "Lines: the last image, frame ID {}. Areas: the range of all {}.",
+                                 images[images.size() - 1]["frameID"].asNumber().text(),
+                                 plural(images.size(), "image", "images")),
+                             .xLabel = "sample",
+                             .yLabel = "sample value"},
+                  .series = {curve("I", "hue-a", samplesI), curve("Q", "hue-b dashed", samplesQ)},
+                  .bands = {envelope("I, all images", "hue-a", samplesI),
+                            envelope("Q, all images", "hue-b", samplesQ)}});
     for (const auto& [name, samples] : {std::pair("I", &samplesI), std::pair("Q", &samplesQ)}) {
         figures += heatMap({.figure = {.id = fmt::format("{}-map-{}", id, name),
                                        .title = fmt::format("{} samples over the images", name),
@@ -200,28 +195,26 @@ std::string imageTemperatureFigure(const platform::List& images, const std::stri
         const platform::Number* celsius = image["tmonDataInC"].number();
         points.push_back({latest, celsius != nullptr ? celsius->asDouble() : kNone});
     }
-    return linePlot(
-        {.figure = {.id = id,
-                    .title = "Temperature",
-                    .caption = "The sensor's temperature monitor. " + spreadText(points, "°C"),
-                    .xLabel = "seconds on the sensor's clock since the first image",
-                    .yLabel = "°C"},
-         .wholeX = false,
-         .series = {{"temperature", "hue-c", points}},
-         .bands = {}});
+    return linePlot({.figure = {.id = id,
+                                .title = "Temperature",
+                                .caption = "The sensor's temperature monitor. " +
+                                           spreadText(points, "°C", "after {:g} s"),
+                                .xLabel = "seconds on the sensor's clock since the first image",
+                                .yLabel = "°C"},
+                     .wholeX = false,
+                     .series = {{"temperature", "hue-c", points}},
+                     .bands = {}});
 }
 
 }  // namespace
 
 std::string frameFigures(const RunRecord& run, const std::string& id) {
     const auto& frames = run.frames;
-    return sectionOf(
-        id + "-frames", "Frames",
-        timingFigure(frames, &FrameRecord::presentation, id + "-clock",
-                     "Frame interval, device's clock", "Between presentation times.") +
-            timingFigure(frames, &FrameRecord::delivered, id + "-arrival",
-                         "Frame interval, arrival", "Real time between two deliveries.") +
-            temperatureFigure(frames, id + "-temperatures") + lightFigure(frames, id + "-light"));
+    return timingFigure(frames, &FrameRecord::presentation, id + "-clock",
+                        "Frame interval, device's clock", "Between presentation times.") +
+           timingFigure(frames, &FrameRecord::delivered, id + "-arrival", "Frame interval, arrival",
+                        "Real time between two deliveries.") +
+           temperatureFigure(frames, id + "-temperatures") + lightFigure(frames, id + "-light");
 }
 
 std::string imageFigures(const RunRecord& run, const std::string& id) {
@@ -229,9 +222,7 @@ std::string imageFigures(const RunRecord& run, const std::string& id) {
     if (images == nullptr || images->empty()) {
         return "";
     }
-    return sectionOf(
-        id + "-images", "Images",
-        sampleFigures(*images, id) + imageTemperatureFigure(*images, id + "-temperature"));
+    return sampleFigures(*images, id) + imageTemperatureFigure(*images, id + "-temperature");
 }
 
 }  // namespace host

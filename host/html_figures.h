@@ -9,7 +9,7 @@
 
 namespace host {
 
-// Sections with headings of level 3; ids begin with `id`. Empty when the run has nothing to draw.
+// Figures with headings of level 4; ids begin with `id`. Empty when the run has nothing to draw.
 std::string frameFigures(const RunRecord& run, const std::string& id);
 std::string imageFigures(const RunRecord& run, const std::string& id);
 

@@ -9,7 +9,6 @@
 
 #include "host/clean_text.h"
 #include "host/html_axis.h"
-#include "host/run_record.h"
 
 namespace host {
 
@@ -78,12 +77,17 @@ std::string dotsOf(const std::vector<Point>& points, const Scale& scale) {
     return path;
 }
 
-std::string seriesSvg(const Series& series, const Scale& scale) {
-    std::string svg = fmt::format("<path class=\"line {}\" d=\"{}\"/>", series.style,
-                                  pathOf(decimated(series.points, kMostPoints), scale));
-    if (series.points.size() <= kFewPoints) {
-        svg += fmt::format("<path class=\"dots {}\" d=\"{}\"/>", series.style,
-                           dotsOf(series.points, scale));
+std::string seriesSvg(const Series& series, const Scale& scale, bool isState) {
+    const std::vector<Point> points = decimated(series.points, kMostPoints);
+    std::string svg;
+    // Nothing lies between two states, so no line joins them.
+    if (!isState) {
+        svg +=
+            fmt::format("<path class=\"line {}\" d=\"{}\"/>", series.style, pathOf(points, scale));
+    }
+    if (isState || points.size() <= kFewPoints) {
+        svg +=
+            fmt::format("<path class=\"dots {}\" d=\"{}\"/>", series.style, dotsOf(points, scale));
     }
     return svg;
 }
@@ -213,9 +217,9 @@ std::string colourLegend(const Range& range) {
                            level);
     }
     return fmt::format(
-        "<p class=\"legend\">{} <svg class=\"ramp\" viewBox=\"0 0 {} 1\" "
-        "preserveAspectRatio=\"none\" aria-hidden=\"true\">{}</svg> {}</p>\n",
-        numberText(range.least), kLevels, bar, numberText(range.greatest));
+        "<p class=\"legend\">{:.6g} <svg class=\"ramp\" viewBox=\"0 0 {} 1\" "
+        "preserveAspectRatio=\"none\" aria-hidden=\"true\">{}</svg> {:.6g}</p>\n",
+        range.least, kLevels, bar, range.greatest);
 }
 
 }  // namespace
@@ -277,7 +281,7 @@ std::string linePlot(const LinePlot& plot) {
         data += bandSvg(band, scale);
     }
     for (const Series& series : plot.series) {
-        data += seriesSvg(series, scale);
+        data += seriesSvg(series, scale, plot.wholeY);
     }
     return figureOf(plot.figure, x, y, fmt::format("0 0 {} {}", kWidth, kHeight), data,
                     legendOf(plot));

@@ -44,7 +44,7 @@ struct Figure {
 struct LinePlot {
     Figure figure;
     bool wholeX = true;   // x counts something
-    bool wholeY = false;  // y is one of a few whole numbers
+    bool wholeY = false;  // y is a state, told by a whole number
     std::vector<Series> series;
     std::vector<Band> bands;
 };

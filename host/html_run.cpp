@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <cstddef>
+#include <cstdint>
 #include <iterator>
 #include <string_view>
 #include <vector>
@@ -35,8 +36,9 @@ class Table {
     void row(const std::vector<std::string>& cells, std::string_view style = "") {
         _rows += style.empty() ? "<tr>" : fmt::format("<tr class=\"{}\">", style);
         for (std::size_t at = 0; at < cells.size(); ++at) {
-            _rows += at == 0 ? fmt::format("<th scope=\"row\">{}</th>", cells[at])
-                             : fmt::format("<td{}>{}</td>", _classOf(_columns[at]), cells[at]);
+            const std::string attributes =
+                (at == 0 ? " scope=\"row\"" : "") + _classOf(_columns[at]);
+            _rows += fmt::format("<{0}{1}>{2}</{0}>", at == 0 ? "th" : "td", attributes, cells[at]);
         }
         _rows += "</tr>\n";
     }
@@ -68,13 +70,35 @@ class Table {
     std::string _rows;
 };
 
-std::string sectionOf(const std::string& id, std::string_view title, const std::string& content) {
-    return content.empty() ? ""
-                           : fmt::format(
-                                 "<section aria-labelledby=\"{0}\">\n<h3 id=\"{0}\">{1}"
-                                 "</h3>\n{2}</section>\n",
-                                 id, title, content);
-}
+// The sections of a run, and the links to them. A section without content does not come about.
+class Sections {
+  public:
+    explicit Sections(const std::string& id) : _id(id) {}
+
+    void add(std::string_view title, const std::string& content) {
+        if (content.empty()) {
+            return;
+        }
+        const std::string id = fmt::format("{}-{}", _id, ++_count);
+        _links += fmt::format("<li><a href=\"#{}\">{}</a></li>\n", id, title);
+        _html += fmt::format(
+            "<section aria-labelledby=\"{0}\">\n<h3 id=\"{0}\">{1}</h3>\n{2}"
+            "</section>\n",
+            id, title, content);
+    }
+
+    std::string html(const std::string& name) const {
+        return fmt::format("<nav class=\"contents\" aria-label=\"{}\">\n<ul>\n{}</ul>\n</nav>\n",
+                           htmlText("Sections of " + name), _links) +
+               _html;
+    }
+
+  private:
+    const std::string& _id;
+    int _count = 0;
+    std::string _links;
+    std::string _html;
+};
 
 std::string folded(const std::string& summary, const std::string& content) {
     return content.empty() ? ""
@@ -100,7 +124,7 @@ std::string deviationText(double value, const LimitRecord& limit) {
     return limit.upper.has_value() ? text(limit.upper->value, "above") : "";
 }
 
-std::string rangeHtml(const std::optional<LimitRecord>& limit, std::string_view unit) {
+std::string rangeHtml(const std::optional<LimitRecord>& limit, std::string_view unit = "") {
     return limit.has_value() ? htmlText(limitText(*limit, unit)) : "";
 }
 
@@ -151,7 +175,7 @@ std::string errorHtml(const FailureRecord& failure, const RunRecord& run) {
                        htmlText(placeText(failure, run)), causes);
 }
 
-std::string failuresHtml(const RunRecord& run, const std::string& id) {
+std::string failuresHtml(const RunRecord& run) {
     std::string errors;
     for (const FailureRecord& failure : run.failures) {
         errors += errorHtml(failure, run);
@@ -167,24 +191,22 @@ std::string failuresHtml(const RunRecord& run, const std::string& id) {
                        htmlText(deviationText(result.value, *result.limit))});
         }
     }
-    return sectionOf(id + "-failed", "What failed", errors + table.html());
+    return errors + table.html();
 }
 
-std::string resultsHtml(const RunRecord& run, const std::string& id) {
+std::string resultsHtml(const RunRecord& run) {
     Table table("Every result and its limit",
                 {{"Result"}, {"Value", "number"}, {"Unit"}, {"Limit"}, {"Range"}, {"Judgement"}});
     for (const ResultRecord& result : run.results) {
-        table.row({htmlText(result.name), numberText(result.value), htmlText(result.unit),
-                   limitName(result.limit), rangeHtml(result.limit, result.unit),
-                   judgementHtml(result.judgement)},
-                  result.judgement == Judgement::Outside ? "outside" : "");
+        table.row(
+            {htmlText(result.name), numberText(result.value), htmlText(result.unit),
+             limitName(result.limit), rangeHtml(result.limit), judgementHtml(result.judgement)},
+            result.judgement == Judgement::Outside ? "outside" : "");
     }
-    return sectionOf(id + "-results", "Results and limits", table.html());
+    return table.html();
 }
 
-std::string repetitionsHtml(const RepeatRecord* repeat,
-                            const RunRecord& run,
-                            const std::string& id) {
+std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
     if (repeat == nullptr) {
         return "";
     }
@@ -199,65 +221,68 @@ std::string repetitionsHtml(const RepeatRecord* repeat,
     const std::string counts =
         fmt::format("{}: {} passed, {} failed, {} in error", plural(repeat->runs, "run", "runs"),
                     repeat->passed, repeat->failed, repeat->errors);
-    Table table("Each result over all runs", {{"Result"},
-                                              {"Least", "number"},
-                                              {"Median", "number"},
-                                              {"Greatest", "number"},
-                                              {"Unit"},
-                                              {"Limit"},
-                                              {"Range"},
-                                              {"Outside", "number"}});
+    const std::vector<Column> columns = {
+        {"Result"}, {"Least", "number"}, {"Median", "number"}, {"Greatest", "number"}, {"Unit"},
+        {"Limit"},  {"Range"},           {"Outside", "number"}};
+    Table table("Results that differed from run to run, or were outside of their limits", columns);
+    Table alike("Results within their limits and alike in every run", columns);
+    std::uint64_t alikeCount = 0;
     for (const ResultStatistics& result : repeat->results) {
+        const bool isAlike = result.outside == 0 && result.minimum == result.maximum;
+        alikeCount += isAlike ? 1 : 0;
         const std::string outside = fmt::format("{} of {}", result.outside, result.runs);
-        table.row({htmlText(result.name), numberText(result.minimum), numberText(result.median),
-                   numberText(result.maximum), htmlText(result.unit), limitName(result.limit),
-                   rangeHtml(result.limit, result.unit),
-                   result.outside > 0 ? fmt::format("<span class=\"fail\">"
-                                                    "<span aria-hidden=\"true\">✗</span> {}</span>",
-                                                    outside)
-                                      : outside},
-                  result.outside > 0 ? "outside" : "");
+        (isAlike ? alike : table)
+            .row({htmlText(result.name), numberText(result.minimum), numberText(result.median),
+                  numberText(result.maximum), htmlText(result.unit), limitName(result.limit),
+                  rangeHtml(result.limit),
+                  result.outside > 0
+                      ? fmt::format("<span class=\"fail\"><span aria-hidden=\"true\">✗</span> "
+                                    "{}</span>",
+                                    outside)
+                      : outside},
+                 result.outside > 0 ? "outside" : "");
     }
-    return sectionOf(
-        id + "-repetitions", "Repetitions",
-        fmt::format("<p>{0}. The other sections show run {1}, {2}.</p>\n"
-                    "<div class=\"shares\" role=\"img\" aria-label=\"{0}\">{3}</div>\n{4}",
-                    counts, run.number,
-                    run.verdict == Verdict::Passed ? "the last" : "the first that did not pass",
-                    shares, table.html()));
+    return fmt::format(
+        "<p>{0}. The other sections show run {1}, {2}.</p>\n"
+        "<div class=\"shares\" role=\"img\" aria-label=\"{0}\">{3}</div>\n{4}",
+        counts, run.number,
+        run.verdict == Verdict::Passed ? "the last" : "the first that did not pass", shares,
+        table.html() +
+            folded(plural(alikeCount, "result alike in every run", "results alike in every run"),
+                   alike.html()));
 }
 
-std::string measurementsHtml(const RunRecord& run, const std::string& id) {
+std::string measurementsHtml(const RunRecord& run) {
     Table table("As measured by the experiment", {{"Measurement"}, {"Value", "number"}, {"Unit"}});
     for (const MeasurementRecord& one : run.measurements) {
         table.row({htmlText(one.name), numberText(one.value), htmlText(one.unit)});
     }
     const std::string html = table.html();
-    return sectionOf(
-        id + "-measurements", "Measurements",
-        run.results.empty() || html.empty()
-            ? html
-            : folded(plural(run.measurements.size(), "measurement", "measurements"), html));
+    // Of a diagnostic the results say the same again.
+    return run.results.empty()
+               ? html
+               : folded(plural(run.measurements.size(), "measurement", "measurements"), html);
 }
 
-std::string parametersHtml(const RunRecord& run, const std::string& id) {
+std::string parametersHtml(const RunRecord& run) {
     Table table("Parameters as they were given to each part",
-                {{"Parameter"}, {"Value", "number"}, {"Part"}, {""}});
+                {{"Parameter"}, {"Value", "number"}, {"Part"}});
     const auto add = [&table](const PartRecord& record, Part part) {
         for (const auto& [name, value] : record.parameters) {
-            table.row({htmlText(name), htmlText(value.text()), std::string(partText(part)),
-                       htmlText(record.name)});
+            table.row({htmlText(name), htmlText(value.text()),
+                       fmt::format("{} {}", partText(part), htmlText(record.name))});
         }
     };
     add(run.experiment, Part::Experiment);
     if (run.analysis.has_value()) {
         add(*run.analysis, Part::Analysis);
     }
-    return sectionOf(id + "-parameters", "Parameters", table.html());
+    return table.html();
 }
 
-std::string logHtml(const RunRecord& run, const std::string& id) {
-    Table table("Lines that the run logged", {{"Time", "time"}, {"Level"}, {"Message", "message"}});
+std::string logHtml(const RunRecord& run) {
+    Table table("Lines that the run logged, with their time of day in UTC",
+                {{"Time", "time"}, {"Level"}, {"Message", "message"}});
     std::size_t errors = 0;
     for (std::size_t at = 0; at < run.log.size(); ++at) {
         const LogRecord& line = run.log[at];
@@ -274,7 +299,7 @@ std::string logHtml(const RunRecord& run, const std::string& id) {
             continue;
         }
         const std::string time = line.time.timestamp();
-        table.row({time.substr(time.find('T') + 1), std::string(levelText(line.level)),
+        table.row({time.substr(time.find('T') + 1, 12), std::string(levelText(line.level)),
                    htmlText(line.message)},
                   isError ? "outside" : "");
     }
@@ -282,7 +307,7 @@ std::string logHtml(const RunRecord& run, const std::string& id) {
     if (errors > 0) {
         summary += fmt::format(", {} of level error", errors);
     }
-    return sectionOf(id + "-log", "Log", folded(summary, table.html()));
+    return folded(summary, table.html());
 }
 
 }  // namespace
@@ -303,17 +328,31 @@ std::string verdictHtml(Verdict verdict) {
         verdictClass(verdict), kMarks[static_cast<std::size_t>(verdict)], verdictText(verdict));
 }
 
-std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const std::string& id) {
+std::string runHtml(const RunRecord& run,
+                    const RepeatRecord* repeat,
+                    const std::string& id,
+                    bool withOutcome) {
+    const std::string outcome =
+        fmt::format("<p class=\"outcome\">{} {} <span class=\"faint\">in {:.2f} s</span></p>\n",
+                    verdictHtml(run.verdict), htmlText(headline(run)), run.seconds);
+    const auto figures = [](const std::string& content) {
+        return content.empty() ? "" : "<div class=\"figures\">\n" + content + "</div>\n";
+    };
+    Sections sections(id);
+    sections.add("What failed", failuresHtml(run));
+    sections.add("Results and limits", resultsHtml(run));
+    sections.add("Repetitions", repetitionsHtml(repeat, run));
+    sections.add("Measurements", measurementsHtml(run));
+    sections.add("Frames", figures(frameFigures(run, id)));
+    sections.add("Images", figures(imageFigures(run, id)));
+    sections.add("Parameters", parametersHtml(run));
+    sections.add("Log", logHtml(run));
     return fmt::format(
-               "<section class=\"run\" id=\"{0}\" aria-labelledby=\"{0}-name\">\n"
-               "<header>\n<h2 id=\"{0}-name\">{1}</h2>\n"
-               "<p class=\"outcome\">{2} {3} <span class=\"faint\">in {4:.2f} s</span></p>\n"
-               "<p class=\"summary\">{5}</p>\n{6}</header>\n",
-               id, htmlText(run.name), verdictHtml(run.verdict), htmlText(headline(run)),
-               run.seconds, htmlText(run.summary), resultStrip(run)) +
-           failuresHtml(run, id) + resultsHtml(run, id) + repetitionsHtml(repeat, run, id) +
-           measurementsHtml(run, id) + frameFigures(run, id) + imageFigures(run, id) +
-           parametersHtml(run, id) + logHtml(run, id) + "</section>\n";
+        "<section class=\"run\" id=\"{0}\" aria-labelledby=\"{0}-name\">\n"
+        "<header>\n<h2 id=\"{0}-name\">{1}</h2>\n{2}<p class=\"summary\">{3}</p>\n{4}</header>\n"
+        "{5}</section>\n",
+        id, htmlText(run.name), withOutcome ? outcome : "", htmlText(run.summary), resultStrip(run),
+        sections.html(run.name));
 }
 
 }  // namespace host

@@ -15,8 +15,11 @@ std::string verdictHtml(Verdict verdict);
 std::string_view verdictClass(Verdict verdict);
 
 // The section; its id, and the beginning of every id in it, is `id`. `repeat` is null when the run was
-// not repeated.
-std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const std::string& id);
+// not repeated. `withOutcome`: the head tells the run's own verdict, where the page's may be another.
+std::string runHtml(const RunRecord& run,
+                    const RepeatRecord* repeat,
+                    const std::string& id,
+                    bool withOutcome);
 
 }  // namespace host
 

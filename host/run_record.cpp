@@ -51,7 +51,7 @@ std::string limitText(const LimitRecord& limit, std::string_view unit) {
     if (text.empty()) {
         return "no bounds";
     }
-    return text + " " + std::string(unit);
+    return unit.empty() ? text : text + " " + std::string(unit);
 }
 
 }  // namespace host

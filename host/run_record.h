@@ -193,7 +193,8 @@ std::string failureText(const FailureRecord& failure);
 // value; nan, inf, -inf.
 std::string numberText(double value);
 
-// The limit as a range: "0 … 0 events", "≥ 30 frames", "> 0 and < 5 errors", "no bounds".
+// The limit as a range: "0 … 0 events", "≥ 30 frames", "> 0 and < 5 errors", "no bounds"; without a
+// unit the numbers alone.
 std::string limitText(const LimitRecord& limit, std::string_view unit);
 
 }  // namespace host

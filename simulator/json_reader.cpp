@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "platform/nearest.h"
+#include "platform/number.h"
 
 namespace simulator {
 
@@ -128,11 +129,11 @@ std::string JsonNode::asText() const {
     return _json->get<std::string>();
 }
 
-double JsonNode::asDouble(double least) const {
+double JsonNode::asDouble(double least, double most) const {
     _require(_json->is_number(), "not a number");
     const auto value = _json->get<double>();
-    if (value < least) {
-        fail("below " + Json(least).dump());
+    if (value < least || value > most) {
+        fail("not from " + platform::Number(least).text() + " to " + platform::Number(most).text());
     }
     return value;
 }

@@ -55,7 +55,8 @@ class JsonNode {
     // What the value holds; a DocumentProblem when it is something else or out of range.
     bool asBool() const;
     std::string asText() const;
-    double asDouble(double least = std::numeric_limits<double>::lowest()) const;  // at least that
+    double asDouble(double least = std::numeric_limits<double>::lowest(),
+                    double most = std::numeric_limits<double>::max()) const;
     template <std::integral T>
     T asInteger(T least = std::numeric_limits<T>::min(),
                 T most = std::numeric_limits<T>::max()) const;

@@ -143,7 +143,8 @@ void readWarming(const JsonNode& node, StreamProfile& stream) {
         if (value.isNull()) {
             stream.warming.remove(metadataKey(name));
         } else {
-            stream.warming.set(metadataKey(name), value.asDouble());
+            stream.warming.set(metadataKey(name),
+                               value.asDouble(-kLargestQuantity, kLargestQuantity));
         }
     });
 }
@@ -186,7 +187,7 @@ constexpr JsonKey<StreamProfile> kStreamKeys[] = {
                   StreamProfile& stream) { stream.events = readList(node, kFrameEventKeys); }},
     {"jitterMicroseconds",
      [](const JsonNode& node, StreamProfile& stream) {
-         stream.jitterMicroseconds = node.asDouble(0);
+         stream.jitterMicroseconds = node.asDouble(0, kLargestQuantity);
      }},
     {"seed", readMember<&StreamProfile::seed>},
     {"stallAfterFrame", readMember<&StreamProfile::stallAfterFrame>},

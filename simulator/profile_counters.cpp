@@ -12,8 +12,10 @@ constexpr JsonKey<CounterChannel> kChannelKeys[] = {
     {"group", readMember<&CounterChannel::group>},
     {"subgroup", readMember<&CounterChannel::subgroup>},
     {"count", readMember<&CounterChannel::count>},
-    {"risePerSecond", [](const JsonNode& node,
-                         CounterChannel& channel) { channel.risePerSecond = node.asDouble(0); }},
+    {"risePerSecond",
+     [](const JsonNode& node, CounterChannel& channel) {
+         channel.risePerSecond = node.asDouble(0, kLargestQuantity);
+     }},
     {"riseAtFrame", readMember<&CounterChannel::riseAtFrame>},
     {"riseBy", readMember<&CounterChannel::riseBy>},
 };

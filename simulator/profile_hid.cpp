@@ -91,7 +91,7 @@ constexpr JsonKey<HidDeviceProfile> kDeviceKeys[] = {
     {"needsFeatureReports", readMember<&HidDeviceProfile::needsFeatureReports>},
     {"reportsPerSecond",
      [](const JsonNode& node, HidDeviceProfile& device) {
-         device.reportsPerSecond = node.asDouble(0);
+         device.reportsPerSecond = node.asDouble(0, kLargestQuantity);
      }},
     {"maxReports", readMember<&HidDeviceProfile::maxReports>},
     {"overrides",

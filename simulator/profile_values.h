@@ -28,6 +28,9 @@ std::pair<std::uint64_t, std::uint64_t> readRange(const JsonNode& node, const st
 // A number of at least `least`; null is none.
 std::optional<std::uint64_t> readOptional(const JsonNode& node, std::uint64_t least = 0);
 
+// What a device measures, in any unit: beyond this a number of the profile is a slip.
+constexpr double kLargestQuantity = 1e9;
+
 // Numbers keep their kind: a whole one is the smallest of signed 32, signed 64 and unsigned 64 bits
 // that holds it, others are doubles. null holds nothing.
 platform::Value readValue(const JsonNode& node);
@@ -41,7 +44,9 @@ struct ReadMember<M> {
 
   private:
     static bool convert(const JsonNode& node, bool /*kind*/) { return node.asBool(); }
-    static double convert(const JsonNode& node, double /*kind*/) { return node.asDouble(); }
+    static double convert(const JsonNode& node, double /*kind*/) {
+        return node.asDouble(-kLargestQuantity, kLargestQuantity);
+    }
     static std::string convert(const JsonNode& node, const std::string& /*kind*/) {
         return node.asText();
     }

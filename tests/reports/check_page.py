@@ -57,9 +57,8 @@ class Page(html.parser.HTMLParser):
     def handle_starttag(self, tag, attributes):
         attributes = dict(attributes)
         self.seen.add(tag)
-        if tag in VOID:
-            return
-        self.open.append(tag)
+        if tag not in VOID:
+            self.open.append(tag)
         self.ids += [attributes["id"]] if "id" in attributes else []
         for name in ("aria-labelledby", "aria-describedby"):
             self.referenced += attributes.get(name, "").split()
@@ -104,14 +103,15 @@ class Page(html.parser.HTMLParser):
             self.text.append(data)
 
 
-def problems_of(page, must_contain):
+def problems_of(written, read, must_contain):
+    """What is wrong with a page, given as it is written and as a browser read it."""
     source = Page()
-    source.feed(page.read_text())
+    source.feed(written)
     found = source.problems
     if source.open:
         found.append(f"<{source.open[-1]}> is not closed")
     drawn = Page()
-    drawn.feed(browse(page, "--dump-dom"))
+    drawn.feed(read)
     text = re.sub(r"\s+", " ", "".join(drawn.text))
     wanted = [*must_contain, "How this was made"]
     found += [f"the text \"{one}\" is missing" for one in wanted if one not in text]
@@ -145,7 +145,8 @@ def main():
     given = arguments.parse_args()
     failed = False
     for page in given.pages:
-        for problem in problems_of(page, given.must_contain):
+        read = browse(page, "--dump-dom")
+        for problem in problems_of(page.read_text(), read, given.must_contain):
             print(f"{page}: {problem}")
             failed = True
         if given.screenshot:
@@ -160,4 +161,5 @@ def main():
     return 1 if failed else 0
 
 
-sys.exit(main())
+if __name__ == "__main__":
+    sys.exit(main())

@@ -149,19 +149,25 @@ void readWarming(const JsonNode& node, StreamProfile& stream) {
     });
 }
 
+constexpr std::pair<std::string_view, Fault StreamProfile::*> kCalls[] = {
+    {"control", &StreamProfile::control},
+    {"start", &StreamProfile::start},
+    {"stop", &StreamProfile::stop},
+};
+
+// By the name of a call or of a property.
 void readStreamFaults(const JsonNode& node, StreamProfile& stream) {
     node.forEachKey([&](const std::string& name, const JsonNode& value) {
-        const Fault fault = readFault(value);
-        if (name == "control") {
-            stream.control = fault;
-        } else if (name == "start") {
-            stream.start = fault;
-        } else if (name == "stop") {
-            stream.stop = fault;
-        } else {
-            stream.propertyFaults.set(
-                knownKey(kPropertyNames, value, name, {"control", "start", "stop"}), fault);
+        std::vector<std::string> calls;
+        for (const auto& [call, fault] : kCalls) {
+            if (call == name) {
+                stream.*fault = readFault(value);
+                return;
+            }
+            calls.emplace_back(call);
         }
+        const std::string_view key = knownKey(kPropertyNames, value, name, std::move(calls));
+        stream.propertyFaults.set(key, readFault(value));
     });
 }
 

@@ -27,16 +27,19 @@ bool isControl(char character) {
 
 // A document that describes a device, or a part of it.
 struct Source {
+    bool isFile;                   // or else of the gallery
     std::string name;              // of the profile or the file
     std::filesystem::path folder;  // that other files are relative to
     std::string text;
+
+    bool isSame(const Source& other) const { return isFile == other.isFile && name == other.name; }
 };
 
 Source builtIn(const std::string& name) {
     std::vector<std::string> known;
     for (const GalleryText& profile : galleryTexts()) {
         if (profile.name == name) {
-            return {name, {}, std::string(profile.text)};
+            return {false, name, {}, std::string(profile.text)};
         }
         known.emplace_back(profile.name);
     }
@@ -59,17 +62,16 @@ Source file(const std::filesystem::path& path) {
     if (text.size() > kLongestFile) {
         throw DocumentProblem(path.string() + ": longer than 1 MiB");
     }
-    return {path.string(), path.parent_path(), std::move(text)};
+    return {true, path.string(), path.parent_path(), std::move(text)};
 }
 
 Source findSource(const std::string& nameOrFile, const std::filesystem::path& folder) {
     const bool isFile = nameOrFile.find_first_of("/.") != std::string::npos;
-    return isFile ? file(folder / nameOrFile) : builtIn(nameOrFile);
+    return isFile ? file((folder / nameOrFile).lexically_normal()) : builtIn(nameOrFile);
 }
 
-// A profile and the document that it is read from.
 struct Layer {
-    std::string name;
+    Source source;
     Json document;
 };
 
@@ -102,7 +104,8 @@ std::vector<Layer> readLayers(const std::string& nameOrFile, std::string& at) {
     Source source = findSource(nameOrFile, {});
     while (true) {
         at = source.name;
-        layers.push_back({source.name, parseJson(source.text)});
+        Json document = parseJson(source.text);
+        layers.push_back({std::move(source), std::move(document)});
         const JsonNode root(layers.back().document);
         if (!root.isObject() || !root.json().contains("extends")) {
             return layers;
@@ -110,12 +113,12 @@ std::vector<Layer> readLayers(const std::string& nameOrFile, std::string& at) {
         const JsonNode base = root["extends"];
         const std::string name = base.asText();
         try {
-            source = findSource(name, source.folder);
+            source = findSource(name, layers.back().source.folder);
         } catch (const DocumentProblem& problem) {
             base.fail(problem.what());
         }
         if (std::any_of(layers.begin(), layers.end(),
-                        [&](const Layer& layer) { return layer.name == source.name; })) {
+                        [&](const Layer& layer) { return layer.source.isSame(source); })) {
             base.fail(source.name + " extends itself");
         }
         if (layers.size() == kLongestChain) {
@@ -141,7 +144,7 @@ std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile, std::str
         const std::vector<Layer> layers = readLayers(nameOrFile, at);
         DeviceProfile device;
         for (auto layer = layers.rbegin(); layer != layers.rend(); ++layer) {
-            at = layer->name;
+            at = layer->source.name;
             device.summary.clear();
             readObject(JsonNode(layer->document), kProfileKeys, device);
         }

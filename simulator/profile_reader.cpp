@@ -141,12 +141,13 @@ std::vector<GalleryEntry> gallery() {
 std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile, std::string& problem) {
     std::string at;
     try {
-        const std::vector<Layer> layers = readLayers(nameOrFile, at);
+        std::vector<Layer> layers = readLayers(nameOrFile, at);
+        std::reverse(layers.begin(), layers.end());
         DeviceProfile device;
-        for (auto layer = layers.rbegin(); layer != layers.rend(); ++layer) {
-            at = layer->source.name;
+        for (const Layer& layer : layers) {
+            at = layer.source.name;
             device.summary.clear();
-            readObject(JsonNode(layer->document), kProfileKeys, device);
+            readObject(JsonNode(layer.document), kProfileKeys, device);
         }
         device.name = nameOrFile;
         return device;

@@ -67,7 +67,7 @@ platform::ErrorRef readError(const JsonNode& node) {
     ErrorParts parts;
     readObject(node, kErrorKeys, parts);
     if (!parts.domain.has_value() || !parts.code.has_value() || !parts.message.has_value()) {
-        node.fail("an error object needs \"domain\", \"code\" and \"message\"");
+        node.fail(R"(an error object needs "domain", "code" and "message")");
     }
     return std::make_shared<const platform::Error>(*parts.domain, *parts.code,
                                                    std::move(*parts.message), parts.underlying);

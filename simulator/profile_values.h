@@ -3,6 +3,7 @@
 #ifndef ZR_SIMULATOR_PROFILE_VALUES_H
 #define ZR_SIMULATOR_PROFILE_VALUES_H
 
+#include <concepts>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -35,36 +36,37 @@ constexpr double kLargestQuantity = 1e9;
 // that holds it, others are doubles. null holds nothing.
 platform::Value readValue(const JsonNode& node);
 
-// The member `M` of an object from a value of its kind: what most rows of a table of keys are.
-template <auto M>
-struct ReadMember;
-template <class T, class Member, Member T::*M>
-struct ReadMember<M> {
-    static void read(const JsonNode& node, T& object) { object.*M = convert(node, object.*M); }
+// The same into a place of its kind; a null that the kind has no room for is an error.
+inline void readInto(const JsonNode& node, bool& place) {
+    place = node.asBool();
+}
+inline void readInto(const JsonNode& node, double& place) {
+    place = node.asDouble(-kLargestQuantity, kLargestQuantity);
+}
+inline void readInto(const JsonNode& node, std::string& place) {
+    place = node.asText();
+}
+inline void readInto(const JsonNode& node, Fault& place) {
+    place = readFault(node);
+}
+inline void readInto(const JsonNode& node, platform::Value& place) {
+    place = readValue(node);
+}
+inline void readInto(const JsonNode& node, std::optional<std::uint64_t>& place) {
+    place = readOptional(node);
+}
+template <std::integral T>
+void readInto(const JsonNode& node, T& place) {
+    place = node.asInteger<T>();
+}
 
-  private:
-    static bool convert(const JsonNode& node, bool /*kind*/) { return node.asBool(); }
-    static double convert(const JsonNode& node, double /*kind*/) {
-        return node.asDouble(-kLargestQuantity, kLargestQuantity);
-    }
-    static std::string convert(const JsonNode& node, const std::string& /*kind*/) {
-        return node.asText();
-    }
-    static Fault convert(const JsonNode& node, const Fault& /*kind*/) { return readFault(node); }
-    static platform::Value convert(const JsonNode& node, const platform::Value& /*kind*/) {
-        return readValue(node);
-    }
-    static std::optional<std::uint64_t> convert(const JsonNode& node,
-                                                const std::optional<std::uint64_t>& /*kind*/) {
-        return readOptional(node);
-    }
-    template <std::integral I>
-    static I convert(const JsonNode& node, I /*kind*/) {
-        return node.asInteger<I>();
-    }
-};
-template <auto M>
-constexpr auto readMember = &ReadMember<M>::read;
+// Into the member of an object: what most rows of a table of keys do.
+template <class T, class Member>
+T ownerOf(Member T::*member);
+template <auto Member>
+void readMember(const JsonNode& node, decltype(ownerOf(Member))& object) {
+    readInto(node, object.*Member);
+}
 
 }  // namespace simulator
 

@@ -30,19 +30,19 @@ constexpr std::string_view kMode = platform::kRunLoopDefaultMode;
 
 // Writes what it is told into the journal of the bench, and does something about it.
 struct Delegate final : ZRKirraImageStreamDelegate {
-    explicit Delegate(std::shared_ptr<Journal> into) : journal(std::move(into)) {}
+    explicit Delegate(Journal& into) : journal(into) {}
 
     void handleImage(ZRKirraMendraImage image) override {
-        journal->push_back("image " + image.frameID().text());
+        journal.push_back("image " + image.frameID().text());
         then();
     }
     void streamDidError(const ErrorRef& error) override {
-        journal->push_back("error");
+        journal.push_back("error");
         errors.push_back(error);
         then();
     }
 
-    std::shared_ptr<Journal> journal;
+    Journal& journal;
     std::vector<ErrorRef> errors;
     std::function<void()> then = [] {};
 };
@@ -92,7 +92,7 @@ TEST_P(ImageStreamOpening, EndsAtTheStepThatFails) {
             ErrorRef caught;
             EXPECT_FALSE(std::make_shared<ZRKirraImageStream>()->openWithRunLoop(
                 runLoop, hasSlot ? &caught : nullptr));
-            EXPECT_EQ(*journal, calls);
+            EXPECT_EQ(journal(), calls);
             if (hasSlot) {
                 EXPECT_THAT(caught, expected);
             }
@@ -100,7 +100,7 @@ TEST_P(ImageStreamOpening, EndsAtTheStepThatFails) {
         // The experiment hands the error on, and cleans up no further.
         EXPECT_EQ(run(1, 60), std::nullopt);
         EXPECT_THAT(error, expected);
-        EXPECT_EQ(*journal, calls);
+        EXPECT_EQ(journal(), calls);
         EXPECT_EQ(make(1, 60)->run(nullptr), nullptr);
         EXPECT_EQ(runLoop->run(kMode, 60), RunLoopOutcome::Finished);  // nothing is scheduled
     }
@@ -117,14 +117,14 @@ class ImageStream : public KirraTest {
     void open() {
         sensor().reportsPerSecond = 0;
         install();
-        delegate = std::make_shared<Delegate>(journal);
+        delegate = std::make_shared<Delegate>(journal());
         stream->setDelegate(delegate);
         ErrorRef untouched = test::sensorError("untouched");
         error = untouched;
         EXPECT_TRUE(stream->openWithRunLoop(runLoop, &error));
         EXPECT_EQ(error, untouched);
-        EXPECT_EQ(*journal, kOpening);
-        journal->clear();
+        EXPECT_EQ(journal(), kOpening);
+        journal().clear();
     }
 
     std::shared_ptr<ZRKirraImageStream> stream = std::make_shared<ZRKirraImageStream>();
@@ -167,8 +167,8 @@ TEST_F(ImageStream, HandsOnImagesAndNothingElse) {
         // Exactly that long, so that a read beyond it is seen.
         const std::vector<std::byte> data(size, std::byte{1});
         callback()(id, data, nullptr);
-        EXPECT_EQ(*journal, isImage ? Journal{"image 16843009"} : Journal{}) << id << ' ' << size;
-        journal->clear();
+        EXPECT_EQ(journal(), isImage ? Journal{"image 16843009"} : Journal{}) << id << ' ' << size;
+        journal().clear();
     }
 }
 
@@ -176,7 +176,7 @@ TEST_F(ImageStream, ClosesBeforeItTellsOfAnError) {
     open();
     const ErrorRef reported = test::sensorError("overheated");
     callback()(118, std::vector<std::byte>(792), reported);
-    EXPECT_EQ(*journal, joined(kClosing, Journal{"error"}));
+    EXPECT_EQ(journal(), joined(kClosing, Journal{"error"}));
     EXPECT_THAT(delegate->errors, ElementsAre(reported));  // the same object
 }
 
@@ -185,16 +185,16 @@ TEST_F(ImageStream, ClosesAnyNumberOfTimes) {
     open();
     stream->close();
     stream->close();
-    EXPECT_EQ(*journal, joined(kClosing, kClosing));
+    EXPECT_EQ(journal(), joined(kClosing, kClosing));
     EXPECT_EQ(runLoop->run(kMode, 60), RunLoopOutcome::Finished);
 
     // On a run loop that has gone meanwhile.
     install();
     const auto orphan = std::make_shared<ZRKirraImageStream>();
     std::thread([&] { orphan->openWithRunLoop(RunLoop::forThisThread(), nullptr); }).join();
-    journal->clear();
+    journal().clear();
     orphan->close();
-    EXPECT_THAT(*journal, ElementsAre("no callback", "close"));
+    EXPECT_THAT(journal(), ElementsAre("no callback", "close"));
 }
 
 TEST_F(ImageStream, LateReportsGoNowhere) {
@@ -209,11 +209,11 @@ TEST_F(ImageStream, LateReportsGoNowhere) {
     delegate = nullptr;
     EXPECT_EQ(stream->delegate(), nullptr);
     tell();  // the delegate is gone
-    EXPECT_EQ(*journal, kClosing);
-    journal->clear();
+    EXPECT_EQ(journal(), kClosing);
+    journal().clear();
     stream = nullptr;
     tell();  // the stream is gone
-    EXPECT_THAT(*journal, IsEmpty());
+    EXPECT_THAT(journal(), IsEmpty());
 }
 
 // A delegate that drops the stream and itself in the middle of being told.
@@ -234,7 +234,7 @@ TEST_F(ImageStream, MayDieInsideItsOwnCallback) {
 // The last reference goes on another thread while reports are coming: the run loop loses its source.
 TEST_F(ImageStream, MayDieOnAnotherThreadWhileImagesCome) {
     install();
-    delegate = std::make_shared<Delegate>(journal);
+    delegate = std::make_shared<Delegate>(journal());
     stream->setDelegate(delegate);
     ASSERT_TRUE(stream->openWithRunLoop(runLoop, nullptr));
     std::thread other;

@@ -9,26 +9,21 @@ namespace test {
 
 namespace {
 
-// A device that writes down what is done with it and lets it happen.
-class RecordingDevice final : public WLIOHIDDeviceInterface {
-  public:
-    RecordingDevice(std::shared_ptr<WLIOHIDDeviceInterface> device,
-                    std::shared_ptr<Journal> journal,
-                    std::shared_ptr<WLHIDInputReportCallback> callback)
-        : _device(std::move(device))
-        , _journal(std::move(journal))
-        , _callback(std::move(callback)) {}
+// A device that notes down what is done with it, and lets it happen.
+struct TappedDevice final : WLIOHIDDeviceInterface {
+    TappedDevice(std::shared_ptr<WLIOHIDDeviceInterface> tapped, std::shared_ptr<Tap> into)
+        : device(std::move(tapped)), tap(std::move(into)) {}
 
     bool open(platform::ErrorSlot error) override {
-        _journal->push_back("open");
-        return _device->open(error);
+        tap->journal.push_back("open");
+        return device->open(error);
     }
     void setInputReportCallback(WLHIDInputReportCallback callback) override {
-        _journal->push_back(callback ? "callback" : "no callback");
+        tap->journal.push_back(callback ? "callback" : "no callback");
         if (callback) {
-            *_callback = callback;
+            tap->callback = callback;
         }
-        _device->setInputReportCallback(std::move(callback));
+        device->setInputReportCallback(std::move(callback));
     }
     bool setFeatureReportWithID(std::int64_t reportID,
                                 std::span<const std::byte> data,
@@ -37,76 +32,53 @@ class RecordingDevice final : public WLIOHIDDeviceInterface {
         for (const std::byte byte : data) {
             line += platform::format(" %d", std::to_integer<int>(byte));
         }
-        _journal->push_back(std::move(line));
-        return _device->setFeatureReportWithID(reportID, data, error);
+        tap->journal.push_back(std::move(line));
+        return device->setFeatureReportWithID(reportID, data, error);
     }
     void scheduleWithRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                              std::string_view mode) override {
-        _journal->push_back(platform::format("schedule in %@", mode));
-        _device->scheduleWithRunLoop(runLoop, mode);
+        tap->journal.push_back(platform::format("schedule in %@", mode));
+        device->scheduleWithRunLoop(runLoop, mode);
     }
     void unscheduleFromRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                                std::string_view mode) override {
-        _journal->push_back(platform::format("unschedule from %@", mode));
-        _device->unscheduleFromRunLoop(runLoop, mode);
+        tap->journal.push_back(platform::format("unschedule from %@", mode));
+        device->unscheduleFromRunLoop(runLoop, mode);
     }
     bool close(platform::ErrorSlot error) override {
-        _journal->push_back(error == nullptr ? "close" : "close with a slot");
-        return _device->close(error);
+        tap->journal.push_back(error == nullptr ? "close" : "close with a slot");
+        return device->close(error);
     }
 
-  private:
-    const std::shared_ptr<WLIOHIDDeviceInterface> _device;
-    const std::shared_ptr<Journal> _journal;
-    const std::shared_ptr<WLHIDInputReportCallback> _callback;
+    const std::shared_ptr<WLIOHIDDeviceInterface> device;
+    const std::shared_ptr<Tap> tap;
 };
 
-class RecordingManager final : public WLHIDManager {
-  public:
-    RecordingManager(std::shared_ptr<WLHIDManager> manager,
-                     std::shared_ptr<Journal> journal,
-                     std::shared_ptr<WLHIDInputReportCallback> callback)
-        : _manager(std::move(manager))
-        , _journal(std::move(journal))
-        , _callback(std::move(callback)) {}
+// The bus, and a manager of it.
+struct TappedBus final : platform::HidFacility, WLHIDManager {
+    TappedBus(std::shared_ptr<platform::HidFacility> tapped,
+              std::shared_ptr<WLHIDManager> itsManager,
+              std::shared_ptr<Tap> into)
+        : bus(std::move(tapped)), manager(std::move(itsManager)), tap(std::move(into)) {}
 
+    std::shared_ptr<WLHIDManager> createManager() override {
+        auto made = bus->createManager();
+        return made != nullptr ? std::make_shared<TappedBus>(bus, std::move(made), tap) : nullptr;
+    }
     void enumerateDevicesMatching(const std::vector<platform::Dictionary>& matching) override {
-        _manager->enumerateDevicesMatching(matching);
+        manager->enumerateDevicesMatching(matching);
     }
     std::vector<std::shared_ptr<WLIOHIDDeviceInterface>> devices() override {
-        auto devices = _manager->devices();
+        auto devices = manager->devices();
         for (auto& device : devices) {
-            device = std::make_shared<RecordingDevice>(std::move(device), _journal, _callback);
+            device = std::make_shared<TappedDevice>(std::move(device), tap);
         }
         return devices;
     }
 
-  private:
-    const std::shared_ptr<WLHIDManager> _manager;
-    const std::shared_ptr<Journal> _journal;
-    const std::shared_ptr<WLHIDInputReportCallback> _callback;
-};
-
-class RecordingFacility final : public platform::HidFacility {
-  public:
-    RecordingFacility(std::shared_ptr<platform::HidFacility> facility,
-                      std::shared_ptr<Journal> journal,
-                      std::shared_ptr<WLHIDInputReportCallback> callback)
-        : _facility(std::move(facility))
-        , _journal(std::move(journal))
-        , _callback(std::move(callback)) {}
-
-    std::shared_ptr<WLHIDManager> createManager() override {
-        auto manager = _facility->createManager();
-        return manager != nullptr
-                   ? std::make_shared<RecordingManager>(std::move(manager), _journal, _callback)
-                   : nullptr;
-    }
-
-  private:
-    const std::shared_ptr<platform::HidFacility> _facility;
-    const std::shared_ptr<Journal> _journal;
-    const std::shared_ptr<WLHIDInputReportCallback> _callback;
+    const std::shared_ptr<platform::HidFacility> bus;
+    const std::shared_ptr<WLHIDManager> manager;
+    const std::shared_ptr<Tap> tap;
 };
 
 }  // namespace
@@ -129,21 +101,18 @@ class KirraTest::Witness final : public simulator::Observer {
     void misused(std::string_view what) override { ADD_FAILURE() << what; }
 };
 
-KirraTest::KirraTest()
-    : _witness(std::make_shared<Witness>())
-    , _callback(std::make_shared<WLHIDInputReportCallback>()) {}
+KirraTest::KirraTest() : _witness(std::make_shared<Witness>()) {}
 
 KirraTest::~KirraTest() {
     platform::installServices({});
 }
 
 void KirraTest::install() {
-    journal = std::make_shared<Journal>();
-    platform::installServices(
-        {.hid = std::make_shared<RecordingFacility>(simulator::makeHidFacility(hid, 0, _witness),
-                                                    journal, _callback),
-         .display = simulator::makeDisplayService(display),
-         .registry = simulator::makeDeviceRegistry(display)});
+    _tap = std::make_shared<Tap>();
+    platform::installServices({.hid = std::make_shared<TappedBus>(
+                                   simulator::makeHidFacility(hid, 0, _witness), nullptr, _tap),
+                               .display = simulator::makeDisplayService(display),
+                               .registry = simulator::makeDeviceRegistry(display)});
 }
 
 std::shared_ptr<ZRKirraImageExperiment> KirraTest::make(platform::Number images,

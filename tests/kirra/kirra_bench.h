@@ -26,6 +26,12 @@ using Journal = std::vector<std::string>;
 extern const Journal kOpening;
 extern const Journal kClosing;
 
+// What the bus notes down.
+struct Tap {
+    Journal journal;
+    WLHIDInputReportCallback callback;  // the last one
+};
+
 Journal joined(Journal first, const Journal& second);
 
 platform::ErrorRef sensorError(std::string_view text);
@@ -47,18 +53,18 @@ class KirraTest : public ::testing::Test {
     std::optional<platform::List> run(platform::Number images, platform::Number timeout);
 
     // The callback that was installed last, as the sensor would call it.
-    const WLHIDInputReportCallback& callback() const { return *_callback; }
+    const WLHIDInputReportCallback& callback() const { return _tap->callback; }
 
     simulator::HidProfile hid = simulator::healthyHid();
     simulator::DisplayProfile display = simulator::healthyDisplay();
     std::shared_ptr<platform::RunLoop> runLoop = platform::RunLoop::forThisThread();
-    std::shared_ptr<Journal> journal;
+    Journal& journal() { return _tap->journal; }
     platform::ErrorRef error;
 
   private:
     class Witness;
     std::shared_ptr<Witness> _witness;
-    std::shared_ptr<WLHIDInputReportCallback> _callback;
+    std::shared_ptr<Tap> _tap;
 };
 
 }  // namespace test

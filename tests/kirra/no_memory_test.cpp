@@ -36,7 +36,7 @@ TEST_F(WithoutMemory, NoStreamIsCreated) {
     }
     EXPECT_THAT(error, test::IsPlainError(ZRKirraImageExperimentErrorDomain, 3,
                                           "Failed to create kirra stream."));
-    EXPECT_THAT(*journal, ::testing::IsEmpty());
+    EXPECT_THAT(journal(), ::testing::IsEmpty());
 }
 
 }  // namespace

@@ -1,12 +1,14 @@
 #!/usr/bin/python3
-"""Checks the schema of device profiles, that it accepts every profile of the gallery and one with every
-key, and that it rejects the broken profiles that the program rejects too.
+"""Checks the schema of device profiles, that it accepts every profile of the gallery, one with every key
+and the examples of the page about profiles, and that it rejects the broken profiles that the program
+rejects too. The page lists the gallery as it is.
 
-check_profiles.py PROFILES-FOLDER
+check_profiles.py PROFILES-FOLDER PAGE
 """
 
 import json
 import pathlib
+import re
 import sys
 
 import jsonschema
@@ -30,17 +32,21 @@ def main():
     validator = jsonschema.Draft202012Validator(schema)
     problems = []
 
-    profiles = {path.stem: path for path in folder.glob("*.json") if path.name not in (SCHEMA, VERDICTS)}
-    every_key = HERE / "every_key.json"
-    for path in [*sorted(profiles.values()), every_key]:
-        for error in validator.iter_errors(json.loads(path.read_text())):
-            problems.append(f"{path.name}: {error.json_path}: {error.message}")
-    for name, path in profiles.items():
-        summary = json.loads(path.read_text()).get("summary", "")
-        if not summary:
-            problems.append(f"{name}: no summary")
-    for name in set(profiles) ^ set(json.loads((folder / VERDICTS).read_text())):
-        problems.append(f"{name}: not in both the gallery and {VERDICTS}")
+    files = {path.stem: path for path in folder.glob("*.json") if path.name not in (SCHEMA, VERDICTS)}
+    gallery = {name: json.loads(path.read_text()) for name, path in files.items()}
+    page = pathlib.Path(sys.argv[2]).read_text()
+    every_key = json.loads((HERE / "every_key.json").read_text())
+    examples = [json.loads(text) for text in re.findall(r"```json\n(.*?)```", page, re.DOTALL)]
+    valid = [*gallery.items(), ("every_key", every_key)] + [("example", text) for text in examples]
+    for name, profile in valid:
+        for error in validator.iter_errors(profile):
+            problems.append(f"{name}: {error.json_path}: {error.message}")
+
+    verdicts = json.loads((folder / VERDICTS).read_text())
+    for name in sorted(set(gallery) | set(verdicts)):
+        cells = [f"`{name}`", gallery.get(name, {}).get("summary", "?"), *verdicts.get(name, {}).values()]
+        if f"| {' | '.join(cells)} |\n" not in page:
+            problems.append(f"{name}: no profile, no verdicts or no such row in {sys.argv[2]}")
 
     broken = json.loads((HERE / "broken_profiles.json").read_text())
     for row in broken:
@@ -51,15 +57,15 @@ def main():
     objects = [part for part in parts_of(schema) if isinstance(part, dict)]
     described = {key for part in objects if part.get("additionalProperties") is False
                  for key in part["properties"]}
-    used = {key for part in parts_of(json.loads(every_key.read_text())) if isinstance(part, dict)
+    used = {key for part in parts_of(every_key) if isinstance(part, dict)
             for key in part}
-    problems += [f"{every_key.name}: does not use \"{key}\"" for key in sorted(described - used)]
+    problems += [f"every_key: does not use \"{key}\"" for key in sorted(described - used)]
 
     for problem in problems:
         print(problem)
-    print(f"profiles: {len(profiles)} of the gallery and {len(broken)} broken ones checked, "
-          f"{len(problems)} problems")
-    return 1 if problems or not profiles or not broken else 0
+    print(f"profiles: {len(gallery)} of the gallery, {len(examples)} examples and {len(broken)} broken ones "
+          f"checked, {len(problems)} problems")
+    return 1 if problems or not (gallery and examples and broken) else 0
 
 
 sys.exit(main())

@@ -77,17 +77,20 @@ std::string dotsOf(const std::vector<Point>& points, const Scale& scale) {
     return path;
 }
 
-std::string seriesSvg(const Series& series, const Scale& scale, bool isState) {
+std::string seriesSvg(const Series& series, const Scale& scale, const LinePlot& plot) {
     const std::vector<Point> points = decimated(series.points, kMostPoints);
+    const bool isState = plot.wholeY;
+    // Marks on many lines would hide their dashes.
+    const bool isMarked = points.size() <= kFewPoints && plot.series.size() <= 2;
     std::string svg;
     // Nothing lies between two states, so no line joins them.
     if (!isState) {
         svg +=
-            fmt::format("<path class=\"line {}\" d=\"{}\"/>", series.style, pathOf(points, scale));
+            fmt::format(R"(<path class="line {}" d="{}"/>)", series.style, pathOf(points, scale));
     }
-    if (isState || points.size() <= kFewPoints) {
+    if (isState || isMarked) {
         svg +=
-            fmt::format("<path class=\"dots {}\" d=\"{}\"/>", series.style, dotsOf(points, scale));
+            fmt::format(R"(<path class="dots {}" d="{}"/>)", series.style, dotsOf(points, scale));
     }
     return svg;
 }
@@ -101,7 +104,7 @@ std::string bandSvg(const Band& band, const Scale& scale) {
     };
     std::for_each(band.lower.begin(), band.lower.end(), add);
     std::for_each(band.upper.rbegin(), band.upper.rend(), add);
-    return fmt::format("<path class=\"band {}\" d=\"{}z\"/>", band.style, outline);
+    return fmt::format(R"(<path class="band {}" d="{}z"/>)", band.style, outline);
 }
 
 std::string legendEntry(std::string_view shape, const std::string& style, const std::string& name) {
@@ -129,6 +132,7 @@ std::string figureOf(const Figure& figure,
                      const Axis& x,
                      const Axis& y,
                      std::string_view viewBox,
+                     std::string_view kind,
                      const std::string& data,
                      const std::string& legend) {
     return fmt::format(
@@ -139,7 +143,7 @@ std::string figureOf(const Figure& figure,
 <title id="{id}-title">{title}</title>
 <desc id="{id}-desc">{yLabel} over {xLabel}. {caption}</desc>
 {axes}
-<svg class="data" viewBox="{viewBox}" preserveAspectRatio="none" width="100%" height="100%">
+<svg class="{kind}" viewBox="{viewBox}" preserveAspectRatio="none" width="100%" height="100%">
 {data}
 </svg>
 </svg>
@@ -149,7 +153,7 @@ std::string figureOf(const Figure& figure,
         fmt::arg("title", htmlText(figure.title)), fmt::arg("caption", htmlText(figure.caption)),
         fmt::arg("xLabel", htmlText(figure.xLabel)), fmt::arg("yLabel", htmlText(figure.yLabel)),
         fmt::arg("id", figure.id), fmt::arg("axes", axesSvg(x, y)), fmt::arg("viewBox", viewBox),
-        fmt::arg("data", data), fmt::arg("legend", legend));
+        fmt::arg("kind", kind), fmt::arg("data", data), fmt::arg("legend", legend));
 }
 
 // The means of groups of neighbouring columns, all made equally tall.
@@ -213,8 +217,7 @@ std::string cellsSvg(const std::vector<std::vector<double>>& columns,
 std::string colourLegend(const Range& range) {
     std::string bar;
     for (int level = 0; level < kLevels; ++level) {
-        bar += fmt::format("<rect class=\"level-{}\" x=\"{}\" width=\"1\" height=\"1\"/>", level,
-                           level);
+        bar += fmt::format(R"(<rect class="level-{}" x="{}" width="1" height="1"/>)", level, level);
     }
     return fmt::format(
         "<p class=\"legend\">{:.6g} <svg class=\"ramp\" viewBox=\"0 0 {} 1\" "
@@ -281,9 +284,9 @@ std::string linePlot(const LinePlot& plot) {
         data += bandSvg(band, scale);
     }
     for (const Series& series : plot.series) {
-        data += seriesSvg(series, scale, plot.wholeY);
+        data += seriesSvg(series, scale, plot);
     }
-    return figureOf(plot.figure, x, y, fmt::format("0 0 {} {}", kWidth, kHeight), data,
+    return figureOf(plot.figure, x, y, fmt::format("0 0 {} {}", kWidth, kHeight), "lines", data,
                     legendOf(plot));
 }
 
@@ -311,7 +314,7 @@ std::string heatMap(const HeatMap& map) {
     const Axis y(-0.5, static_cast<double>(rows) - 0.5, true);
     // The last group may be smaller: its column is cut, so that the marks stay where they belong.
     const double width = static_cast<double>(map.columns.size()) / static_cast<double>(group);
-    return figureOf(figure, x, y, fmt::format("0 0 {:g} {}", width, rows),
+    return figureOf(figure, x, y, fmt::format("0 0 {:g} {}", width, rows), "cells",
                     cellsSvg(columns, rows, range), colourLegend(range));
 }
 

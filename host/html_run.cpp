@@ -23,7 +23,7 @@ constexpr std::size_t kLinesAtEachEnd = 500;
 
 struct Column {
     std::string_view name;
-    std::string_view style = "";  // class of its cells: "number" lines them up at the right
+    std::string_view style{};  // class of its cells: "number" lines them up at the right
 };
 
 // A table: a caption, a head cell a column, and rows whose first cell names the row.
@@ -215,7 +215,7 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
          {std::pair("pass", repeat->passed), std::pair("fail", repeat->failed),
           std::pair("error", repeat->errors)}) {
         if (count > 0) {
-            shares += fmt::format("<i class=\"{} fill\" style=\"flex-grow:{}\"></i>", style, count);
+            shares += fmt::format(R"(<i class="{}" style="flex-grow:{}"></i>)", style, count);
         }
     }
     const std::string counts =

@@ -88,6 +88,9 @@ class Sections {
     }
 
     std::string html(const std::string& name) const {
+        if (_count == 0) {
+            return "";
+        }
         return fmt::format("<nav class=\"contents\" aria-label=\"{}\">\n<ul>\n{}</ul>\n</nav>\n",
                            htmlText("Sections of " + name), _links) +
                _html;
@@ -113,7 +116,7 @@ std::string deviationText(double value, const LimitRecord& limit) {
     }
     const auto text = [value](double bound, std::string_view side) {
         const double distance = std::abs(value - bound);
-        return distance > 0 ? fmt::format("{} {}", numberText(distance), side)
+        return distance > 0 ? fmt::format("{:.6g} {}", distance, side)
                             : std::string("on the open bound");
     };
     if (limit.lower.has_value() && !(value > limit.lower->value)) {

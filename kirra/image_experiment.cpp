@@ -1,7 +1,8 @@
 #include "kirra/image_experiment.h"
 
 #include <new>
-#include <optional>
+#include <string>
+#include <string_view>
 #include <utility>
 
 #include "platform/display.h"
@@ -12,21 +13,18 @@ namespace {
 constexpr std::string_view kImages = "images";
 constexpr std::string_view kTimeout = "timeout";
 constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
+constexpr std::string_view kNoRunLoop = "Kirra is a HID device that requires a current run loop.";
 
-using Message = platform::FormatText<>;
-
-constexpr Message kNoRunLoop = "Kirra is a HID device that requires a current run loop.";
-
-// Why the display does not count as powered; nothing when it is.
-std::optional<Message> displayProblem() {
+// Why the display does not count as powered; empty when it does.
+std::string_view displayProblem() {
     const platform::Services services = platform::services();
     platform::DisplayId display = 0;
     if (services.display == nullptr || services.display->mainDisplay(display) != 0) {
-        return Message("Could not get the main display to determine device power state.");
+        return "Could not get the main display to determine device power state.";
     }
     const platform::RegistryObject object = services.display->registryObject(display);
     if (object == 0) {
-        return Message("Could not get the frame buffer to determine device power state.");
+        return "Could not get the frame buffer to determine device power state.";
     }
     platform::Value property;
     if (services.registry != nullptr) {
@@ -35,12 +33,9 @@ std::optional<Message> displayProblem() {
     const platform::Value& powered =
         property[platform::kDisplayPowerInfo][platform::kDisplayPowerInfoPanel];
     if (!powered.isPresent()) {
-        return Message("Could not find the display power state.");
+        return "Could not find the display power state.";
     }
-    if (!powered.asNumber().isTrue()) {
-        return Message("The display is not powered.");
-    }
-    return std::nullopt;
+    return powered.asNumber().isTrue() ? "" : "The display is not powered.";
 }
 
 platform::Dictionary dictionaryOf(const ZRKirraMendraImage& image) {
@@ -72,7 +67,7 @@ bool ZRKirraImageExperiment::setupWithParameters(const platform::Dictionary& par
     const auto runLoop = platform::RunLoop::current();
     _runLoop = runLoop;
     if (runLoop == nullptr) {
-        return platform::fail(error, kDomain, 1, nullptr, kNoRunLoop);
+        return platform::fail(error, kDomain, 1, nullptr, "%@", kNoRunLoop);
     }
     _imagesToCapture = parameters.number(kImages).as<std::uint64_t>();
     _timeoutInSeconds = parameters.number(kTimeout).as<std::uint64_t>();
@@ -80,8 +75,9 @@ bool ZRKirraImageExperiment::setupWithParameters(const platform::Dictionary& par
 }
 
 bool ZRKirraImageExperiment::_displayIsPowered(platform::ErrorSlot error) {
-    if (const std::optional<Message> problem = displayProblem()) {
-        return platform::fail(error, kDomain, 2, nullptr, *problem);
+    const std::string_view problem = displayProblem();
+    if (!problem.empty()) {
+        return platform::fail(error, kDomain, 2, nullptr, "%@", problem);
     }
     return true;
 }
@@ -89,7 +85,7 @@ bool ZRKirraImageExperiment::_displayIsPowered(platform::ErrorSlot error) {
 ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
     const auto runLoop = _runLoop.lock();
     if (runLoop == nullptr || runLoop != platform::RunLoop::current()) {
-        return platform::fail(error, kDomain, 1, nullptr, kNoRunLoop);
+        return platform::fail(error, kDomain, 1, nullptr, "%@", kNoRunLoop);
     }
     try {
         _stream = std::make_shared<ZRKirraImageStream>();

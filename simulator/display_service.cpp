@@ -1,5 +1,7 @@
 #include "simulator/display_service.h"
 
+#include <utility>
+
 namespace simulator {
 
 namespace {
@@ -9,7 +11,7 @@ constexpr platform::RegistryObject kMainDisplayObject = 0x51;
 
 class SimulatedDisplays final : public platform::DisplayService {
   public:
-    explicit SimulatedDisplays(const DisplayProfile& profile) : _profile(profile) {}
+    explicit SimulatedDisplays(DisplayProfile profile) : _profile(std::move(profile)) {}
 
     int mainDisplay(platform::DisplayId& display) override {
         if (_profile.mainDisplayStatus == 0) {

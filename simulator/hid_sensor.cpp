@@ -39,8 +39,8 @@ constexpr std::byte kModeOn{1};
 // Threads  Any; no lock is held while a callback, the observer or a run loop is called.
 class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_from_this<Sensor> {
   public:
-    Sensor(const HidDeviceProfile& profile, double speed, std::weak_ptr<Observer> observer)
-        : _profile(profile), _speed(speed), _observer(std::move(observer)) {}
+    Sensor(HidDeviceProfile profile, double speed, std::weak_ptr<Observer> observer)
+        : _profile(std::move(profile)), _speed(speed), _observer(std::move(observer)) {}
 
     // What the user holds. The device closes when it goes.
     std::shared_ptr<WLIOHIDDeviceInterface> makeHandle() {

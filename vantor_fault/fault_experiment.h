@@ -37,6 +37,8 @@
 #include "platform/welkin/meterix.h"
 #include "platform/work_queue.h"
 
+class ZRVantorFrameDescription;
+
 class ZRVantorFaultExperiment final : public ZRExperiment,
                                       public ZRSetup,
                                       public ZRTeardown,
@@ -109,7 +111,7 @@ class ZRVantorFaultExperiment final : public ZRExperiment,
     // The receiving queue.
     void _receiveFrame(platform::ImageBufferRef buffer, platform::MediaTime time);
     // The processing queue.
-    void _processFrame(const class ZRVantorFrameDescription& description, std::uint64_t ordinal);
+    void _processFrame(const ZRVantorFrameDescription& description, std::uint64_t ordinal);
 
     // Both queues. Stops the stream, records the outcome and wakes run(), the first time; nothing
     // afterwards. `error` is null for a stop that nothing went wrong with.

@@ -15,7 +15,7 @@ std::chrono::nanoseconds delayOf(double seconds) {
     return std::chrono::nanoseconds(platform::Number(seconds * 1e9).as<std::int64_t>());
 }
 
-// The projector lit the frame with its dots (1) or its flood (2).
+// The two light sources that count as the projector's.
 bool isLit(const ZRVantorFrameDescription& description) {
     const auto source = description.infraredLightSource().as<std::int32_t>();
     return source == 1 || source == 2;
@@ -24,6 +24,7 @@ bool isLit(const ZRVantorFrameDescription& description) {
 }  // namespace
 
 ZRExperimentResultRef ZRVantorFaultExperiment::run(platform::ErrorSlot error) {
+    const auto self = shared_from_this();  // what the time-out will own
     platform::ErrorRef reported;
     if (!_selectStream(reported, error) || !_configureStream(reported, error)) {
         return nullptr;
@@ -32,7 +33,7 @@ ZRExperimentResultRef ZRVantorFaultExperiment::run(platform::ErrorSlot error) {
     // Asking an absent report or snapshot for anything yields absence: one check an end suffices.
     const WLMeterix report =
         WLMeterix::reportWithOnlySimpleChannels(&reported).reportByFilteringChannels(
-            isVantorEventSubgroup);
+            isISPEventSubgroup);
     const WLMeterixSnapshot baseline = report.snapshot(&reported);
     if (!baseline) {
         return platform::fail(error, ZRMeterixErrorDomain, 100, reported,
@@ -43,7 +44,7 @@ ZRExperimentResultRef ZRVantorFaultExperiment::run(platform::ErrorSlot error) {
                               "Failed to start streaming zorvel.");
     }
     // Never cancelled: a time-out that comes after the stop finds nothing to do.
-    _processingQueue.after(delayOf(_timeout), [self = shared_from_this()] {
+    _processingQueue.after(delayOf(_timeout), [self] {
         ZRLogHandle().write(LogLevel::Error, [] { return "Timeout has been reached."; });
         self->_stopWithError(nullptr);
     });

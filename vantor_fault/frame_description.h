@@ -43,7 +43,8 @@ class ZRVantorFrameDescription {
 
     // The frame as a row of 21 fields, and the row of their names; both end with a line feed. Fields
     // are separated by single commas and not quoted. The names of the eighteen numbers are their
-    // metadata keys. An absent number prints "(null)", a time that is no number "nan" or "inf".
+    // metadata keys (one name cannot serve a class and its instances, so the class's has a suffix). An
+    // absent number prints "(null)", a time that is no number "nan" or "inf".
     std::string csvRepresentation() const;
     static std::string csvRepresentationHeader();
 

@@ -24,27 +24,31 @@ class CaptureWitness final : public simulator::Observer {
     void misused(std::string_view what) override {
         const platform::MutexLock lock(_mutex);
         _misuses.emplace_back(what);
+        _changed.notifyAll();
     }
 
-    // The frames so far, once there are `count` of them; fewer when they do not come.
+    // What there was so far, once there is `count` of it; fewer when that does not come.
     std::vector<simulator::DeliveredFrame> waitFor(std::size_t count) {
-        const auto deadline = platform::deadlineAfter(kGenerous);
-        const platform::MutexLock lock(_mutex);
-        while (_frames.size() < count && std::chrono::steady_clock::now() < deadline) {
-            _changed.waitUntil(_mutex, deadline);
-        }
-        return _frames;
+        return _wait(_frames, count);
     }
-    std::vector<std::string> misuses() {
-        const platform::MutexLock lock(_mutex);
-        return _misuses;
-    }
+    std::vector<std::string> waitForMisuses(std::size_t count) { return _wait(_misuses, count); }
 
   private:
+    template <class T>
+    std::vector<T> _wait(const std::vector<T>& seen, std::size_t count) {
+        const auto deadline = platform::deadlineAfter(kGenerous);
+        const platform::MutexLock lock(_mutex);
+        while (seen.size() < count && std::chrono::steady_clock::now() < deadline) {
+            _changed.waitUntil(_mutex, deadline);
+        }
+        return seen;
+    }
+
     platform::Mutex _mutex;
     platform::Condition _changed;
-    std::vector<simulator::DeliveredFrame> _frames ZR_GUARDED_BY(_mutex);
-    std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
+    // Guarded by the mutex.
+    std::vector<simulator::DeliveredFrame> _frames;
+    std::vector<std::string> _misuses;
 };
 
 }  // namespace test

@@ -36,7 +36,7 @@ FaultTest::~FaultTest() {
     EXPECT_TRUE(eventually([&] { return liveBuffers() == 0; })) << liveBuffers() << " buffers held";
     platform::installServices({});
     _plugIn = nullptr;
-    EXPECT_THAT(_witness->misuses(), ::testing::IsEmpty());
+    EXPECT_THAT(_witness->waitForMisuses(0), ::testing::IsEmpty());
     platform::setLogSink(nullptr, platform::LogLevel::Error);
 }
 
@@ -63,8 +63,10 @@ void FaultTest::install() {
                                .registry = nullptr});
 }
 
-std::shared_ptr<ZRVantorFaultExperiment> FaultTest::make(double frameCount, double timeout) {
-    auto experiment = std::make_shared<Experiment>();
+std::shared_ptr<ZRVantorFaultExperiment> FaultTest::make(double frameCount,
+                                                         double timeout,
+                                                         std::string_view port) {
+    auto experiment = std::make_shared<Experiment>(port);
     EXPECT_TRUE(experiment->setupWithParameters({{"frameCount", frameCount}, {"timeout", timeout}},
                                                 nullptr, nullptr));
     return experiment;

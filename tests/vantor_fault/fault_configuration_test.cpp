@@ -216,9 +216,10 @@ TEST_F(FaultSetup, UsesTheFirstStreamOfItsPort) {
     capture.streams[0].portType = "ryl.port.other";
     camera().start = Fault::failing(nullptr);
     install();
+    EXPECT_EQ(Experiment().port(), kRylCapturePortType_FrontFacingInfraredCamera);
     for (const std::string_view port :
          {kRylCapturePortType_FrontFacingInfraredCamera, std::string_view("ryl.port.other")}) {
-        const auto experiment = std::make_shared<Experiment>(port);
+        const auto experiment = make(0, 0, port);
         EXPECT_NE(experiment->run(nullptr), nullptr);
         const auto streams = experiment->device()->streams(nullptr);
         EXPECT_EQ(experiment->stream(), (*streams)[experiment->port() == "ryl.port.other" ? 0 : 1]);
@@ -230,6 +231,7 @@ TEST_F(FaultSetup, UsesTheFirstStreamOfItsPort) {
 
 TEST_F(FaultSetup, RefusesNegativeParameters) {
     constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+    constexpr double kNever = std::numeric_limits<double>::infinity();
     const struct {
         Dictionary parameters;
         std::string_view negative;  // empty: accepted
@@ -238,7 +240,7 @@ TEST_F(FaultSetup, RefusesNegativeParameters) {
         {{{"frameCount", 0}, {"timeout", 0}}, ""},
         {{{"frameCount", "-1"}, {"timeout", Value()}}, ""},
         {{{"frameCount", -0.9}, {"timeout", kNaN}}, ""},
-        {{{"frameCount", 1e30}, {"timeout", test::kNever}}, ""},
+        {{{"frameCount", 1e30}, {"timeout", kNever}}, ""},
         {{{"frameCount", -1}, {"timeout", -1}}, "frameCount"},
         {{{"frameCount", std::numeric_limits<std::uint64_t>::max()}}, "frameCount"},
         {{{"frameCount", 3}, {"timeout", -0.5}}, "timeout"},
@@ -257,7 +259,7 @@ TEST_F(FaultSetup, RefusesNegativeParameters) {
     }
     // A frame count is kept although the time-out after it is refused.
     install();
-    const auto experiment = make(1, test::kNever);
+    const auto experiment = make(1, kNever);
     EXPECT_FALSE(
         experiment->setupWithParameters({{"frameCount", 3}, {"timeout", -0.5}}, nullptr, nullptr));
     const auto result = experiment->run(nullptr);

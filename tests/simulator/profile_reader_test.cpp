@@ -1,12 +1,16 @@
 #include "simulator/profile_reader.h"
 
+#include <cstdint>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <limits>
+#include <optional>
 #include <string>
+#include <string_view>
+#include <tuple>
 #include <utility>
-
-#include <stdlib.h>
+#include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -21,8 +25,6 @@ using simulator::DeviceProfile;
 using simulator::loadProfile;
 using ::testing::ElementsAre;
 using ::testing::Field;
-using ::testing::IsEmpty;
-using ::testing::Pair;
 using ::testing::SizeIs;
 
 constexpr auto kLast = std::numeric_limits<std::uint64_t>::max();

@@ -4,8 +4,9 @@
 // The host drives everything. For a diagnostic it calls, on one thread and in this order:
 //   the experiment's factory, setup (when the class has it), run, teardown (when the class has it);
 //   the analysis's factory, setup (when the class has it), analyzeExperimentResult.
-// It owns every instance and every result that it receives. Nothing is thrown across this boundary,
-// but for the one exception that an image stream without a HID manager raises.
+// It owns every instance and every result that it receives. Failures are not thrown across this
+// boundary, but for the one exception that an image stream without a HID manager raises; only the
+// exhaustion of memory or threads may throw besides.
 //
 // Threads. Unless a type says otherwise its objects are used by one thread at a time.
 #ifndef ZR_FRAME_HOST_INTERFACE_H
@@ -89,9 +90,9 @@ class ZRDescription {
         return ZRDescription(std::move(summary));
     }
 
-    // Declares `parameter`; the host passes its value under `name`.
-    void addParameter(ZRNumberParameter parameter, std::string name) {
-        _parameters.emplace_back(std::move(name), std::move(parameter));
+    // Declares `parameter`; the host passes its value under the name.
+    void addParameter(ZRNumberParameter parameter, std::string forName) {
+        _parameters.emplace_back(std::move(forName), std::move(parameter));
     }
 
     const std::string& summary() const { return _summary; }

@@ -7,7 +7,7 @@
 //   "tmonDataInC"              float, degrees Celsius
 //   "timestampInMilliseconds"  unsigned 32-bit
 // It holds at least as many as asked for, and fewer when the run loop ran out of sources (the sensor
-// was unplugged, say). No measurements.
+// was unplugged, say) or somebody else stopped it. No measurements.
 //
 // Owner    Make it with std::make_shared. The host owns it; the stream and the exit observer hold it
 //          weakly.

@@ -13,7 +13,7 @@ namespace {
 constexpr std::int32_t kUsagePage = 0xFF00;
 constexpr std::int32_t kUsage = 0x24;
 
-constexpr std::int64_t kImageReport = 118;
+constexpr auto kImageReport = std::to_integer<std::int64_t>(KirraImage::kReportID);
 
 // A feature report that configures the sensor: its ID byte, then 1; and the error when it fails.
 struct FeatureReport {

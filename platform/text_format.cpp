@@ -1,6 +1,6 @@
 #include "platform/text_format.h"
 
-#include <cstdio>
+#include <charconv>
 
 namespace platform::detail {
 
@@ -9,9 +9,12 @@ void appendNumber(std::string& out, const Number& number, Conversion conversion)
         out += number.text();
         return;
     }
+    constexpr int kDecimals = 6;
     char buffer[352];  // the largest double has 309 digits before the decimal point
-    const int length = std::snprintf(buffer, sizeof buffer, "%f", number.asDouble());
-    std::string_view text(buffer, static_cast<std::size_t>(length));
+    // Not printf: its decimal point is the process's locale's.
+    const auto [end, problem] = std::to_chars(buffer, buffer + sizeof buffer, number.asDouble(),
+                                              std::chars_format::fixed, kDecimals);
+    std::string_view text(buffer, static_cast<std::size_t>(end - buffer));
     if (text.starts_with("-nan")) {
         text.remove_prefix(1);  // a NaN has no sign worth telling
     }

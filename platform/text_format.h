@@ -87,9 +87,9 @@ constexpr bool accepts(Conversion conversion, ArgumentKind kind) {
 
 // Where the check of a text ends when it fails. Not constexpr, so reaching one of these in a
 // constant evaluation is a compile-time error that shows the name.
-void unknownPlaceholder();
-void placeholderWithoutArgument();
-void argumentOfAnotherKind();
+[[noreturn]] void unknownPlaceholder();
+[[noreturn]] void placeholderWithoutArgument();
+[[noreturn]] void argumentOfAnotherKind();
 
 // One argument, not copied: valid for the full expression that formats it.
 struct Argument {

@@ -20,7 +20,7 @@ StreamProfile camera(std::string_view portType) {
 }
 
 // Powers in milliwatts, the pulse in microseconds, temperatures in degrees Celsius. The light source
-// is the dots (1) and the flood (2) in turn: that is what interleaved means.
+// is 1 and 2 in turn, as an interleaved stream shows it.
 StreamProfile infraredCamera() {
     StreamProfile stream = camera(kRylCapturePortType_FrontFacingInfraredCamera);
     stream.lightSources = {1, 2};

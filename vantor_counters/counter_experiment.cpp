@@ -16,7 +16,7 @@ ZRExperimentResultRef ZRVantorMeterixExperiment::run(platform::ErrorSlot error) 
         return fail(error, ZRMeterixErrorDomain, 100, reported, "Could not get simple channels.");
     }
     const WLMeterixSnapshot snapshot =
-        report.reportByFilteringChannels(isVantorEventChannel).snapshot(&reported);
+        report.reportByFilteringChannels(isISPEventChannel).snapshot(&reported);
     if (!snapshot) {
         return fail(error, ZRMeterixErrorDomain, 100, reported, "Could not sample the report.");
     }

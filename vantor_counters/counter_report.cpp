@@ -7,12 +7,12 @@ constexpr std::string_view kSubgroup = "Q71ISP Events";
 
 }  // namespace
 
-bool isVantorEventChannel(const WLMeterixChannelDescription& description) {
+bool isISPEventChannel(const WLMeterixChannelDescription& description) {
     return description.groupName().find(kGroup) != std::string::npos &&
            description.subGroupName().find(kSubgroup) != std::string::npos;
 }
 
-bool isVantorEventSubgroup(const WLMeterixChannelDescription& description) {
+bool isISPEventSubgroup(const WLMeterixChannelDescription& description) {
     return description.subGroupName() == kSubgroup;
 }
 

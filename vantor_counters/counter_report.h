@@ -1,5 +1,5 @@
 // Counter reports as the plug-in's two counter-reading experiments use them: the two channel filters
-// and the one rule by which a sample becomes a measurement.
+// and the one rule by which a sample becomes a measurement. Any thread.
 #ifndef ZR_VANTOR_COUNTERS_COUNTER_REPORT_H
 #define ZR_VANTOR_COUNTERS_COUNTER_REPORT_H
 
@@ -8,11 +8,11 @@
 
 // The counter-report experiment's filter: the channels whose group name contains "Q71ISP" and whose
 // subgroup name contains "Q71ISP Events".
-bool isVantorEventChannel(const WLMeterixChannelDescription& description);
+bool isISPEventChannel(const WLMeterixChannelDescription& description);
 
 // The fault experiment's filter: the channels whose subgroup name is exactly "Q71ISP Events",
 // whatever their group.
-bool isVantorEventSubgroup(const WLMeterixChannelDescription& description);
+bool isISPEventSubgroup(const WLMeterixChannelDescription& description);
 
 // Stores the channel's count as a measurement in `events` under the channel's name; an entry of that
 // name is replaced. A channel without a count counts as 0: whether that is an error is the caller's

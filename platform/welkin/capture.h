@@ -6,12 +6,16 @@
 // Owner    The plug-in is one object for the process. A device, its streams and the handlers written
 //          to a stream are shared; a stream holds its handlers until they are replaced or the device
 //          is invalidated.
-// Threads  Operations are called by one thread at a time, which may change. Handlers are called on
-//          threads of the service's own, at most one frame handler at a time for a stream.
+//          The last reference to a stream or a device may go inside one of the stream's own handlers.
+// Threads  Any. A client mostly calls one operation at a time, but a bad first frame makes it read
+//          the error counters and stop the stream while start() has not returned yet. Handlers are
+//          called on threads of the service's own, at most one frame handler at a time for a stream.
 //
 // What an implementation owes its callers:
 //   - stop() may be called inside a lock of the caller's, and may wait until a handler in progress
 //     has returned. So handlers must not take that lock: they hand the work on and return.
+//   - Dropping a stream or a device, or stopping it, inside one of its handlers does not wait for that
+//     handler.
 //   - After stop() a few frames that were already on their way may still be delivered.
 //   - After invalidate() no handler is called any more.
 #ifndef ZR_PLATFORM_WELKIN_CAPTURE_H
@@ -80,7 +84,7 @@ inline constexpr std::string_view kRylCaptureStreamVideoOutputHandlerKey_PixelBu
 inline constexpr std::string_view kRylCaptureStreamVideoOutputHandlerKey_EventHandler =
     "ryl.output.event-handler";
 
-// Keys of the error counters: counts since the stream was started.
+// Keys of the error counters: numbers of errors.
 inline constexpr std::string_view kRylCaptureStreamPropertyValue_I2CErrorCount = "ryl.errors.i2c";
 inline constexpr std::string_view kRylCaptureStreamPropertyValue_MIPIErrorCount = "ryl.errors.mipi";
 

@@ -5,7 +5,7 @@
 // begins with its report ID byte, and lengths include it.
 //
 // Threads  A device is used on one thread, the one whose run loop it is scheduled on; its callback
-//          runs there.
+//          runs there. The last reference to a device may go on any thread, also inside its callback.
 #ifndef ZR_PLATFORM_WELKIN_HID_H
 #define ZR_PLATFORM_WELKIN_HID_H
 

@@ -50,8 +50,8 @@ TEST(CounterFilters, KeepWhatTheyShould) {
     };
     for (const auto& [group, subgroup, channel, exact] : rows) {
         const WLMeterixChannelDescription description("any", group, subgroup);
-        EXPECT_EQ(isVantorEventChannel(description), channel) << group << '/' << subgroup;
-        EXPECT_EQ(isVantorEventSubgroup(description), exact) << group << '/' << subgroup;
+        EXPECT_EQ(isISPEventChannel(description), channel) << group << '/' << subgroup;
+        EXPECT_EQ(isISPEventSubgroup(description), exact) << group << '/' << subgroup;
     }
 }
 

@@ -138,7 +138,8 @@ void CommandLine::_addRun() {
         ->check(CLI::Validator(CLI::Range(std::uint64_t{1}, std::uint64_t{1'000'000'000}))
                     .description(""));
     run.add_flag("--until-fail", session.untilFail,
-                 "Repeat until a run does not pass; with --repeat at most N times");
+                 "Repeat until a run does not pass; with --repeat at most N times")
+        ->disable_flag_override();
     run.add_flag("-v,--verbose", session.verbose, "Show what the text report folds");
     run.add_option("--color", "Colour in the text report")
         ->type_name("auto|always|never")

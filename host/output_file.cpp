@@ -5,6 +5,7 @@
 #include <system_error>
 
 #include <fcntl.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -80,6 +81,36 @@ std::optional<std::string> writeFile(const std::string& path, std::string_view c
         return problemWith(path, errno);
     }
     return std::nullopt;
+}
+
+Spool::Spool() : _file(std::tmpfile()), _lost(_file == nullptr) {}
+
+Spool::~Spool() {
+    if (_file != nullptr) {
+        std::fclose(_file);
+    }
+}
+
+void Spool::append(std::string_view text) {
+    _lost = _lost || std::fwrite(text.data(), 1, text.size(), _file) != text.size();
+}
+
+std::optional<std::string> Spool::writeTo(const std::string& path) {
+    if (_lost || std::fflush(_file) != 0) {
+        return "cannot write " + path + ": no room for it in the folder of temporary files";
+    }
+    const long size = std::ftell(_file);
+    if (size == 0) {
+        return writeFile(path, "");
+    }
+    const auto length = static_cast<std::size_t>(size);
+    void* pages = mmap(nullptr, length, PROT_READ, MAP_PRIVATE, fileno(_file), 0);
+    if (pages == MAP_FAILED) {
+        return problemWith(path, errno);
+    }
+    auto problem = writeFile(path, {static_cast<const char*>(pages), length});
+    munmap(pages, length);
+    return problem;
 }
 
 }  // namespace host

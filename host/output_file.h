@@ -2,6 +2,7 @@
 #ifndef ZR_HOST_OUTPUT_FILE_H
 #define ZR_HOST_OUTPUT_FILE_H
 
+#include <cstdio>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -16,6 +17,25 @@ std::optional<std::string> cannotWrite(const std::string& path);
 // interrupt waits until it is done. Returns nothing on success, else one line that says what went
 // wrong; the file is then as it was before.
 std::optional<std::string> writeFile(const std::string& path, std::string_view content);
+
+// What a long run has written so far, kept in a nameless file instead of in memory. It vanishes with
+// the object, also when the program is interrupted. One thread at a time.
+class Spool {
+  public:
+    Spool();
+    ~Spool();
+    Spool(const Spool&) = delete;
+    Spool& operator=(const Spool&) = delete;
+
+    void append(std::string_view text);
+
+    // As writeFile(), with all that was appended.
+    std::optional<std::string> writeTo(const std::string& path);
+
+  private:
+    std::FILE* _file;  // owned
+    bool _lost = false;
+};
 
 }  // namespace host
 

@@ -198,10 +198,13 @@ class Session {
     // The forms that stream get a report of their own for each place they go to.
     void _openReports() {
         if (_writesToOutput("jsonl")) {
-            _stream([](std::string_view line) { Terminal::shared().output(line); });
+            _stream([this](std::string_view line) {
+                _outputFailed |= !Terminal::shared().output(line);
+            });
         }
         if (_wants("jsonl")) {
-            _stream([this](std::string_view line) { _jsonl += line; });
+            _spool.emplace();
+            _stream([this](std::string_view line) { _spool->append(line); });
         }
     }
 
@@ -284,9 +287,6 @@ class Session {
         if (form == "json") {
             return jsonReport(_record);
         }
-        if (form == "jsonl") {
-            return _jsonl;
-        }
         if (form == "junit") {
             return junitReport(_record);
         }
@@ -308,7 +308,9 @@ class Session {
         }
         bool failed = false;
         for (const auto& [form, file] : _files) {
-            if (const auto problem = writeFile(file, _written(form))) {
+            const auto problem =
+                form == "jsonl" ? _spool->writeTo(file) : writeFile(file, _written(form));
+            if (problem.has_value()) {
                 complain(kExitError, *problem);
                 failed = true;
             }
@@ -334,7 +336,9 @@ class Session {
     SessionRecord _record;
     std::vector<RunPlan> _plans;
     std::vector<std::pair<std::string, std::string>> _files;  // form, path
-    std::string _jsonl;  // what goes to a file; its report writes one line at a time
+    // The streamed form for files. Like `_outputFailed` it is touched by the report that streams, one
+    // line at a time, and by this session once the report has ended.
+    std::optional<Spool> _spool;
     std::vector<RunListener*> _listeners;  // owned by the log fan-out
     LogFanout _log{_options.logLevel != "off"};
     std::shared_ptr<RunRecorder> _recorder;

@@ -2,9 +2,6 @@
 #include "kirra/image_stream.h"
 
 #include <functional>
-#include <limits>
-#include <optional>
-#include <stdexcept>
 #include <thread>
 
 #include "platform/internal_inconsistency.h"

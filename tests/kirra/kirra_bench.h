@@ -4,7 +4,9 @@
 #define ZR_TESTS_KIRRA_KIRRA_BENCH_H
 
 #include <memory>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include <gmock/gmock.h>
@@ -12,7 +14,6 @@
 
 #include "kirra/image_experiment.h"
 #include "kirra/image_stream.h"
-#include "platform/mutex.h"
 #include "platform/run_loop.h"
 #include "simulator/display_service.h"
 #include "simulator/hid_sensor.h"

@@ -1,6 +1,7 @@
 // A stream that cannot be created, for want of memory. Every allocation of this program comes here.
 #include <cstdlib>
 #include <new>
+#include <utility>
 
 #include "tests/kirra/kirra_bench.h"
 

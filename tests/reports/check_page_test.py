@@ -7,6 +7,7 @@ check_page_test.py GOOD.html
 import pathlib
 import sys
 
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[2] / "tools"))
 import check_page
 
 # What to replace, by what, and what the check must say of it.

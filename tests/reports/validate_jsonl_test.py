@@ -3,9 +3,11 @@
 
 import json
 import pathlib
+import sys
 import tempfile
 import unittest
 
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[2] / "tools"))
 import validate_jsonl
 
 GOOD = [

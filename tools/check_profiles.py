@@ -13,7 +13,7 @@ import sys
 
 import jsonschema
 
-HERE = pathlib.Path(__file__).resolve().parent
+SAMPLES = pathlib.Path(__file__).resolve().parent.parent / "tests" / "profiles"
 SCHEMA = "device-profile.schema.json"
 VERDICTS = "expected-verdicts.json"
 
@@ -35,7 +35,7 @@ def main():
     files = {path.stem: path for path in folder.glob("*.json") if path.name not in (SCHEMA, VERDICTS)}
     gallery = {name: json.loads(path.read_text()) for name, path in files.items()}
     page = pathlib.Path(sys.argv[2]).read_text()
-    every_key = json.loads((HERE / "every_key.json").read_text())
+    every_key = json.loads((SAMPLES / "every_key.json").read_text())
     examples = [json.loads(text) for text in re.findall(r"```json\n(.*?)```", page, re.DOTALL)]
     valid = [*gallery.items(), ("every_key", every_key)] + [("example", text) for text in examples]
     for name, profile in valid:
@@ -48,7 +48,7 @@ def main():
         if f"| {' | '.join(cells)} |\n" not in page:
             problems.append(f"{name}: no profile, no verdicts or no such row in {sys.argv[2]}")
 
-    broken = json.loads((HERE / "broken_profiles.json").read_text())
+    broken = json.loads((SAMPLES / "broken_profiles.json").read_text())
     for row in broken:
         if validator.is_valid(row["profile"]) != ("beyondSchema" in row):
             verb = "rejected" if "beyondSchema" in row else "accepted"

@@ -14,7 +14,8 @@ import sys
 
 import jsonschema
 
-SCHEMAS = pathlib.Path(__file__).resolve().parent / "ocp-output-schema"
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+SCHEMAS = ROOT / "tests" / "reports" / "ocp-output-schema"
 HOLDS = {
     "GREATER_THAN_OR_EQUAL": operator.ge,
     "GREATER_THAN": operator.gt,

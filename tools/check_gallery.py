@@ -11,9 +11,9 @@ import pathlib
 import subprocess
 import sys
 
-HERE = pathlib.Path(__file__).resolve().parent
-EXPECTED = HERE.parent.parent / "profiles" / "expected-verdicts.json"
-VALIDATOR = HERE.parent / "reports" / "validate_jsonl.py"
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+EXPECTED = ROOT / "profiles" / "expected-verdicts.json"
+VALIDATOR = ROOT / "tools" / "validate_jsonl.py"
 RUNS = {
     "VantorMeterixDiagnostic": [],
     "VantorFaultDiagnostic": ["--set", "frameCount=30", "--set", "timeout=3"],

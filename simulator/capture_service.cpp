@@ -109,12 +109,8 @@ std::shared_ptr<WLISPCapturePlugIn> makeCapturePlugIn(CaptureProfile profile,
     if (!profile.plugIn) {
         return nullptr;
     }
-    return std::make_shared<PlugIn>(
-        std::shared_ptr<CaptureContext>(new CaptureContext{.profile = std::move(profile),
-                                                           .speed = speed,
-                                                           .progress = std::move(progress),
-                                                           .observer = std::move(observer),
-                                                           .liveBuffers = {}}));
+    return std::make_shared<PlugIn>(std::make_shared<CaptureContext>(
+        std::move(profile), speed, std::move(progress), std::move(observer)));
 }
 
 }  // namespace simulator

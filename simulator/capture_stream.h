@@ -8,6 +8,7 @@
 #include <memory>
 #include <string_view>
 #include <thread>
+#include <utility>
 
 #include "platform/mutex.h"
 #include "platform/welkin/capture.h"
@@ -32,6 +33,15 @@ class LiveBuffers {
 
 // What a plug-in, its devices and their streams share.
 struct CaptureContext {
+    CaptureContext(CaptureProfile deviceProfile,
+                   double deviceSpeed,
+                   std::shared_ptr<StreamProgress> deviceProgress,
+                   std::weak_ptr<Observer> deviceObserver)
+        : profile(std::move(deviceProfile))
+        , speed(deviceSpeed)
+        , progress(std::move(deviceProgress))
+        , observer(std::move(deviceObserver)) {}
+
     const CaptureProfile profile;
     const double speed;
     const std::shared_ptr<StreamProgress> progress;

@@ -1,6 +1,6 @@
 #!/usr/bin/python3
-"""Runs every diagnostic and experiment on every device of the gallery: the verdict must be the expected
-one, the exit status must follow from it, and the standard report must satisfy its schemas.
+"""Runs every diagnostic and experiment on every device of the gallery: the verdict and its reason must be
+the expected ones, the exit status must follow, and the standard report must satisfy its schemas.
 
 check_gallery.py ZRLAB OUTPUT-FOLDER
 """
@@ -12,7 +12,7 @@ import subprocess
 import sys
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
-EXPECTED = ROOT / "profiles" / "expected-verdicts.json"
+EXPECTED = ROOT / "profiles" / "expected-outcomes.json"
 VALIDATOR = ROOT / "tools" / "validate_jsonl.py"
 RUNS = {
     "VantorMeterixDiagnostic": [],
@@ -20,6 +20,26 @@ RUNS = {
     "KirraImageExperiment": ["--set", "images=5", "--set", "timeout=2"],
 }
 STATUS = {"PASS": 0, "FAIL": 1, "ERROR": 2}
+
+
+def failure_text(failure):
+    """The error's code and message, then what caused it, down to the device."""
+    error = failure["error"]
+    if error is None:
+        return failure["message"]
+    text = f'{error["code"]} {error["description"]}'
+    while error := error.get("underlying"):
+        text += f' < {error["domain"]} {error["code"]}'
+    return text
+
+
+def outcome_of(report):
+    """The verdict of a run and, when it is not PASS, why."""
+    done = report["runs"][0]
+    reasons = [failure_text(failure) for failure in done["failures"]]
+    if not reasons:
+        reasons = [one["name"] for one in done["results"] if one["judgement"] == "outside"]
+    return ": ".join([done["verdict"], *(["; ".join(reasons)] if reasons else [])])
 
 
 def run(zrlab, folder, device, name):
@@ -30,14 +50,14 @@ def run(zrlab, folder, device, name):
     done = subprocess.run(command, capture_output=True, text=True, timeout=120, check=False)
     where = f"{device}: {name}"
     try:
-        verdict = json.loads(done.stdout)["verdict"]
+        outcome = outcome_of(json.loads(done.stdout))
     except (ValueError, KeyError):
         return f"{where}: no report; exit status {done.returncode}: {done.stderr.strip()}"
     expected = json.loads(EXPECTED.read_text())[device][name]
-    if verdict != expected:
-        return f"{where}: verdict {verdict}, expected {expected}"
-    if done.returncode != STATUS[verdict]:
-        return f"{where}: exit status {done.returncode} with verdict {verdict}"
+    if outcome != expected:
+        return f"{where}: {outcome}, expected {expected}"
+    if done.returncode != STATUS[outcome.split(":")[0]]:
+        return f"{where}: exit status {done.returncode} with {outcome}"
     return None
 
 

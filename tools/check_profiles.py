@@ -15,7 +15,7 @@ import jsonschema
 
 SAMPLES = pathlib.Path(__file__).resolve().parent.parent / "tests" / "profiles"
 SCHEMA = "device-profile.schema.json"
-VERDICTS = "expected-verdicts.json"
+OUTCOMES = "expected-outcomes.json"
 
 
 def parts_of(node):
@@ -32,7 +32,7 @@ def main():
     validator = jsonschema.Draft202012Validator(schema)
     problems = []
 
-    files = {path.stem: path for path in folder.glob("*.json") if path.name not in (SCHEMA, VERDICTS)}
+    files = {path.stem: path for path in folder.glob("*.json") if path.name not in (SCHEMA, OUTCOMES)}
     gallery = {name: json.loads(path.read_text()) for name, path in files.items()}
     page = pathlib.Path(sys.argv[2]).read_text()
     every_key = json.loads((SAMPLES / "every_key.json").read_text())
@@ -42,11 +42,11 @@ def main():
         for error in validator.iter_errors(profile):
             problems.append(f"{name}: {error.json_path}: {error.message}")
 
-    verdicts = json.loads((folder / VERDICTS).read_text())
-    for name in sorted(set(gallery) | set(verdicts)):
-        cells = [f"`{name}`", gallery.get(name, {}).get("summary", "?"), *verdicts.get(name, {}).values()]
+    outcomes = json.loads((folder / OUTCOMES).read_text())
+    for name in sorted(set(gallery) | set(outcomes)):
+        cells = [f"`{name}`", gallery.get(name, {}).get("summary", "?"), *(one.split(":")[0] for one in outcomes.get(name, {}).values())]
         if f"| {' | '.join(cells)} |\n" not in page:
-            problems.append(f"{name}: no profile, no verdicts or no such row in {sys.argv[2]}")
+            problems.append(f"{name}: no profile, no outcomes or no such row in {sys.argv[2]}")
 
     broken = json.loads((SAMPLES / "broken_profiles.json").read_text())
     for row in broken:

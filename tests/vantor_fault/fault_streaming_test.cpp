@@ -246,15 +246,15 @@ TEST_F(FaultStreaming, TheFirstTriggerDecidesTheOutcome) {
     const auto healthy = capture;
     for (const auto& [name, last, unlit, missing, timesOut] : kPairs) {
         SCOPED_TRACE(name);
-        capture = healthy;
-        if (unlit != 0) {
-            at(unlit).set.set(kLight, 0);
-        }
-        if (missing != 0) {
-            at(missing).noMetadata = true;
-        }
-        install();
         for (int round = 0; round < kRounds; ++round) {
+            capture = healthy;
+            if (unlit != 0) {
+                at(unlit).set.set(kLight, 0);
+            }
+            if (missing != 0) {  // later and later: receiving runs far ahead of processing
+                at(missing + static_cast<std::uint64_t>(round) * 8).noMetadata = true;
+            }
+            install();
             const double timeout = timesOut ? round * 5e-6 : kLate;
             const auto experiment = make(last != 0 ? static_cast<double>(last) : 1e9, timeout);
             platform::ErrorRef caught;

@@ -3,7 +3,10 @@
 #include "kirra/image_record.h"
 
 #include <algorithm>
+#include <bit>
+#include <cstdint>
 #include <cstring>
+#include <utility>
 
 #include "fuzz/expect.h"
 

@@ -4,6 +4,10 @@
 // The input is a sequence of reports: a byte that says which kind (0: an error, 1: an image report,
 // else a report of that ID), the length in two bytes, lowest first, and so many bytes.
 #include <algorithm>
+#include <cstdint>
+#include <iterator>
+#include <memory>
+#include <span>
 #include <vector>
 
 #include "fuzz/expect.h"

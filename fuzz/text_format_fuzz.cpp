@@ -2,8 +2,8 @@
 // the same value in the same kind.
 #include "platform/text_format.h"
 
+#include <algorithm>
 #include <bit>
-#include <cmath>
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>

@@ -200,136 +200,34 @@ platform::ErrorRef errorOf(const simulator::Fault& fault) {
     return error;
 }
 
-TEST_F(ProfileReader, ReadsEveryKeyOfTheCaptureService) {
+// What the gallery does not show: which key becomes which member is seen from its outcomes.
+TEST_F(ProfileReader, KeepsTheKindsOfValuesAndTheChainsOfErrors) {
     const auto capture = load(fileOfTests("every_key.json")).capture;
-    EXPECT_TRUE(capture.plugIn);
-    EXPECT_FALSE(capture.device.fails() || capture.streamList.fails());
-    EXPECT_EQ(errorOf(capture.invalidate), nullptr);
     ASSERT_THAT(capture.streams, SizeIs(3));
-    EXPECT_EQ(capture.streams[0].portType, "ryl.port.front");
-    EXPECT_EQ(capture.streams[2].portType, "ryl.port.front-infrared");
-    EXPECT_THAT(capture.streams[2].metadata, SizeIs(17));
-
+    EXPECT_EQ(errorOf(capture.invalidate), nullptr);
     const auto& stream = capture.streams[1];
     const platform::ErrorRef start = errorOf(stream.start);
     EXPECT_THAT(start, test::IsError("Outer", -3, "no start", start->underlyingError()));
     EXPECT_THAT(start->underlyingError(), test::IsPlainError("Inner", 7, "no power"));
-    EXPECT_TRUE(stream.control.fails() && stream.stop.fails());
-    EXPECT_THAT(stream.propertyFaults, SizeIs(11));
-    EXPECT_FALSE(stream.propertyFaults.find(kRylCaptureStreamProperty_PortType)->fails());
-    for (const std::string_view key :
-         {kRylCaptureStreamProperty_InfraredLightSourceConfiguration,
-          kRylCaptureStreamProperty_MultipleOutputSupportEnabled,
-          kRylCaptureStreamProperty_FormatIndex, kRylCaptureStreamProperty_MinimumFrameRate,
-          kRylCaptureStreamProperty_MaximumFrameRate,
-          kRylCaptureStreamProperty_VideoOutputConfigurations,
-          kRylCaptureStreamProperty_VideoOutputsEnabled, kRylCaptureStreamProperty_AEEnabled,
-          kRylCaptureStreamProperty_VideoOutputHandlers, kRylCaptureStreamProperty_ErrorCounters}) {
-        const auto* fault = stream.propertyFaults.find(key);
-        EXPECT_TRUE(fault != nullptr && fault->fails()) << key;
-    }
     EXPECT_EQ(stream.errorCounters,
               platform::Value(platform::Dictionary{{"ryl.errors.i2c", 1},
                                                    {"ryl.errors.mipi", 2},
                                                    {"LPDPErrorCount", 3},
                                                    {"SIFErrorCount", "five"},
                                                    {"ProjectorErrorCount", 6.0}}));
-
-    // Numbers keep their kind.
     const auto metadata = platform::Dictionary(stream.metadata);
     EXPECT_EQ(metadata["RylInfraredLightSource"], platform::Value(std::int32_t{2}));
     EXPECT_FALSE(metadata.contains("RylFloodActiveTemperature"));
     EXPECT_EQ(metadata["HardwareEvents"], platform::Value(kLast));
     EXPECT_EQ(metadata["MetaDataProjectorMode"], platform::Value(std::int64_t{3000000000}));
     EXPECT_EQ(metadata["NTCTemperatureIdle"], platform::Value(30.0));
-    EXPECT_EQ(metadata["DIETemperatureIdle"], platform::Value("warm"));
     EXPECT_EQ(metadata["own"]["list"],
               platform::Value(platform::List{true, platform::Value(), std::int32_t{-1}}));
-    EXPECT_EQ(stream.lightSources, (std::vector<std::int32_t>{0, 1}));
-    EXPECT_EQ(*stream.warming.find("NTCTemperatureIdle"), 4);
-    EXPECT_FALSE(stream.warming.contains("DIETemperatureIdle"));
-
     ASSERT_THAT(stream.overrides, SizeIs(4));
-    const auto& dark = stream.overrides[0];
-    EXPECT_EQ(std::pair(dark.firstFrame, dark.lastFrame), std::pair(3UL, 3UL));
-    EXPECT_EQ(*dark.set.find("RylInfraredLightSource"), platform::Value(0));
-    EXPECT_THAT(dark.remove, ElementsAre("HardwareEvents"));
-    const auto& missing = stream.overrides[1];
-    EXPECT_EQ(std::pair(missing.firstFrame, missing.lastFrame), std::pair(4UL, 6UL));
-    EXPECT_TRUE(missing.noMetadata && !missing.metadataIsNoDictionary && !missing.dropped);
-    const auto& corrupt = stream.overrides[2];
-    EXPECT_EQ(std::pair(corrupt.firstFrame, corrupt.lastFrame), std::pair(7UL, kLast));
-    EXPECT_TRUE(corrupt.metadataIsNoDictionary && !corrupt.noMetadata);
-    const auto& dropped = stream.overrides[3];
-    EXPECT_EQ(std::pair(dropped.firstFrame, dropped.lastFrame), std::pair(1UL, kLast));
-    EXPECT_TRUE(dropped.dropped);
-    ASSERT_THAT(stream.events, SizeIs(1));
-    EXPECT_EQ(std::tuple(stream.events[0].frame, stream.events[0].code, stream.events[0].info),
-              std::tuple(2, -4, 5));
-    EXPECT_EQ(stream.jitterMicroseconds, 12.5);
-    EXPECT_EQ(stream.seed, 9U);
-    EXPECT_EQ(stream.stallAfterFrame, 0U);
-    EXPECT_EQ(stream.framesAfterStop, 3U);
-}
-
-TEST_F(ProfileReader, ReadsEveryKeyOfTheCountersTheHidBusAndTheDisplay) {
-    const DeviceProfile device = load(fileOfTests("every_key.json"));
-    const auto& counters = device.meterix;
-    EXPECT_TRUE(counters.report.fails() && counters.firstSnapshot.fails() &&
-                counters.laterSnapshots.fails() && counters.difference.fails());
-    EXPECT_THAT(counters.channels, SizeIs(64));
-    int seen = 0;
-    for (const auto& channel : counters.channels) {
-        EXPECT_NE(channel.name, "Number YB FAULT_B");
-        if (channel.name == "Number Xel INT_FAULT_CC") {
-            EXPECT_EQ(channel.count, 3U);
-            EXPECT_EQ(std::tuple(channel.risePerSecond, channel.riseAtFrame, channel.riseBy),
-                      std::tuple(0.5, 10, 2));
-            ++seen;
-        } else if (channel.name == "Number YB FAULT_A") {
-            EXPECT_EQ(channel.count, std::nullopt);
-            ++seen;
-        }
-    }
-    EXPECT_EQ(seen, 2);
-    EXPECT_EQ(counters.channels.back().count, 0U);
-
-    EXPECT_FALSE(device.hid.managerAvailable);
-    ASSERT_THAT(device.hid.devices, SizeIs(3));
-    const auto& sensor = device.hid.devices[0];
-    EXPECT_EQ(std::tie(sensor.product, sensor.usagePage, sensor.usage),
-              std::make_tuple("Kirra", 65281, 37));
-    EXPECT_TRUE(sensor.open.fails() && sensor.close.fails());
-    EXPECT_TRUE(sensor.featureReports.at(171).fails());
-    EXPECT_FALSE(sensor.featureReports.at(172).fails());
-    EXPECT_FALSE(sensor.needsFeatureReports);
-    EXPECT_EQ(sensor.reportsPerSecond, 60);
-    EXPECT_EQ(sensor.maxReports, 0U);
-    ASSERT_THAT(sensor.overrides, SizeIs(2));
-    EXPECT_EQ(sensor.overrides[0].firstReport, 2U);
-    EXPECT_EQ(sensor.overrides[0].lastReport, 3U);
-    EXPECT_EQ(sensor.overrides[0].length, 12U);
-    EXPECT_EQ(sensor.overrides[0].reportID, 119);
-    EXPECT_TRUE(sensor.overrides[1].dropped);
-    EXPECT_EQ(sensor.errorAtReport.value().report, 8U);
-    EXPECT_THAT(sensor.errorAtReport->error, test::IsPlainError("HID", 1, "lost"));
-    EXPECT_EQ(sensor.unplugAtReport, 9U);
-    EXPECT_EQ(sensor.firstFrameId, 4294967295U);
-    EXPECT_EQ(sensor.firstTimestamp, 50U);
-    EXPECT_EQ(sensor.startTemperature, 40);
-    EXPECT_EQ(sensor.temperaturePerReport, -0.5);
-    const auto& scan = sensor.scan;
-    EXPECT_THAT((std::vector{scan.amplitude, scan.center, scan.width, scan.frequency, scan.chirp,
-                             scan.turn, scan.noise}),
-                ElementsAre(1, 2, 3, 4, 5, 6, 7));
-    EXPECT_EQ(device.hid.devices[2].product, "Kirra 2");
-    EXPECT_EQ(device.hid.devices[2].reportsPerSecond, 20);
-
-    const auto& display = device.display;
-    EXPECT_EQ(display.mainDisplayStatus, -1);
-    EXPECT_FALSE(display.registryService || display.property || display.powerInfo ||
-                 display.powerPanel);
-    EXPECT_EQ(display.powered, platform::Value(0));
+    EXPECT_EQ(std::pair(stream.overrides[1].firstFrame, stream.overrides[1].lastFrame),
+              std::pair(4UL, 6UL));
+    EXPECT_EQ(std::pair(stream.overrides[2].firstFrame, stream.overrides[2].lastFrame),
+              std::pair(7UL, kLast));
 }
 
 }  // namespace

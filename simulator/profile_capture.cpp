@@ -171,8 +171,21 @@ void readStreamFaults(const JsonNode& node, StreamProfile& stream) {
     });
 }
 
+// A port type that the service has itself may be given by its short name, the stream's.
+std::string portTypeOf(const JsonNode& node) {
+    const std::string text = node.asText();
+    const std::string own = std::string(kPortTypePrefix) + text;
+    for (const StreamProfile& stream : healthyCapture().streams) {
+        if (stream.portType == own) {
+            return own;
+        }
+    }
+    return text;
+}
+
 constexpr JsonKey<StreamProfile> kStreamKeys[] = {
-    {"portType", readMember<&StreamProfile::portType>},
+    {"portType",
+     [](const JsonNode& node, StreamProfile& stream) { stream.portType = portTypeOf(node); }},
     {"faults", readStreamFaults},
     {"errorCounters", readErrorCounters},
     {"metadata",
@@ -208,7 +221,7 @@ std::string nameOfStream(const StreamProfile& stream) {
 
 // Starts as a healthy stream of its port type, or as the front camera when there is none.
 StreamProfile makeStream(const std::string& /*name*/, const JsonNode& node) {
-    const std::string portType = node["portType"].asText();
+    const std::string portType = portTypeOf(node["portType"]);
     const std::vector<StreamProfile> healthy = healthyCapture().streams;
     const auto find = [&](std::string_view wanted) {
         return std::find_if(healthy.begin(), healthy.end(),

@@ -1,5 +1,6 @@
 #include "host/clean_text.h"
 
+#include <algorithm>
 #include <cstddef>
 
 #include <nlohmann/json.hpp>
@@ -63,6 +64,13 @@ std::string htmlText(std::string_view text) {
         }
     }
     return out;
+}
+
+std::string plainLine(std::string_view text) {
+    std::string line(text);
+    std::replace_if(
+        line.begin(), line.end(), [](unsigned char c) { return c < 0x20 || c == 0x7F; }, '?');
+    return line;
 }
 
 }  // namespace host

@@ -1,4 +1,4 @@
-// Text that XML 1.0 and HTML can carry.
+// Text that XML 1.0, HTML and a terminal can carry.
 #ifndef ZR_HOST_CLEAN_TEXT_H
 #define ZR_HOST_CLEAN_TEXT_H
 
@@ -13,6 +13,9 @@ std::string cleanText(std::string_view text);
 
 // The clean text with &, <, >, " and ' as entities: for the content and the attributes of HTML.
 std::string htmlText(std::string_view text);
+
+// The text in one line that drives no terminal: every control character is a question mark.
+std::string plainLine(std::string_view text);
 
 }  // namespace host
 

@@ -1,7 +1,9 @@
 #include "host/command_line.h"
 
+#include <cctype>
 #include <cstdint>
 #include <filesystem>
+#include <sstream>
 #include <system_error>
 
 #include "platform/nearest.h"
@@ -117,7 +119,9 @@ void CommandLine::_addRun() {
                    "The simulated device: a name of the gallery or a file")
         ->type_name("NAME|FILE")
         ->capture_default_str();
-    run.add_option("--speed", session.speed, "Device time a second of real time, or max")
+    run.add_option(
+           "--speed", session.speed,
+           "Device seconds a second, 0.001 to 100, or max;\ntime-outs stay those of real time")
         ->type_name("FACTOR|max")
         ->capture_default_str();
     run.add_option("--format", session.format, "Form of the report")
@@ -125,7 +129,12 @@ void CommandLine::_addRun() {
         ->type_name("text|json|jsonl|junit")
         ->capture_default_str();
     run.add_option("--output", session.output, "Write the report to this file, whole or not at all")
-        ->type_name("FILE");
+        ->type_name("FILE")
+        ->check(CLI::Validator(
+            [](const std::string& file) {
+                return file.empty() ? std::string("the name of the file is empty") : std::string();
+            },
+            ""));
     run.add_option(
            "--report", session.reports,
            "Write a further report; its ending tells the form: .html, .json, .jsonl, .txt or "
@@ -164,13 +173,19 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
     const CLI::App* given = nullptr;
     for (int at = 1; at < count; ++at) {
         const std::string argument = arguments[at];
-        if (given == nullptr && argument.front() != '-') {
+        if (given == nullptr && argument.starts_with("-")) {
+            if (_app.get_option_no_throw(argument) == nullptr) {
+                return "unknown option " + argument +
+                       platform::didYouMean(argument, {"--help", "--version"});
+            }
+        } else if (given == nullptr) {
             given = find(argument);
             if (given == nullptr) {
                 return "unknown command \"" + argument + "\"" +
                        platform::didYouMean(argument, commandNames());
             }
-        } else if (argument.starts_with("-") && given != nullptr) {
+        } else if (argument.size() > 1 && argument[0] == '-' &&
+                   std::isdigit(static_cast<unsigned char>(argument[1])) == 0) {
             const std::string option = argument.substr(0, argument.find('='));
             if (given->get_option_no_throw(option) == nullptr) {
                 std::vector<std::string> options;
@@ -200,10 +215,11 @@ std::optional<int> CommandLine::read(int count, const char* const* arguments) {
     try {
         _app.parse(count, arguments);
     } catch (const CLI::Success& success) {
-        _app.exit(success);
-        return kExitPassed;
+        std::ostringstream told;
+        _app.exit(success, told, told);
+        return Terminal::shared().output(told.str()) ? kExitPassed : kExitError;
     } catch (const CLI::ParseError& error) {
-        Terminal::shared().line("zrlab: " + _explain(error, count, arguments));
+        Terminal::shared().complain(_explain(error, count, arguments));
         return kExitUsage;
     }
     return std::nullopt;

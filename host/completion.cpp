@@ -44,12 +44,15 @@ std::string wordsFunction(const CLI::App& app) {
             "        " + command->get_name() + ") words=\"" + optionNames(*command) + "\";;\n";
         values += optionValues(*command);
     }
-    return "# Words that can follow: $1 the command so far, $2 the word before the cursor.\n"
+    return "# Words that can follow: $1 the command so far, $2 the word before the cursor, $3 the "
+           "word at\n"
+           "# it, $4 the program.\n"
            "_zrlab_words() {\n"
            "    local words=\"\"\n"
            "    case \"$2\" in\n" +
            values +
-           "        --device) words=\"$(zrlab devices --names 2>/dev/null)\";;\n"
+           "        --device) words=\"$(\"$4\" devices --names 2>/dev/null) $(compgen -f -- \"$3\" "
+           "2>/dev/null)\";;\n"
            "        --set|--speed|--repeat) ;;\n"
            "        --output|--report|--plugin) words=\"$(compgen -f -- \"$3\" 2>/dev/null)\";;\n"
            "        completion) words=\"bash zsh\";;\n"
@@ -60,7 +63,7 @@ std::string wordsFunction(const CLI::App& app) {
            perCommand +
            "        esac\n"
            "        case \"$1\" in\n"
-           "        run|describe) words=\"$words $(zrlab list --names 2>/dev/null)\";;\n"
+           "        run|describe) words=\"$words $(\"$4\" list --names 2>/dev/null)\";;\n"
            "        esac;;\n"
            "    esac\n"
            "    printf '%s\\n' $words\n"
@@ -76,7 +79,7 @@ std::string completionScript(const CLI::App& app, const std::string& shell) {
                "    local word=\"${COMP_WORDS[COMP_CWORD]}\" last=\"${COMP_WORDS[COMP_CWORD-1]}\"\n"
                "    if [ \"$COMP_CWORD\" -eq 1 ]; then last=zrlab; fi\n"
                "    COMPREPLY=($(compgen -W \"$(_zrlab_words \"${COMP_WORDS[1]}\" \"$last\" "
-               "\"$word\")\" -- \"$word\"))\n"
+               "\"$word\" \"$1\")\" -- \"$word\"))\n"
                "}\n"
                "complete -F _zrlab zrlab ./zrlab\n";
     }
@@ -88,7 +91,8 @@ std::string completionScript(const CLI::App& app, const std::string& shell) {
                "        --output|--report|--plugin) _files; return;;\n"
                "    esac\n"
                "    [ \"$CURRENT\" -eq 2 ] && last=zrlab\n"
-               "    compadd -- ${(f)\"$(_zrlab_words \"${words[2]}\" \"$last\" \"\" | tr ' ' "
+               "    compadd -- ${(f)\"$(_zrlab_words \"${words[2]}\" \"$last\" \"\" "
+               "\"${words[1]}\" | tr ' ' "
                "'\\n')\"}\n"
                "}\n"
                "_zrlab \"$@\"\n";

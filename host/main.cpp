@@ -19,7 +19,7 @@ namespace host {
 namespace {
 
 int complain(int status, const std::string& problem) {
-    Terminal::shared().line("zrlab: " + problem);
+    Terminal::shared().complain(problem);
     return status;
 }
 
@@ -131,8 +131,8 @@ int withPlugin(const CommandLine& commandLine) {
         return complain(kExitError, *problem);
     }
     for (const auto& refusal : ZRLab::defaultLab().refusals()) {
-        Terminal::shared().line(
-            fmt::format("zrlab: the {} name \"{}\" is taken; the module's second "
+        Terminal::shared().complain(
+            fmt::format("the {} name \"{}\" is taken; the module's second "
                         "registration of it is ignored",
                         refusal.kind, refusal.name));
     }

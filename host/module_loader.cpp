@@ -1,6 +1,7 @@
 #include "host/module_loader.h"
 
 #include <filesystem>
+#include <set>
 #include <system_error>
 
 #include <dlfcn.h>
@@ -30,17 +31,18 @@ std::optional<std::string> loadModule(const std::string& path) {
     }
     // An absolute path keeps the loader from searching its own folders.
     const std::string absolute = std::filesystem::absolute(path).string();
-    if (dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NOLOAD) != nullptr) {
-        return std::nullopt;
-    }
+    static std::set<void*>& loaded = *new std::set<void*>;  // of modules that registered something
     const std::size_t before = registeredCount();
-    if (dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL) == nullptr) {
+    void* const module = dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL);
+    if (module == nullptr) {
         return "plug-in module " + path + ": cannot be loaded: " + dlerror();
     }
-    if (registeredCount() == before) {
-        return "plug-in module " + path + ": it registers nothing";
+    if (registeredCount() != before) {
+        loaded.insert(module);
     }
-    return std::nullopt;
+    return loaded.contains(module)
+               ? std::nullopt
+               : std::optional("plug-in module " + path + ": it registers nothing");
 }
 
 }  // namespace host

@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <cstdlib>
+#include <filesystem>
 #include <system_error>
 
 #include <fcntl.h>
@@ -19,10 +20,49 @@ std::string problemWith(const std::string& path, int number) {
     return "cannot write " + path + ": " + std::generic_category().message(number);
 }
 
+bool writeAll(int file, std::string_view content) {
+    while (!content.empty()) {
+        const ssize_t written = ::write(file, content.data(), content.size());
+        if (written < 0 && errno != EINTR) {
+            return false;
+        }
+        content.remove_prefix(written > 0 ? static_cast<std::size_t>(written) : 0);
+    }
+    return true;
+}
+
+// Where a report goes: what stands there now, its links followed.
+struct Target {
+    explicit Target(const std::string& given) : path(given) {
+        std::error_code none;
+        const auto real = std::filesystem::canonical(given, none);
+        if (!none) {
+            path = real.string();
+        }
+        exists = stat(path.c_str(), &status) == 0;
+    }
+    bool isFolder() const { return exists && S_ISDIR(status.st_mode); }
+    bool isSpecial() const { return exists && !S_ISREG(status.st_mode); }
+
+    // What a file made in the ordinary way would get, unless there is one already.
+    mode_t mode() const {
+        if (exists) {
+            return status.st_mode & 07777;
+        }
+        const mode_t mask = umask(0);
+        umask(mask);
+        return 0666 & ~mask;
+    }
+
+    std::string path;
+    struct stat status {};
+    bool exists = false;
+};
+
 // A temporary file beside its target; removed again unless it takes the target's place.
 class Temporary {
   public:
-    explicit Temporary(const std::string& target) : _path(target + ".XXXXXX") {
+    explicit Temporary(const Target& target) : _path(target.path + ".XXXXXX") {
         _file = mkostemp(_path.data(), O_CLOEXEC);
     }
     Temporary(const Temporary&) = delete;
@@ -36,21 +76,9 @@ class Temporary {
 
     bool isOpen() const { return _file >= 0; }
 
-    bool replace(const std::string& target, std::string_view content) {
-        while (!content.empty()) {
-            const ssize_t written = ::write(_file, content.data(), content.size());
-            if (written < 0 && errno != EINTR) {
-                return false;
-            }
-            if (written > 0) {
-                content.remove_prefix(static_cast<std::size_t>(written));
-            }
-        }
-        // What a file made in the ordinary way would get; the temporary one is its owner's only.
-        const mode_t mask = umask(0);
-        umask(mask);
-        if (fchmod(_file, 0666 & ~mask) != 0 || fsync(_file) != 0 ||
-            rename(_path.c_str(), target.c_str()) != 0) {
+    bool replace(const Target& target, std::string_view content) {
+        if (!isOpen() || !writeAll(_file, content) || fchmod(_file, target.mode()) != 0 ||
+            fsync(_file) != 0 || rename(_path.c_str(), target.path.c_str()) != 0) {
             return false;
         }
         close(_file);
@@ -63,24 +91,36 @@ class Temporary {
     int _file;
 };
 
+bool writeSpecial(const Target& target, std::string_view content) {
+    const int file = open(target.path.c_str(), O_WRONLY | O_CLOEXEC);
+    if (file < 0) {
+        return false;
+    }
+    const bool written = writeAll(file, content);
+    return close(file) == 0 && written;
+}
+
 }  // namespace
 
 std::optional<std::string> cannotWrite(const std::string& path) {
-    struct stat status {};
-    if (stat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode)) {
+    const Target target(path);
+    if (target.isFolder()) {
         return problemWith(path, EISDIR);
     }
-    const Temporary temporary(path);
+    if (target.isSpecial()) {
+        return access(target.path.c_str(), W_OK) == 0 ? std::nullopt
+                                                      : std::optional(problemWith(path, errno));
+    }
+    const Temporary temporary(target);
     return temporary.isOpen() ? std::nullopt : std::optional(problemWith(path, errno));
 }
 
 std::optional<std::string> writeFile(const std::string& path, std::string_view content) {
     const platform::MutexLock lock(Terminal::shared().mutex());
-    Temporary temporary(path);
-    if (!temporary.isOpen() || !temporary.replace(path, content)) {
-        return problemWith(path, errno);
-    }
-    return std::nullopt;
+    const Target target(path);
+    const bool written = target.isSpecial() ? writeSpecial(target, content)
+                                            : Temporary(target).replace(target, content);
+    return written ? std::nullopt : std::optional(problemWith(path, errno));
 }
 
 Spool::Spool() : _file(std::tmpfile()), _lost(_file == nullptr) {}

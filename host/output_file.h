@@ -13,8 +13,9 @@ namespace host {
 // behind: used before a long run, so that its report is not lost at the end.
 std::optional<std::string> cannotWrite(const std::string& path);
 
-// Replaces the file at `path` by one with this content: a temporary file beside it, then a rename. An
-// interrupt waits until it is done. Returns nothing on success, else one line that says what went
+// Replaces the file at `path` by one with this content: a temporary file beside it, then a rename, so
+// that the file keeps its mode. A link is followed; what is no file (a device, a pipe) is written to.
+// An interrupt waits until it is done. Returns nothing on success, else one line that says what went
 // wrong; the file is then as it was before.
 std::optional<std::string> writeFile(const std::string& path, std::string_view content);
 

@@ -73,16 +73,21 @@ std::string Progress::_text() const {
         std::chrono::duration<double>(std::chrono::steady_clock::now() - _began).count();
     const auto count = static_cast<double>(_what == "frames" ? _recorder.frames()  //
                                                              : _recorder.images());
-    const double share = _wanted > 0 ? std::min(count / _wanted, 1.0) : 0.0;
-    constexpr int kWidth = 24;
-    const int full = static_cast<int>(std::lround(share * kWidth));
-    std::string bar;
-    for (int at = 0; at < kWidth; ++at) {
-        bar += at < full ? "━" : "╌";
+    std::string text = fmt::format("{}{:.0f} of {:.6g} {}, {:.1f} a second", _prefix, count,
+                                   _wanted, _what, elapsed > 0 ? count / elapsed : 0.0);
+    const double left = std::max(std::ceil(_timeout - elapsed), 0.0);
+    if (_timeout >= 0 && std::isfinite(left)) {
+        text += fmt::format(", {:.6g} s until the time-out", left);
     }
-    return fmt::format("{}{} {:.0f} of {:.0f} {}, {:.1f} a second, {:.0f} s until the time-out",
-                       _prefix, bar, count, _wanted, _what, elapsed > 0 ? count / elapsed : 0.0,
-                       std::max(std::ceil(_timeout - elapsed), 0.0));
+    // Last, so that a narrow terminal cuts it first.
+    constexpr int kWidth = 24;
+    const double share = _wanted > 0 ? std::min(count / _wanted, 1.0) : 0.0;
+    const int full = static_cast<int>(std::lround(share * kWidth));
+    for (int at = 0; at < kWidth && Terminal::shared().progressIsTerminal(); ++at) {
+        text += at == 0 ? "  " : "";
+        text += at < full ? "━" : "╌";
+    }
+    return text;
 }
 
 }  // namespace host

@@ -141,10 +141,14 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
             for (const auto& [parameter, declaration] : description->parameters()) {
                 declared.push_back(parameter);
                 std::optional<platform::Number> value;
-                for (std::size_t i = 0; i < settings.size(); ++i) {
-                    if (settings[i].name == parameter && settings[i].part.value_or(kind) == kind) {
-                        value = settings[i].value;
-                        used[i] = true;
+                // What was given to every part, then what was given to this one.
+                for (const std::optional<Part> part :
+                     {std::optional<Part>(), std::optional(kind)}) {
+                    for (std::size_t i = 0; i < settings.size(); ++i) {
+                        if (settings[i].name == parameter && settings[i].part == part) {
+                            value = settings[i].value;
+                            used[i] = true;
+                        }
                     }
                 }
                 if (value.has_value()) {
@@ -164,8 +168,13 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
     // An unknown parameter first: a misspelt one is also what leaves another without a value.
     for (std::size_t i = 0; i < settings.size(); ++i) {
         if (!used[i]) {
-            problem = "no part of what is to be run declares a parameter \"" + settings[i].name +
-                      "\"" + platform::didYouMean(settings[i].name, declared);
+            const std::string whose =
+                settings[i].part.has_value()
+                    ? "no " + std::string(partText(*settings[i].part)) + " that is"
+                    : "no part of what is";
+            std::erase(declared, settings[i].name);  // of another part
+            problem = whose + " to be run declares a parameter \"" + settings[i].name + "\"" +
+                      platform::didYouMean(settings[i].name, declared);
             return std::nullopt;
         }
     }

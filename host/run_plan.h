@@ -47,7 +47,7 @@ struct RunPlan {
 };
 
 // Plans a run for each name: a diagnostic, or an experiment on its own. Every part gets the settings
-// that it declares, a later one over an earlier. On failure (an unknown name, a setting that no part
+// that it declares: one for that part over one for every part, then a later one over an earlier. On failure (an unknown name, a setting that no part
 // declares, a required parameter without a value, a diagnostic whose part is not registered) returns
 // nothing and stores one line in `problem`.
 std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,

@@ -1,12 +1,14 @@
 #include "host/session.h"
 
+#include <algorithm>
+#include <cctype>
 #include <charconv>
 #include <chrono>
-#include <cmath>
 #include <filesystem>
 #include <functional>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string_view>
 #include <utility>
 
@@ -33,18 +35,24 @@ namespace host {
 namespace {
 
 int complain(int status, const std::string& problem) {
-    Terminal::shared().line("zrlab: " + problem);
+    Terminal::shared().complain(problem);
     return status;
 }
 
+// Beyond the greatest factor a device could outrun what validates its frames, and a run would depend
+// on the machine's load.
+constexpr double kLeastSpeed = 0.001;
+constexpr double kMaxSpeed = 100;
+
 std::optional<double> readSpeed(std::string_view text) {
     if (text == "max") {
-        return 0.0;
+        return kMaxSpeed;
     }
     double speed = 0;
     const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), speed);
     const bool whole = problem == std::errc() && end == text.data() + text.size();
-    return whole && std::isfinite(speed) && speed > 0 ? std::optional(speed) : std::nullopt;
+    return whole && speed >= kLeastSpeed && speed <= kMaxSpeed ? std::optional(speed)
+                                                               : std::nullopt;
 }
 
 // A form that a finished session can be written in, and the file endings that ask for it.
@@ -56,7 +64,9 @@ constexpr Form kForms[] = {
     {"text", ".txt"}, {"json", ".json"}, {"jsonl", ".jsonl"}, {"junit", ".xml"}, {"html", ".html"}};
 
 std::string formOf(const std::string& file) {
-    const std::string ending = std::filesystem::path(file).extension().string();
+    std::string ending = std::filesystem::path(file).extension().string();
+    std::transform(ending.begin(), ending.end(), ending.begin(),
+                   [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
     for (const Form& form : kForms) {
         if (form.ending == ending) {
             return std::string(form.name);
@@ -115,7 +125,9 @@ class Session {
             listener->sessionStarted(_record);
         }
         for (const RunPlan& plan : _plans) {
-            _repeat(plan);
+            if (!_outputFailed) {
+                _repeat(plan);
+            }
         }
         _record.seconds =
             std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
@@ -140,10 +152,16 @@ class Session {
         }
         const auto speed = readSpeed(_options.speed);
         if (!speed.has_value()) {
-            return Problem{kExitUsage,
-                           "--speed " + _options.speed + ": neither \"max\" nor a factor above 0"};
+            return Problem{kExitUsage, "--speed " + _options.speed +
+                                           ": neither \"max\" nor a factor from 0.001 to 100"};
         }
         if (!_options.output.empty()) {
+            const std::string told = formOf(_options.output);
+            if (!told.empty() && told != _options.format) {
+                return Problem{kExitUsage, "--output " + _options.output + ": its ending says " +
+                                               told + ", the format is " + _options.format +
+                                               "; a further report is asked for with --report"};
+            }
             _files.emplace_back(_options.format, _options.output);
         }
         for (const std::string& file : _options.reports) {
@@ -154,6 +172,9 @@ class Session {
                                    ": its ending is none of .html, .json, .jsonl, .txt, .xml"};
             }
             _files.emplace_back(form, file);
+        }
+        if (const auto clash = _clashOfFiles()) {
+            return Problem{kExitUsage, *clash};
         }
         auto plans = planRuns(ZRLab::defaultLab(), _options.names, settings, problem);
         if (!plans.has_value()) {
@@ -179,6 +200,25 @@ class Session {
         _startLog();
         platform::installServices(simulator::makeDevice(*profile, *speed, _recorder));
         platform::RunLoop::forThisThread();  // some experiments need one
+        return std::nullopt;
+    }
+
+    // Two reports in one file, or a report over the profile that it is made with.
+    std::optional<std::string> _clashOfFiles() const {
+        std::set<std::filesystem::path> seen;
+        const auto add = [&seen](const std::string& file) {
+            std::error_code none;
+            const auto path = std::filesystem::weakly_canonical(file, none);
+            const bool special = std::filesystem::exists(path, none) &&
+                                 !std::filesystem::is_regular_file(path, none);
+            return special || seen.insert(path).second;
+        };
+        add(_options.device);
+        for (const auto& [form, file] : _files) {
+            if (!add(file)) {
+                return file + ": it cannot take this report, it is used for something else already";
+            }
+        }
         return std::nullopt;
     }
 
@@ -241,10 +281,14 @@ class Session {
             if (repeats) {
                 statistics.add(run);
                 if (Terminal::shared().progressIsTerminal()) {
-                    Terminal::shared().line(textLine(run, {.colour = true, .verbose = false}));
+                    Terminal::shared().line(textLine(
+                        run,
+                        {.colour = Terminal::errorTakesColour(_options.colour), .verbose = false}));
                 }
             }
-            const bool stops = _options.untilFail && run.verdict != Verdict::Passed;
+            // Nor does a report go on that nobody can read any more.
+            const bool stops =
+                _outputFailed || (_options.untilFail && run.verdict != Verdict::Passed);
             if (!kept.has_value() || kept->verdict == Verdict::Passed) {
                 kept = std::move(run);
             }

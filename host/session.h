@@ -15,7 +15,7 @@ struct SessionOptions {
     std::vector<std::string> names;     // what to run, in this order
     std::vector<std::string> settings;  // PARAM=VALUE
     std::string device = "healthy";     // a name of the gallery, or a file
-    std::string speed = "1";            // device seconds a second, or "max"
+    std::string speed = "1";            // device seconds a second, 0.001 to 100, or "max"
     std::string format = "text";        // text, json, jsonl or junit
     std::string output;                 // the file that gets the format; empty for standard output
     std::vector<std::string> reports;   // further files, their form told by their ending

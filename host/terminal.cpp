@@ -7,7 +7,10 @@
 #include <thread>
 
 #include <pthread.h>
+#include <sys/ioctl.h>
 #include <unistd.h>
+
+#include "host/clean_text.h"
 
 namespace host {
 
@@ -36,7 +39,33 @@ std::string_view environment(const char* name) {
 
 }  // namespace
 
-Terminal::Terminal() : _errorIsTerminal(isatty(STDERR_FILENO) == 1) {}
+Terminal::Terminal()
+    : _errorIsTerminal(isatty(STDERR_FILENO) == 1 && environment("TERM") != "dumb") {}
+
+// The text's first `columns` characters. Every character that the program shows takes one column.
+std::string_view cutTo(std::string_view text, std::size_t columns) {
+    std::size_t at = 0;
+    for (; at < text.size(); ++at) {
+        const bool begins = (static_cast<unsigned char>(text[at]) & 0xC0) != 0x80;
+        if (begins && columns-- == 0) {
+            break;
+        }
+    }
+    return text.substr(0, at);
+}
+
+std::size_t widthOf(int terminal) {
+    winsize size{};
+    const bool known = ioctl(terminal, TIOCGWINSZ, &size) == 0 && size.ws_col > 0;
+    return known ? size.ws_col : 80;
+}
+
+bool takesColour(int file, Colour asked) {
+    if (asked != Colour::Automatic) {
+        return asked == Colour::Always;
+    }
+    return isatty(file) == 1 && environment("NO_COLOR").empty() && environment("TERM") != "dumb";
+}
 
 Terminal& Terminal::shared() {
     static Terminal& terminal = *new Terminal;
@@ -49,7 +78,8 @@ void Terminal::endOnInterrupt() {
     sigaddset(&signals, SIGINT);
     sigaddset(&signals, SIGTERM);
     pthread_sigmask(SIG_BLOCK, &signals, nullptr);  // inherited by every thread started from now on
-    std::signal(SIGPIPE, SIG_IGN);                  // output() reports it
+    std::signal(SIGPIPE, SIG_IGN);                  // whoever writes sees it fail
+    std::signal(SIGXFSZ, SIG_IGN);                  // so too beyond a limit of file sizes
     std::thread([this, signals] {
         int signal = 0;
         sigwait(&signals, &signal);
@@ -68,11 +98,15 @@ void Terminal::endOnInterrupt() {
 }
 
 bool Terminal::outputTakesColour(Colour asked) {
-    if (asked != Colour::Automatic) {
-        return asked == Colour::Always;
-    }
-    return isatty(STDOUT_FILENO) == 1 && environment("NO_COLOR").empty() &&
-           environment("TERM") != "dumb";
+    return takesColour(STDOUT_FILENO, asked);
+}
+
+bool Terminal::errorTakesColour(Colour asked) {
+    return takesColour(STDERR_FILENO, asked);
+}
+
+void Terminal::complain(std::string_view problem) {
+    line("zrlab: " + plainLine(problem));
 }
 
 bool Terminal::output(std::string_view text) {
@@ -98,7 +132,9 @@ void Terminal::status(std::string_view text) {
     if (!_errorIsTerminal || (text.empty() && !_statusShown)) {
         return;
     }
-    writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(text));
+    // One column stays free, or some terminals begin another line.
+    const std::string_view shown = cutTo(text, widthOf(STDERR_FILENO) - 1);
+    writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(shown));
     _statusShown = !text.empty();
 }
 

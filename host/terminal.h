@@ -20,6 +20,9 @@ class Terminal {
     // The program's terminal; lives until the process ends.
     static Terminal& shared();
 
+    // Tells a problem in one line on standard error: "zrlab: …".
+    void complain(std::string_view problem);
+
     // From now on an interrupt (Ctrl-C) or a request to terminate ends the program at once with exit
     // status 128 plus the signal's number: 130 for an interrupt. Call before any thread is started.
     void endOnInterrupt();
@@ -27,15 +30,18 @@ class Terminal {
     // Whether standard output takes colour: as asked; Automatic means on a terminal, unless the
     // environment has a NO_COLOR that is not empty or TERM is "dumb".
     static bool outputTakesColour(Colour asked);
+    // The same of standard error.
+    static bool errorTakesColour(Colour asked);
 
+    // Whether standard error is a terminal that can take a status line.
     bool progressIsTerminal() const { return _errorIsTerminal; }
 
     // Writes to standard output, whole. False when it cannot be written (the reader has gone).
     bool output(std::string_view text);
     // Writes one line to standard error, above the status line.
     void line(std::string_view text);
-    // Shows a status line on standard error, in place of the one before; only on a terminal. Empty
-    // text takes it away.
+    // Shows a status line on standard error, in place of the one before and cut to the terminal's
+    // width; only on a terminal. Empty text takes it away.
     void status(std::string_view text);
 
     // Held while something is written that an interrupt must not cut.

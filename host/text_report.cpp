@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "host/clean_text.h"
 #include "host/run_text.h"
 
 namespace host {
@@ -90,15 +91,16 @@ std::string measurementRows(const std::vector<MeasurementRecord>& measurements) 
 
 std::string errorText(const FailureRecord& failure, const RunRecord& run, const Writer& writer) {
     std::string out = fmt::format("  {} {}: {}\n", writer.bad("✗"), placeText(failure, run),
-                                  writer.strong(failureText(failure)));
+                                  writer.strong(plainLine(failureText(failure))));
     if (failure.error == nullptr) {
         return out;
     }
     out += fmt::format("    {} {}\n", failure.error->domain(), failure.error->code());
     for (platform::ErrorRef under = failure.error->underlyingError(); under != nullptr;
          under = under->underlyingError()) {
-        out += fmt::format("    caused by: {}\n      {} {}\n", under->localizedDescription(),
-                           under->domain(), under->code());
+        out +=
+            fmt::format("    caused by: {}\n      {} {}\n",
+                        plainLine(under->localizedDescription()), under->domain(), under->code());
     }
     return out;
 }
@@ -208,7 +210,7 @@ std::string textLine(const RunRecord& run, const TextStyle& style) {
     const Writer writer(style);
     std::string why;
     if (!run.failures.empty()) {
-        why = failureText(run.failures.front());
+        why = plainLine(failureText(run.failures.front()));
     } else {
         for (const ResultRecord& result : run.results) {
             if (result.judgement == Judgement::Outside) {

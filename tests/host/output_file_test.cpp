@@ -45,6 +45,24 @@ TEST_F(OutputFile, ReplacesWholeAndLeavesNothingElse) {
     EXPECT_EQ(entries(), 1U);
 }
 
+TEST_F(OutputFile, KeepsModesLinksAndWhatIsNoFile) {
+    const fs::path file = _folder / "private";
+    std::ofstream(file) << "old";
+    fs::permissions(file, fs::perms::owner_read | fs::perms::owner_write);
+    fs::create_symlink(file, _folder / "link");
+    EXPECT_EQ(host::writeFile(_folder / "link", "new"), std::nullopt);
+    EXPECT_TRUE(fs::is_symlink(_folder / "link"));
+    EXPECT_EQ(read(file), "new");
+    EXPECT_EQ(fs::status(file).permissions(), fs::perms::owner_read | fs::perms::owner_write);
+
+    fs::create_symlink("/dev/null", _folder / "nothing");
+    EXPECT_EQ(host::cannotWrite(_folder / "nothing"), std::nullopt);
+    EXPECT_EQ(host::writeFile(_folder / "nothing", "gone"), std::nullopt);
+    EXPECT_TRUE(fs::is_character_file("/dev/null"));
+    fs::create_symlink("/dev/full", _folder / "full");
+    EXPECT_NE(host::writeFile(_folder / "full", "too much"), std::nullopt);
+}
+
 TEST_F(OutputFile, SaysWhatCannotBeWrittenAndTouchesNothing) {
     const fs::path absent = _folder / "no" / "such" / "report";
     for (const auto& problem : {host::cannotWrite(absent), host::writeFile(absent, "x")}) {

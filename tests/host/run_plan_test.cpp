@@ -108,7 +108,7 @@ TEST(Setting, NamesWhatIsWrong) {
 TEST(RunPlan, GivesEachPartWhatItDeclares) {
     std::vector<host::RunPlan> plans;
     ASSERT_EQ(plan({"PlanDiagnostic", "PlanExperiment"},
-                   {"count=3", "analysis:count=2", "seconds=1", "seconds=1.5"}, &plans),
+                   {"analysis:count=2", "count=3", "seconds=1", "seconds=1.5"}, &plans),
               "planned");
     ASSERT_EQ(plans.size(), 2U);
     EXPECT_EQ(plans[0].summary, "Both.");
@@ -146,7 +146,7 @@ TEST(RunPlan, RefusesBeforeAnythingRuns) {
          "no part of what is to be run declares a parameter \"coumt\"; did you mean count?"},
         {{"PlanExperiment"},
          {"count=1", "analysis:count=1"},
-         "no part of what is to be run declares a parameter \"count\"; did you mean count?"},
+         "no analysis that is to be run declares a parameter \"count\""},
         {{"HalfDiagnostic"}, {"count=1"}, "HalfDiagnostic: its analysis Nowhere is not registered"},
     };
     for (const Row& row : rows) {

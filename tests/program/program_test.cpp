@@ -112,7 +112,7 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "zrlab: --report a.pdf: its ending is none of .html, .json, .jsonl, .txt, .xml\n"},
         {{"run", "VantorMeterixDiagnostic", "--speed", "-1"},
          64,
-         "zrlab: --speed -1: neither \"max\" nor a factor above 0\n"},
+         "zrlab: --speed -1: neither \"max\" nor a factor from 0.001 to 100\n"},
         {{"run", "VantorMeterixDiagnostic", "--output", "/no/such/folder/report"},
          2,
          "zrlab: cannot write /no/such/folder/report: No such file or directory\n"},

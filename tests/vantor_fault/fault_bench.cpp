@@ -69,6 +69,7 @@ std::shared_ptr<ZRVantorFaultExperiment> FaultTest::make(double frameCount,
     auto experiment = std::make_shared<Experiment>(port);
     EXPECT_TRUE(experiment->setupWithParameters({{"frameCount", frameCount}, {"timeout", timeout}},
                                                 nullptr, nullptr));
+    _made.push_back({experiment, timeout >= kLate ? 1 : 0});
     return experiment;
 }
 

@@ -173,12 +173,9 @@ TEST_F(FaultStreaming, LogsEachStepOfAFrameThatFailed) {
 TEST_F(FaultStreaming, EndsWithAResultAtTheTimeOut) {
     camera().stallAfterFrame = 10;
     for (const double timeout : {0.0, std::nan(""), 0.05}) {
-        const auto before = log->count(LogLevel::Debug, "Received frame ");
         const auto result = run(100, timeout);
         ASSERT_NE(result, nullptr);
         EXPECT_LE(value(result, "FrameCount"), 10);
-        EXPECT_LE(value(result, "FrameCount"),
-                  log->count(LogLevel::Debug, "Received frame ") - before);
     }
     EXPECT_EQ(error, nullptr);
     EXPECT_GE(log->count(LogLevel::Error, kTimeoutLine), 3U);

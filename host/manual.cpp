@@ -55,7 +55,7 @@ std::string footerOf(const CLI::App& app) {
 }  // namespace
 
 std::string manualPage(const CLI::App& app, const std::string& version) {
-    std::string page = ".TH ZRLAB 1 \"\" \"zrlab " + version + "\" \"User Commands\"\n";
+    std::string page = R"(.TH ZRLAB 1 "" "zrlab )" + version + R"(" "User Commands")" + "\n";
     page += ".SH NAME\nzrlab \\- run, judge and report hardware diagnostics\n";
     page += ".SH SYNOPSIS\n.B zrlab\n.I COMMAND\n.RI [ OPTION \" ...] [\" ARGUMENT \" ...]\"\n";
     page += ".SH DESCRIPTION\n" + escaped(app.get_description()) + "\n";

@@ -52,19 +52,19 @@ void RepeatStatistics::add(const RunRecord& run) {
         one.unit = result.unit;
         one.limit = result.limit;
         one.outside = result.judgement == Judgement::Outside ? 1 : 0;
-        _count(std::move(one), result.value);
+        _count(one, result.value);
     }
     if (!run.isDiagnostic) {
         for (const MeasurementRecord& measurement : run.measurements) {
             ResultStatistics one;
             one.name = measurement.name;
             one.unit = measurement.unit;
-            _count(std::move(one), measurement.value);
+            _count(one, measurement.value);
         }
     }
 }
 
-void RepeatStatistics::_count(ResultStatistics result, double value) {
+void RepeatStatistics::_count(const ResultStatistics& result, double value) {
     const auto [known, isNew] = _tallyOf.try_emplace(result.name, _tallies.size());
     if (isNew) {
         _tallies.push_back({result, {}});

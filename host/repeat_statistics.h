@@ -29,7 +29,7 @@ class RepeatStatistics {
         ResultStatistics statistics;
         std::map<double, std::uint64_t> values;
     };
-    void _count(ResultStatistics result, double value);
+    void _count(const ResultStatistics& result, double value);
 
     RepeatRecord _record;
     std::vector<Tally> _tallies;

@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <system_error>
 
+#include <fmt/format.h>
+
 #include "platform/nearest.h"
 
 namespace host {
@@ -52,6 +54,24 @@ std::optional<RunPlan> planOf(const ZRLab& lab, const std::string& name) {
     }
     plan.experiment.name = name;
     return plan;
+}
+
+// What the settings give to a part's parameter: the last one for that part, else the last one for
+// every part. Those that were looked at are marked as used.
+std::optional<platform::Number> valueFor(const std::string& parameter,
+                                         Part kind,
+                                         const std::vector<ParameterSetting>& settings,
+                                         std::vector<bool>& used) {
+    std::optional<platform::Number> value;
+    for (const std::optional<Part> part : {std::optional<Part>(), std::optional(kind)}) {
+        for (std::size_t i = 0; i < settings.size(); ++i) {
+            if (settings[i].name == parameter && settings[i].part == part) {
+                value = settings[i].value;
+                used[i] = true;
+            }
+        }
+    }
+    return value;
 }
 
 }  // namespace
@@ -140,23 +160,14 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
             partPlan->summary = description->summary();
             for (const auto& [parameter, declaration] : description->parameters()) {
                 declared.push_back(parameter);
-                std::optional<platform::Number> value;
-                // What was given to every part, then what was given to this one.
-                for (const std::optional<Part> part :
-                     {std::optional<Part>(), std::optional(kind)}) {
-                    for (std::size_t i = 0; i < settings.size(); ++i) {
-                        if (settings[i].name == parameter && settings[i].part == part) {
-                            value = settings[i].value;
-                            used[i] = true;
-                        }
-                    }
-                }
+                const auto value = valueFor(parameter, kind, settings, used);
                 if (value.has_value()) {
                     partPlan->parameters.emplace_back(parameter, *value);
                 } else if (declaration.required() && missing.empty()) {
-                    missing = name + ": parameter \"" + parameter + "\" of its " +
-                              std::string(partText(kind)) + " has no value; give one with --set " +
-                              parameter + "=NUMBER";
+                    missing = fmt::format(
+                        "{}: parameter \"{}\" of its {} has no value; give one with --set "
+                        "{}=NUMBER",
+                        name, parameter, partText(kind), parameter);
                 }
             }
         }

@@ -1,6 +1,7 @@
 #include "host/text_report.h"
 
 #include <algorithm>
+#include <cmath>
 #include <cstddef>
 #include <iterator>
 #include <limits>
@@ -116,7 +117,7 @@ std::string sparkline(const platform::List& samples, double least, double greate
             value = std::max(value, samples[at + 1].asNumber().asDouble());
         }
         const double share = greatest > least ? (value - least) / (greatest - least) : 0.0;
-        const auto level = static_cast<std::size_t>(share * (std::size(kBlocks) - 1) + 0.5);
+        const auto level = static_cast<std::size_t>(std::lround(share * (std::size(kBlocks) - 1)));
         out += kBlocks[std::min(level, std::size(kBlocks) - 1)];
     }
     return out;

@@ -173,8 +173,8 @@ void readStreamFaults(const JsonNode& node, StreamProfile& stream) {
 
 // A port type that the service has itself may be given by its short name, the stream's.
 std::string portTypeOf(const JsonNode& node) {
-    const std::string text = node.asText();
-    const std::string own = std::string(kPortTypePrefix) + text;
+    std::string text = node.asText();
+    std::string own = std::string(kPortTypePrefix) + text;
     for (const StreamProfile& stream : healthyCapture().streams) {
         if (stream.portType == own) {
             return own;

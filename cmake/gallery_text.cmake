@@ -7,7 +7,7 @@ foreach(file IN LISTS PROFILES)
   string(APPEND rows "        {\"${name}\", R\"json(${text})json\"},\n")
 endforeach()
 file(WRITE "${OUTPUT}" "// Made from profiles/.
-#include \"simulator/gallery_text.h\"
+#include \"devices/simulator/profile/gallery_text.h\"
 
 namespace simulator {
 

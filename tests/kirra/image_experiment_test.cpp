@@ -58,7 +58,7 @@ TEST_F(ImageExperiment, IsSetUpOnAPoweredDisplayAndARunLoop) {
         return ZRKirraImageExperiment().setupWithParameters({}, nullptr, slot);
     };
     for (const auto& [damage, problem] : kCases) {
-        display = simulator::healthyDisplay();
+        display = simulator::DisplayProfile{};
         damage(display);
         install();
         ErrorRef here;

@@ -96,7 +96,7 @@ platform::ErrorRef sensorError(std::string_view text) {
     return std::make_shared<const platform::Error>("sensor", 7, std::string(text));
 }
 
-class KirraTest::Witness final : public simulator::Observer {
+class KirraTest::Witness final : public observed::Observer {
   public:
     void misused(std::string_view what) override { ADD_FAILURE() << what; }
 };

@@ -12,11 +12,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "devices/simulator/display_service.h"
+#include "devices/simulator/hid_sensor.h"
 #include "kirra/image_experiment.h"
 #include "kirra/image_stream.h"
 #include "platform/run_loop.h"
-#include "simulator/display_service.h"
-#include "simulator/hid_sensor.h"
 #include "tests/support/is_error.h"
 
 namespace test {
@@ -57,7 +57,7 @@ class KirraTest : public ::testing::Test {
     const WLHIDInputReportCallback& callback() const { return _tap->callback; }
 
     simulator::HidProfile hid = simulator::healthyHid();
-    simulator::DisplayProfile display = simulator::healthyDisplay();
+    simulator::DisplayProfile display = simulator::DisplayProfile{};
     std::shared_ptr<platform::RunLoop> runLoop = platform::RunLoop::forThisThread();
     Journal& journal() { return _tap->journal; }
     platform::ErrorRef error;

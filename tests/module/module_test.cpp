@@ -5,8 +5,8 @@
 #include <gmock/gmock.h>
 
 #include "frame/host_interface.h"
-#include "host/module_loader.h"
-#include "host/run_plan.h"
+#include "host/run/module_loader.h"
+#include "host/run/run_plan.h"
 
 namespace {
 

@@ -6,17 +6,17 @@
 #include <string>
 #include <vector>
 
+#include "devices/observed/observer.h"
 #include "platform/deadline.h"
 #include "platform/mutex.h"
-#include "simulator/observer.h"
 
 namespace test {
 
 inline constexpr std::chrono::seconds kGenerous{60};
 
-class CaptureWitness final : public simulator::Observer {
+class CaptureWitness final : public observed::Observer {
   public:
-    void frameDelivered(const simulator::DeliveredFrame& frame) override {
+    void frameDelivered(const observed::DeliveredFrame& frame) override {
         const platform::MutexLock lock(_mutex);
         _frames.push_back(frame);
         _changed.notifyAll();
@@ -28,7 +28,7 @@ class CaptureWitness final : public simulator::Observer {
     }
 
     // What there was so far, once there is `count` of it; fewer when that does not come.
-    std::vector<simulator::DeliveredFrame> waitFor(std::size_t count) {
+    std::vector<observed::DeliveredFrame> waitFor(std::size_t count) {
         return _wait(_frames, count);
     }
     std::vector<std::string> waitForMisuses(std::size_t count) { return _wait(_misuses, count); }
@@ -47,7 +47,7 @@ class CaptureWitness final : public simulator::Observer {
     platform::Mutex _mutex;
     platform::Condition _changed;
     // Guarded by the mutex.
-    std::vector<simulator::DeliveredFrame> _frames;
+    std::vector<observed::DeliveredFrame> _frames;
     std::vector<std::string> _misuses;
 };
 

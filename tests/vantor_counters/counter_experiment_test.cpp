@@ -9,8 +9,8 @@
 
 #include <gmock/gmock.h>
 
+#include "devices/simulator/meterix_facility.h"
 #include "platform/services.h"
-#include "simulator/meterix_facility.h"
 #include "tests/support/is_error.h"
 #include "vantor_counters/counter_report.h"
 

@@ -2,7 +2,7 @@
 
 #include <thread>
 
-#include "simulator/frame_metadata.h"
+#include "devices/simulator/frame_metadata.h"
 
 namespace test {
 

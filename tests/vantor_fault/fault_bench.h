@@ -12,10 +12,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "devices/simulator/capture_service.h"
+#include "devices/simulator/meterix_facility.h"
 #include "platform/log.h"
 #include "platform/services.h"
-#include "simulator/capture_service.h"
-#include "simulator/meterix_facility.h"
 #include "tests/support/capture_witness.h"
 #include "tests/support/is_error.h"
 #include "vantor_fault/fault_experiment.h"

@@ -1,0 +1,41 @@
+// Fault: whether a call on the simulated device fails, and with which error object, if any.
+#ifndef ZR_DEVICES_SIMULATOR_PROFILE_FAULT_H
+#define ZR_DEVICES_SIMULATOR_PROFILE_FAULT_H
+
+#include <utility>
+
+#include "platform/error.h"
+
+namespace simulator {
+
+class Fault {
+  public:
+    // A call that succeeds.
+    Fault() = default;
+
+    // A call that fails and reports `error`; null fails without an error object.
+    static Fault failing(platform::ErrorRef error) {
+        Fault fault;
+        fault._fails = true;
+        fault._error = std::move(error);
+        return fault;
+    }
+
+    bool fails() const { return _fails; }
+
+    // Whether the call fails; stores the error object then, if there is one and a slot for it.
+    bool strikes(platform::ErrorSlot slot) const {
+        if (_fails) {
+            platform::failWith(slot, _error);
+        }
+        return _fails;
+    }
+
+  private:
+    bool _fails = false;
+    platform::ErrorRef _error;
+};
+
+}  // namespace simulator
+
+#endif

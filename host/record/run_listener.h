@@ -1,0 +1,29 @@
+// RunListener: is told what a session does, as it happens. A report that streams is one.
+#ifndef ZR_HOST_RECORD_RUN_LISTENER_H
+#define ZR_HOST_RECORD_RUN_LISTENER_H
+
+#include "host/record/run_record.h"
+
+namespace host {
+
+// Called on the session's thread, but for logged(), which any thread may call, several at once.
+// A record is complete up to the moment of the call.
+class RunListener {
+  public:
+    virtual ~RunListener() = default;
+
+    virtual void sessionStarted(const SessionRecord& /*session*/) {}
+    virtual void runStarted(const RunRecord& /*run*/) {}
+    // A part begins: its name, summary and parameters are known.
+    virtual void partStarted(const RunRecord& /*run*/, Part /*part*/) {}
+    virtual void logged(const LogRecord& /*line*/) {}
+    // A part has ended: its measurements or results, and its failures, are in the record.
+    virtual void partEnded(const RunRecord& /*run*/, Part /*part*/) {}
+    // The verdict is known.
+    virtual void runEnded(const RunRecord& /*run*/) {}
+    virtual void sessionEnded(const SessionRecord& /*session*/) {}
+};
+
+}  // namespace host
+
+#endif

@@ -1,0 +1,45 @@
+// The sentences that reports have in common, so that every form says the same in the same words.
+#ifndef ZR_HOST_RECORD_RUN_TEXT_H
+#define ZR_HOST_RECORD_RUN_TEXT_H
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "host/record/run_record.h"
+
+namespace host {
+
+// "1 frame", "2 frames".
+std::string plural(std::uint64_t count, std::string_view one, std::string_view many);
+
+// "3 events"; the number alone when there is no unit.
+std::string valueText(double value, std::string_view unit);
+
+// "Max Reports: 0 … 0 events", "no limit".
+std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view unit);
+
+// What came of the run in a few words: "2 of 64 limits not met".
+std::string headline(const RunRecord& run);
+
+// The part's record; the experiment's when the analysis was never reached.
+const PartRecord& partOf(const RunRecord& run, Part part);
+
+// Where it failed: "experiment VantorFaultExperiment, run".
+std::string placeText(const FailureRecord& failure, const RunRecord& run);
+
+// What an error is known by: its domain and code joined by `separator`; a failure without an error
+// object by its part and step.
+std::string symptomText(const FailureRecord& failure, std::string_view separator);
+
+// The failure and what caused it, outermost first, joined by `separator`; each with its domain and
+// code: "Failed to start streaming. (Domain 204)" "caused by: Busy (Service -3)".
+std::string causeText(const FailureRecord& failure, std::string_view separator);
+
+// "debug", "default", "error".
+std::string_view levelText(platform::LogLevel level);
+
+}  // namespace host
+
+#endif

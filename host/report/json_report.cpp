@@ -1,0 +1,173 @@
+#include "host/report/json_report.h"
+
+#include <cstddef>
+
+#include "host/record/run_text.h"
+#include "host/report/json_value.h"
+
+namespace host {
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+using host::jsonOf;
+using platform::Number;
+
+std::string_view kindText(Number::Kind kind) {
+    static constexpr std::string_view kTexts[] = {"absent", "boolean", "int8",  "int16",
+                                                  "int32",  "int64",   "uint8", "uint16",
+                                                  "uint32", "uint64",  "float", "double"};
+    return kTexts[static_cast<std::size_t>(kind)];
+}
+
+Json kindsOf(const platform::Value& value) {
+    if (const Number* number = value.number()) {
+        return kindText(number->kind());
+    }
+    if (value.string() != nullptr) {
+        return "string";
+    }
+    if (const platform::List* list = value.list()) {
+        Json kinds = Json::array();
+        bool alike = true;
+        for (const platform::Value& element : *list) {
+            kinds.push_back(kindsOf(element));
+            alike = alike && kinds.back() == kinds.front();
+        }
+        return alike && !kinds.empty() ? Json::array({kinds.front()}) : kinds;
+    }
+    if (const platform::Dictionary* dictionary = value.dictionary()) {
+        Json kinds = Json::object();
+        for (const auto& [key, entry] : dictionary->entries()) {
+            kinds[key] = kindsOf(entry);
+        }
+        return kinds;
+    }
+    return nullptr;
+}
+
+Json jsonOf(const platform::ErrorRef& error) {
+    if (error == nullptr) {
+        return nullptr;
+    }
+    Json object{{"domain", error->domain()},
+                {"code", error->code()},
+                {"description", error->localizedDescription()}};
+    if (error->underlyingError() != nullptr) {
+        object["underlying"] = jsonOf(error->underlyingError());
+    }
+    return object;
+}
+
+Json jsonOf(const std::optional<BoundRecord>& bound) {
+    return bound.has_value() ? Json{{"value", jsonOf(bound->value)}, {"open", bound->open}}
+                             : Json();
+}
+
+Json jsonOf(const std::optional<LimitRecord>& limit) {
+    return limit.has_value() ? Json{{"name", limit->name},
+                                    {"lower", jsonOf(limit->lower)},
+                                    {"upper", jsonOf(limit->upper)}}
+                             : Json();
+}
+
+std::string_view judgementText(Judgement judgement) {
+    static constexpr std::string_view kTexts[] = {"information", "within", "outside"};
+    return kTexts[static_cast<std::size_t>(judgement)];
+}
+
+Json jsonOf(const PartRecord& part) {
+    Json parameters = Json::object();
+    for (const auto& [name, value] : part.parameters) {
+        parameters[name] = jsonOf(value);
+    }
+    return {{"name", part.name},
+            {"summary", part.summary},
+            {"parameters", std::move(parameters)},
+            {"seconds", part.seconds}};
+}
+
+template <class Records, class Convert>
+Json arrayOf(const Records& records, Convert&& convert) {
+    Json array = Json::array();
+    for (const auto& record : records) {
+        array.push_back(convert(record));
+    }
+    return array;
+}
+
+Json jsonOf(const RunRecord& run) {
+    Json object{{"name", run.name},
+                {"summary", run.summary},
+                {"verdict", verdictText(run.verdict)},
+                {"run", run.number},
+                {"started", run.started.timestamp()},
+                {"seconds", run.seconds},
+                {"experiment", jsonOf(run.experiment)},
+                {"analysis", run.analysis.has_value() ? jsonOf(*run.analysis) : Json()}};
+    object["failures"] = arrayOf(run.failures, [](const FailureRecord& failure) {
+        return Json{{"part", partText(failure.part)},
+                    {"step", failure.step},
+                    {"message", failureText(failure)},
+                    {"error", jsonOf(failure.error)}};
+    });
+    object["results"] = arrayOf(run.results, [](const ResultRecord& result) {
+        return Json{{"name", result.name},
+                    {"value", jsonOf(result.value)},
+                    {"unit", result.unit},
+                    {"judgement", judgementText(result.judgement)},
+                    {"limit", jsonOf(result.limit)}};
+    });
+    object["measurements"] = arrayOf(run.measurements, [](const MeasurementRecord& measurement) {
+        return Json{{"name", measurement.name},
+                    {"value", jsonOf(measurement.value)},
+                    {"unit", measurement.unit}};
+    });
+    const platform::Value auxiliary(run.auxiliaryData);
+    object["auxiliaryData"] = jsonOf(auxiliary);
+    object["auxiliaryDataKinds"] = kindsOf(auxiliary);
+    object["log"] = arrayOf(run.log, [](const LogRecord& line) {
+        return Json{{"time", line.time.timestamp()},
+                    {"level", levelText(line.level)},
+                    {"message", line.message}};
+    });
+    return object;
+}
+
+Json jsonOf(const RepeatRecord& repeat) {
+    Json object{{"name", repeat.name},
+                {"runs", repeat.runs},
+                {"passed", repeat.passed},
+                {"failed", repeat.failed},
+                {"errors", repeat.errors}};
+    object["results"] = arrayOf(repeat.results, [](const ResultStatistics& result) {
+        return Json{{"name", result.name},
+                    {"unit", result.unit},
+                    {"runs", result.runs},
+                    {"outside", result.outside},
+                    {"minimum", jsonOf(result.minimum)},
+                    {"median", jsonOf(result.median)},
+                    {"maximum", jsonOf(result.maximum)},
+                    {"limit", jsonOf(result.limit)}};
+    });
+    return object;
+}
+
+}  // namespace
+
+std::string jsonReport(const SessionRecord& session) {
+    Json document{{"program", "zrlab"},
+                  {"version", session.version},
+                  {"commandLine", session.commandLine},
+                  {"device", {{"name", session.deviceName}, {"summary", session.deviceSummary}}},
+                  {"started", session.started.timestamp()},
+                  {"seconds", session.seconds},
+                  {"verdict", verdictText(session.verdict)}};
+    document["runs"] = arrayOf(session.runs, [](const RunRecord& run) { return jsonOf(run); });
+    document["repeats"] =
+        arrayOf(session.repeats, [](const RepeatRecord& repeat) { return jsonOf(repeat); });
+    // Text that is no UTF-8 (it may come from a device) must not stop the report.
+    return document.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+}
+
+}  // namespace host

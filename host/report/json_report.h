@@ -1,0 +1,20 @@
+// The report for programs that want everything at once: a session as one JSON document.
+#ifndef ZR_HOST_REPORT_JSON_REPORT_H
+#define ZR_HOST_REPORT_JSON_REPORT_H
+
+#include <string>
+
+#include "host/record/run_record.h"
+
+namespace host {
+
+// Integers stay integers, floating point has a decimal point or an exponent and the shortest digits
+// that read back to the same value, booleans are true and false; NaN and the infinities, which JSON
+// cannot carry, are the strings "nan", "inf" and "-inf". What a number was boxed as stands beside the
+// auxiliary data under "auxiliaryDataKinds", in the same shape; of a list whose elements are alike it
+// shows one.
+std::string jsonReport(const SessionRecord& session);
+
+}  // namespace host
+
+#endif

@@ -1,0 +1,74 @@
+// The report for factory systems: Open Compute Project test-and-validation output, version 2.0, one
+// artifact a line, written as it happens.
+//
+// The session is the test run; each part of each of its runs is a test step of its own. What the
+// artifacts hold:
+//   testRunStart   the planned runs with their parameters, the device as the unit under test
+//   measurement    in an experiment's step what it measured; in an analysis's step each judged result
+//                  with its limit as validators, which carry the limit's name
+//   extension      one for each element of a list in the experiment's auxiliary data ("images")
+//   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
+//                  causes as message
+//   diagnosis      one a diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error"
+//   log            in the step that is open, between steps in the run
+// Numbers are written as host/json_value.h says.
+#ifndef ZR_HOST_REPORT_JSONL_REPORT_H
+#define ZR_HOST_REPORT_JSONL_REPORT_H
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <string>
+#include <string_view>
+#include <utility>
+
+#include <nlohmann/json_fwd.hpp>
+
+#include "host/record/run_listener.h"
+#include "platform/mutex.h"
+
+namespace host {
+
+class JsonlReport final : public RunListener {
+  public:
+    // `sink` takes one whole line, its line end included. It is called on the thread that makes the
+    // line, one call at a time, with this report's lock held: it must not log.
+    explicit JsonlReport(std::function<void(std::string_view line)> sink)
+        : _sink(std::move(sink)) {}
+
+    void sessionStarted(const SessionRecord& session) override;
+    void runStarted(const RunRecord& run) override;
+    void partStarted(const RunRecord& run, Part part) override;
+    // A line that comes after the session's end is dropped: nothing may follow the run's end.
+    void logged(const LogRecord& line) override;
+    void partEnded(const RunRecord& run, Part part) override;
+    void runEnded(const RunRecord& run) override;
+    void sessionEnded(const SessionRecord& session) override;
+
+  private:
+    using Json = nlohmann::ordered_json;
+
+    void _write(std::string_view kind, Json artifact) ZR_REQUIRES(_mutex);
+    void _writeRun(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
+    void _writeStep(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
+    // In the step that is open, else in the run.
+    void _writeHere(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
+    void _writeFailures(const RunRecord& run) ZR_REQUIRES(_mutex);
+    void _closeStep() ZR_REQUIRES(_mutex);
+
+    const std::function<void(std::string_view line)> _sink;
+
+    platform::Mutex _mutex;
+    std::uint64_t _sequenceNumber ZR_GUARDED_BY(_mutex) = 0;
+    std::uint64_t _steps ZR_GUARDED_BY(_mutex) = 0;
+    // The step that is open; empty when none is. It stays open until the next one begins or the
+    // verdict is known: a diagnosis can only be written in a step.
+    std::string _step ZR_GUARDED_BY(_mutex);
+    bool _stepFailed ZR_GUARDED_BY(_mutex) = false;
+    std::size_t _failuresWritten ZR_GUARDED_BY(_mutex) = 0;
+    bool _ended ZR_GUARDED_BY(_mutex) = false;
+};
+
+}  // namespace host
+
+#endif

@@ -1,0 +1,262 @@
+#include "host/report/text_report.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <iterator>
+#include <limits>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "host/record/clean_text.h"
+#include "host/record/run_text.h"
+
+namespace host {
+
+namespace {
+
+// Rows shown of a long table unless the report is verbose: as many from its start and its end.
+constexpr std::size_t kRowsAtEachEnd = 15;
+
+class Writer {
+  public:
+    explicit Writer(const TextStyle& style) : _style(style) {}
+
+    std::string verdict(Verdict verdict) const {
+        switch (verdict) {
+            case Verdict::Passed:
+                return _painted("1;32", verdictText(verdict));
+            case Verdict::Failed:
+                return _painted("1;31", verdictText(verdict));
+            case Verdict::Error:
+                break;
+        }
+        return _painted("1;35", verdictText(verdict));
+    }
+    std::string bad(std::string_view text) const { return _painted("31", text); }
+    std::string strong(std::string_view text) const { return _painted("1", text); }
+    std::string faint(std::string_view text) const { return _painted("2", text); }
+    // A line of its own; the colour ends before the line does.
+    std::string faintLine(std::string_view text) const { return faint(text) + "\n"; }
+
+    bool verbose() const { return _style.verbose; }
+
+  private:
+    std::string _painted(std::string_view code, std::string_view text) const {
+        return _style.colour ? fmt::format("\x1b[{}m{}\x1b[0m", code, text) : std::string(text);
+    }
+    TextStyle _style;
+};
+
+std::string parametersText(const PartRecord& part) {
+    std::string text;
+    for (const auto& [name, value] : part.parameters) {
+        text += fmt::format("{}{} {}", text.empty() ? "" : ", ", name, value.text());
+    }
+    return text;
+}
+
+// The widest name of the rows that are shown, to line the values up.
+template <class Rows>
+std::size_t nameWidth(const Rows& rows) {
+    std::size_t width = 0;
+    for (const auto& row : rows) {
+        width = std::max(width, row.name.size());
+    }
+    return width;
+}
+
+std::string resultRows(const std::vector<ResultRecord>& results, const Writer& writer) {
+    const std::size_t width = nameWidth(results);
+    std::string out;
+    for (const ResultRecord& result : results) {
+        const bool outside = result.judgement == Judgement::Outside;
+        const std::string value = fmt::format("{:>14}", valueText(result.value, result.unit));
+        out += fmt::format("  {} {:<{}}  {}  {}\n", outside ? writer.bad("✗") : " ", result.name,
+                           width, outside ? writer.bad(value) : value,
+                           writer.faint(limitLine(result.limit, result.unit)));
+    }
+    return out;
+}
+
+std::string measurementRows(const std::vector<MeasurementRecord>& measurements) {
+    const std::size_t width = nameWidth(measurements);
+    std::string out;
+    for (const MeasurementRecord& measurement : measurements) {
+        out += fmt::format("    {:<{}}  {:>14}\n", measurement.name, width,
+                           valueText(measurement.value, measurement.unit));
+    }
+    return out;
+}
+
+std::string errorText(const FailureRecord& failure, const RunRecord& run, const Writer& writer) {
+    std::string out = fmt::format("  {} {}: {}\n", writer.bad("✗"), placeText(failure, run),
+                                  writer.strong(plainLine(failureText(failure))));
+    if (failure.error == nullptr) {
+        return out;
+    }
+    out += fmt::format("    {} {}\n", failure.error->domain(), failure.error->code());
+    for (platform::ErrorRef under = failure.error->underlyingError(); under != nullptr;
+         under = under->underlyingError()) {
+        out +=
+            fmt::format("    caused by: {}\n      {} {}\n",
+                        plainLine(under->localizedDescription()), under->domain(), under->code());
+    }
+    return out;
+}
+
+// A small picture of samples: one block a pair of samples, its height the larger of the two between
+// the least and the greatest sample of the whole run.
+std::string sparkline(const platform::List& samples, double least, double greatest) {
+    static constexpr std::string_view kBlocks[] = {"▁", "▂", "▃", "▄", "▅", "▆", "▇", "█"};
+    std::string out;
+    for (std::size_t at = 0; at < samples.size(); at += 2) {
+        double value = samples[at].asNumber().asDouble();
+        if (at + 1 < samples.size()) {
+            value = std::max(value, samples[at + 1].asNumber().asDouble());
+        }
+        const double share = greatest > least ? (value - least) / (greatest - least) : 0.0;
+        const auto level = static_cast<std::size_t>(std::lround(share * (std::size(kBlocks) - 1)));
+        out += kBlocks[std::min(level, std::size(kBlocks) - 1)];
+    }
+    return out;
+}
+
+std::string imageRows(const platform::List& images, const Writer& writer) {
+    double least = std::numeric_limits<double>::max();
+    double greatest = std::numeric_limits<double>::lowest();
+    for (const platform::Value& image : images) {
+        for (const char* scan : {"dScanI", "dScanQ"}) {
+            const platform::List* samples = image[scan].list();
+            for (std::size_t at = 0; samples != nullptr && at < samples->size(); ++at) {
+                least = std::min(least, (*samples)[at].asNumber().asDouble());
+                greatest = std::max(greatest, (*samples)[at].asNumber().asDouble());
+            }
+        }
+    }
+    std::string out = writer.faintLine(
+        fmt::format("  {:>10}  {:>10}  {:>8}  {:<24}  {}", "frame", "time ms", "°C", "I", "Q"));
+    const auto picture = [least, greatest](const platform::Value& samples) {
+        return samples.list() != nullptr ? sparkline(*samples.list(), least, greatest) : "";
+    };
+    for (std::size_t at = 0; at < images.size(); ++at) {
+        if (!writer.verbose() && at == kRowsAtEachEnd && images.size() > 2 * kRowsAtEachEnd) {
+            const std::size_t folded = images.size() - 2 * kRowsAtEachEnd;
+            out += writer.faintLine(fmt::format("  {:>10}  {} folded, --verbose shows them", "…",
+                                                plural(folded, "image", "images")));
+            at += folded;
+        }
+        const platform::Value& image = images[at];
+        out +=
+            fmt::format("  {:>10}  {:>10}  {:>8.2f}  {}  {}\n", image["frameID"].asNumber().text(),
+                        image["timestampInMilliseconds"].asNumber().text(),
+                        image["tmonDataInC"].asNumber().asDouble(), picture(image["dScanI"]),
+                        picture(image["dScanQ"]));
+    }
+    return out;
+}
+
+std::string body(const RunRecord& run, const Writer& writer) {
+    std::string out;
+    for (const FailureRecord& failure : run.failures) {
+        out += errorText(failure, run, writer);
+    }
+    std::vector<ResultRecord> outside;
+    std::vector<ResultRecord> others;
+    for (const ResultRecord& result : run.results) {
+        (result.judgement == Judgement::Outside ? outside : others).push_back(result);
+    }
+    out += resultRows(outside, writer);
+    if (writer.verbose()) {
+        out += resultRows(others, writer);
+    } else if (!others.empty()) {
+        out += writer.faintLine(fmt::format("    {} within the limits, --verbose lists them",
+                                            plural(others.size(), "result", "results")));
+    }
+    if (!run.isDiagnostic || writer.verbose()) {
+        if (run.isDiagnostic && !run.measurements.empty()) {
+            out += writer.faintLine("  as measured by the experiment");
+        }
+        out += measurementRows(run.measurements);
+    }
+    const platform::List* images = run.auxiliaryData["images"].list();
+    if (images != nullptr) {
+        out += fmt::format("  {}\n", plural(images->size(), "image", "images"));
+        out += images->empty() ? "" : imageRows(*images, writer);
+    }
+    return out;
+}
+
+}  // namespace
+
+std::string textReport(const RunRecord& run, const TextStyle& style) {
+    const Writer writer(style);
+    std::string out =
+        fmt::format("{}  {}  {}  {}\n", writer.verdict(run.verdict), writer.strong(run.name),
+                    headline(run), writer.faint(fmt::format("{:.2f} s", run.seconds)));
+    out += writer.faintLine(fmt::format("      {}", run.summary));
+    std::string parameters = parametersText(run.experiment);
+    if (run.analysis.has_value() && !run.analysis->parameters.empty()) {
+        parameters += fmt::format("; analysis: {}", parametersText(*run.analysis));
+    }
+    if (!parameters.empty()) {
+        out += writer.faintLine(fmt::format("      {}", parameters));
+    }
+    const std::string rest = body(run, writer);
+    return rest.empty() ? out : out + "\n" + rest;
+}
+
+std::string textLine(const RunRecord& run, const TextStyle& style) {
+    const Writer writer(style);
+    std::string why;
+    if (!run.failures.empty()) {
+        why = plainLine(failureText(run.failures.front()));
+    } else {
+        for (const ResultRecord& result : run.results) {
+            if (result.judgement == Judgement::Outside) {
+                why = fmt::format("{} is {}, {}", result.name, valueText(result.value, result.unit),
+                                  limitLine(result.limit, result.unit));
+                break;
+            }
+        }
+    }
+    return fmt::format("{:>6}  {}  {}  {:.2f} s  {}", run.number, writer.verdict(run.verdict),
+                       run.name, run.seconds, why);
+}
+
+std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
+    const Writer writer(style);
+    std::string out = fmt::format("{}  {}: {} passed, {} failed, {} in error\n",
+                                  writer.strong(repeat.name), plural(repeat.runs, "run", "runs"),
+                                  repeat.passed, repeat.failed, repeat.errors);
+    std::vector<ResultStatistics> shown;
+    std::copy_if(repeat.results.begin(), repeat.results.end(), std::back_inserter(shown),
+                 [&style](const ResultStatistics& result) {
+                     return style.verbose || result.outside > 0 ||
+                            result.minimum != result.maximum || !result.limit.has_value();
+                 });
+    if (!shown.empty()) {
+        const std::size_t width = nameWidth(shown);
+        out += writer.faintLine(fmt::format("    {:<{}}  {:>10}  {:>10}  {:>10}  {}", "", width,
+                                            "minimum", "median", "maximum", "outside"));
+        for (const ResultStatistics& result : shown) {
+            const std::string outside = fmt::format("{} of {}", result.outside, result.runs);
+            out += fmt::format("  {} {:<{}}  {:>10}  {:>10}  {:>10}  {}  {}\n",
+                               result.outside > 0 ? writer.bad("✗") : " ", result.name, width,
+                               numberText(result.minimum), numberText(result.median),
+                               numberText(result.maximum),
+                               result.outside > 0 ? writer.bad(outside) : outside,
+                               writer.faint(limitLine(result.limit, result.unit)));
+        }
+    }
+    if (shown.size() < repeat.results.size()) {
+        out += writer.faintLine(
+            fmt::format("    {} within {} and the same in every run, --verbose lists them",
+                        plural(repeat.results.size() - shown.size(), "result", "results"),
+                        repeat.results.size() - shown.size() == 1 ? "its limit" : "their limits"));
+    }
+    return out;
+}
+
+}  // namespace host

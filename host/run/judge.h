@@ -1,0 +1,25 @@
+// Judging: measured results against their limits, and a run's verdict from them.
+#ifndef ZR_HOST_RUN_JUDGE_H
+#define ZR_HOST_RUN_JUDGE_H
+
+#include "frame/host_interface.h"
+#include "host/record/run_record.h"
+
+namespace host {
+
+// The result with its limit, judged: Within when the value is inside both bounds that are set (a
+// closed bound's own value is inside, an open one's is not). NaN is inside no limit, also not inside
+// one without bounds, and a bound of NaN admits nothing. Units are not compared.
+ResultRecord judge(const ZRMeasuredResult& result);
+
+// The verdict of a run from its failures and its results.
+Verdict verdictOf(const RunRecord& run);
+
+// The worse of two.
+inline Verdict worse(Verdict a, Verdict b) {
+    return a < b ? b : a;
+}
+
+}  // namespace host
+
+#endif

@@ -1,0 +1,98 @@
+#include "host/run/repeat_statistics.h"
+
+#include <cmath>
+#include <limits>
+#include <utility>
+
+namespace host {
+
+namespace {
+
+// The value at `rank` (from 0) of the sorted sequence that the counts stand for.
+double atRank(const std::map<double, std::uint64_t>& values, std::uint64_t rank) {
+    for (const auto& [value, count] : values) {
+        if (rank < count) {
+            return value;
+        }
+        rank -= count;
+    }
+    return std::numeric_limits<double>::quiet_NaN();
+}
+
+double median(const std::map<double, std::uint64_t>& values) {
+    std::uint64_t total = 0;
+    for (const auto& [value, count] : values) {
+        total += count;
+    }
+    if (total % 2 == 1) {
+        return atRank(values, total / 2);
+    }
+    return (atRank(values, total / 2 - 1) + atRank(values, total / 2)) / 2;
+}
+
+}  // namespace
+
+void RepeatStatistics::add(const RunRecord& run) {
+    ++_record.runs;
+    _record.seconds += run.seconds;
+    switch (run.verdict) {
+        case Verdict::Passed:
+            ++_record.passed;
+            break;
+        case Verdict::Failed:
+            ++_record.failed;
+            break;
+        case Verdict::Error:
+            ++_record.errors;
+            break;
+    }
+    for (const ResultRecord& result : run.results) {
+        ResultStatistics one;
+        one.name = result.name;
+        one.unit = result.unit;
+        one.limit = result.limit;
+        one.outside = result.judgement == Judgement::Outside ? 1 : 0;
+        _count(one, result.value);
+    }
+    if (!run.isDiagnostic) {
+        for (const MeasurementRecord& measurement : run.measurements) {
+            ResultStatistics one;
+            one.name = measurement.name;
+            one.unit = measurement.unit;
+            _count(one, measurement.value);
+        }
+    }
+}
+
+void RepeatStatistics::_count(const ResultStatistics& result, double value) {
+    const auto [known, isNew] = _tallyOf.try_emplace(result.name, _tallies.size());
+    if (isNew) {
+        _tallies.push_back({result, {}});
+        _tallies.back().statistics.outside = 0;
+    }
+    Tally& tally = _tallies[known->second];
+    ++tally.statistics.runs;
+    tally.statistics.outside += result.outside;
+    if (!std::isnan(value)) {
+        ++tally.values[value];
+    }
+}
+
+RepeatRecord RepeatStatistics::record() const {
+    RepeatRecord record = _record;
+    for (const Tally& tally : _tallies) {
+        ResultStatistics result = tally.statistics;
+        if (tally.values.empty()) {
+            result.minimum = result.median = result.maximum =
+                std::numeric_limits<double>::quiet_NaN();
+        } else {
+            result.minimum = tally.values.begin()->first;
+            result.median = median(tally.values);
+            result.maximum = tally.values.rbegin()->first;
+        }
+        record.results.push_back(std::move(result));
+    }
+    return record;
+}
+
+}  // namespace host

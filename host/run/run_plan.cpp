@@ -1,0 +1,209 @@
+#include "host/run/run_plan.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cstdint>
+#include <system_error>
+
+#include <fmt/format.h>
+
+#include "input/nearest.h"
+
+namespace host {
+
+namespace {
+
+template <class T>
+std::optional<platform::Number> readAs(std::string_view text) {
+    T value{};
+    const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (problem != std::errc() || end != text.data() + text.size()) {
+        return std::nullopt;
+    }
+    return platform::Number(value);
+}
+
+std::optional<platform::Number> readNumber(std::string_view text) {
+    if (text == "true" || text == "false") {
+        return platform::Number(text == "true");
+    }
+    if (auto number = readAs<std::int64_t>(text)) {
+        return number;
+    }
+    if (auto number = readAs<std::uint64_t>(text)) {
+        return number;
+    }
+    // Digits alone are an integer; one that fits neither kind is no number rather than a near one.
+    const bool isInteger = text.find_first_not_of("+-0123456789") == std::string_view::npos;
+    return isInteger ? std::nullopt : readAs<double>(text);
+}
+
+std::optional<RunPlan> planOf(const ZRLab& lab, const std::string& name) {
+    RunPlan plan;
+    plan.name = name;
+    if (const auto diagnostic = lab.diagnosticNamed(name)) {
+        plan.isDiagnostic = true;
+        plan.summary = diagnostic->summary;
+        plan.experiment.name = diagnostic->experimentName;
+        plan.analysis = PartPlan{.name = diagnostic->analysisName, .summary = {}, .parameters = {}};
+        return plan;
+    }
+    const auto experiments = lab.experimentNames();
+    if (std::find(experiments.begin(), experiments.end(), name) == experiments.end()) {
+        return std::nullopt;
+    }
+    plan.experiment.name = name;
+    return plan;
+}
+
+// What the settings give to a part's parameter: the last one for that part, else the last one for
+// every part. Those that were looked at are marked as used.
+std::optional<platform::Number> valueFor(const std::string& parameter,
+                                         Part kind,
+                                         const std::vector<ParameterSetting>& settings,
+                                         std::vector<bool>& used) {
+    std::optional<platform::Number> value;
+    for (const std::optional<Part> part : {std::optional<Part>(), std::optional(kind)}) {
+        for (std::size_t i = 0; i < settings.size(); ++i) {
+            if (settings[i].name == parameter && settings[i].part == part) {
+                value = settings[i].value;
+                used[i] = true;
+            }
+        }
+    }
+    return value;
+}
+
+}  // namespace
+
+std::optional<ZRDescription> describePart(const ZRLab& lab, Part part, std::string_view name) {
+    if (part == Part::Experiment) {
+        const auto experiment = lab.makeExperiment(name);
+        return experiment != nullptr ? std::optional(experiment->experimentDescription())
+                                     : std::nullopt;
+    }
+    const auto analysis = lab.makeAnalysis(name);
+    return analysis != nullptr ? std::optional(analysis->analysisDescription()) : std::nullopt;
+}
+
+std::optional<ParameterSetting> readSetting(std::string_view text, std::string& problem) {
+    const std::size_t equals = text.find('=');
+    if (equals == std::string_view::npos || equals == 0) {
+        problem = "--set " + std::string(text) + ": not of the form PARAM=VALUE";
+        return std::nullopt;
+    }
+    ParameterSetting setting;
+    std::string_view name = text.substr(0, equals);
+    for (const Part part : {Part::Experiment, Part::Analysis}) {
+        const std::string prefix = std::string(partText(part)) + ":";
+        if (name.starts_with(prefix)) {
+            setting.part = part;
+            name.remove_prefix(prefix.size());
+        }
+    }
+    setting.name = name;
+    const std::string_view value = text.substr(equals + 1);
+    const auto number = readNumber(value);
+    if (!number.has_value()) {
+        problem = "--set " + std::string(text) + ": \"" + std::string(value) +
+                  "\" is no number that fits a parameter";
+        return std::nullopt;
+    }
+    setting.value = *number;
+    return setting;
+}
+
+platform::Dictionary PartPlan::asDictionary() const {
+    platform::MutableDictionary entries;
+    for (const auto& [parameter, value] : parameters) {
+        entries.set(parameter, value);
+    }
+    return entries;
+}
+
+platform::Number RunPlan::experimentParameter(std::string_view parameter) const {
+    for (const auto& [given, value] : experiment.parameters) {
+        if (given == parameter) {
+            return value;
+        }
+    }
+    return {};
+}
+
+std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
+                                             const std::vector<std::string>& names,
+                                             const std::vector<ParameterSetting>& settings,
+                                             std::string& problem) {
+    std::vector<RunPlan> plans;
+    std::vector<bool> used(settings.size(), false);
+    std::vector<std::string> declared;
+    std::string missing;
+
+    for (const std::string& name : names) {
+        std::optional<RunPlan> plan = planOf(lab, name);
+        if (!plan.has_value()) {
+            problem = "unknown diagnostic or experiment \"" + name + "\"" +
+                      input::didYouMean(name, runnableNames(lab));
+            return std::nullopt;
+        }
+        std::vector<std::pair<Part, PartPlan*>> parts{{Part::Experiment, &plan->experiment}};
+        if (plan->analysis.has_value()) {
+            parts.emplace_back(Part::Analysis, &*plan->analysis);
+        }
+        for (const auto& [kind, partPlan] : parts) {
+            const auto description = describePart(lab, kind, partPlan->name);
+            if (!description.has_value()) {
+                problem = name + ": its " + std::string(partText(kind)) + " " + partPlan->name +
+                          " is not registered";
+                return std::nullopt;
+            }
+            partPlan->summary = description->summary();
+            for (const auto& [parameter, declaration] : description->parameters()) {
+                declared.push_back(parameter);
+                const auto value = valueFor(parameter, kind, settings, used);
+                if (value.has_value()) {
+                    partPlan->parameters.emplace_back(parameter, *value);
+                } else if (declaration.required() && missing.empty()) {
+                    missing = fmt::format(
+                        "{}: parameter \"{}\" of its {} has no value; give one with --set "
+                        "{}=NUMBER",
+                        name, parameter, partText(kind), parameter);
+                }
+            }
+        }
+        if (!plan->isDiagnostic) {
+            plan->summary = plan->experiment.summary;
+        }
+        plans.push_back(std::move(*plan));
+    }
+    // An unknown parameter first: a misspelt one is also what leaves another without a value.
+    for (std::size_t i = 0; i < settings.size(); ++i) {
+        if (!used[i]) {
+            const std::string whose =
+                settings[i].part.has_value()
+                    ? "no " + std::string(partText(*settings[i].part)) + " that is"
+                    : "no part of what is";
+            std::erase(declared, settings[i].name);  // of another part
+            problem = whose + " to be run declares a parameter \"" + settings[i].name + "\"" +
+                      input::didYouMean(settings[i].name, declared);
+            return std::nullopt;
+        }
+    }
+    if (!missing.empty()) {
+        problem = missing;
+        return std::nullopt;
+    }
+    return plans;
+}
+
+std::vector<std::string> runnableNames(const ZRLab& lab) {
+    std::vector<std::string> names;
+    for (const auto& diagnostic : lab.diagnostics()) {
+        names.push_back(diagnostic.name);
+    }
+    const auto experiments = lab.experimentNames();
+    names.insert(names.end(), experiments.begin(), experiments.end());
+    return names;
+}
+
+}  // namespace host

@@ -1,0 +1,101 @@
+#include "host/run/run_recorder.h"
+
+#include <algorithm>
+#include <array>
+#include <cstddef>
+#include <utility>
+
+#include "platform/welkin/capture.h"
+
+namespace host {
+
+namespace {
+
+// A run with a line a frame must not grow without bound; what is more is counted.
+constexpr std::size_t kMostLines = 5000;
+
+constexpr std::array<std::string_view, kTemperatureNames.size()> kTemperatureKeys = {
+    "NTCTemperatureIdle",
+    "NTCTemperatureStandby",
+    "NTCTemperatureActive",
+    "DIETemperatureIdle",
+    "DIETemperatureStandby",
+    "DIETemperatureActive",
+    kRylCaptureStreamMetadata_FloodActiveTemperature};
+
+std::optional<double> numberOf(const platform::Dictionary& metadata, std::string_view key) {
+    const platform::Number* number = metadata[key].number();
+    return number != nullptr ? std::optional(number->asDouble()) : std::nullopt;
+}
+
+}  // namespace
+
+RunRecorder::RunRecorder(std::function<void(const LogRecord&)> lineLogged, bool keepFrames)
+    : _lineLogged(std::move(lineLogged)), _keepFrames(keepFrames) {}
+
+void RunRecorder::begin() {
+    _frameCount = 0;
+    _imageCount = 0;
+    const platform::MutexLock lock(_mutex);
+    _began = std::chrono::steady_clock::now();
+}
+
+void RunRecorder::end(RunRecord& run) {
+    const platform::MutexLock lock(_mutex);
+    run.log = std::exchange(_log, {});
+    if (_linesLeftOut > 0) {
+        run.log.push_back({platform::Date::now(), platform::LogLevel::Default,
+                           std::to_string(_linesLeftOut) + " further lines left out."});
+        _linesLeftOut = 0;
+    }
+    run.frames = std::exchange(_frames, {});
+    for (std::string& what : _misuses) {
+        run.failures.push_back({.part = Part::Experiment,
+                                .step = kStepDevice,
+                                .error = nullptr,
+                                .message = std::move(what)});
+    }
+    _misuses.clear();
+}
+
+void RunRecorder::write(const platform::LogLine& line) {
+    const LogRecord record{platform::Date::now(), line.level, std::string(line.message)};
+    {
+        const platform::MutexLock lock(_mutex);
+        if (_log.size() < kMostLines) {
+            _log.push_back(record);
+        } else {
+            ++_linesLeftOut;
+        }
+    }
+    _lineLogged(record);
+}
+
+void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
+    ++_frameCount;
+    if (!_keepFrames) {
+        return;
+    }
+    FrameRecord record{
+        .number = frame.number,
+        .presentation = frame.time.seconds(),
+        .delivered = 0,
+        .lightSource = numberOf(frame.metadata, kRylCaptureStreamMetadata_InfraredLightSource),
+        .temperatures = {}};
+    std::transform(kTemperatureKeys.begin(), kTemperatureKeys.end(), record.temperatures.begin(),
+                   [&frame](std::string_view key) { return numberOf(frame.metadata, key); });
+    const platform::MutexLock lock(_mutex);
+    record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
+    _frames.push_back(record);
+}
+
+void RunRecorder::imageDelivered(std::uint64_t /*number*/) {
+    ++_imageCount;
+}
+
+void RunRecorder::misused(std::string_view what) {
+    const platform::MutexLock lock(_mutex);
+    _misuses.emplace_back(what);
+}
+
+}  // namespace host

@@ -1,0 +1,58 @@
+// The program's command line: its commands, their options, and the texts that explain them. Help,
+// the manual page and the shell completions are all made from this one description.
+#ifndef ZR_HOST_ZRLAB_COMMAND_LINE_H
+#define ZR_HOST_ZRLAB_COMMAND_LINE_H
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+
+#include "host/zrlab/session.h"
+
+namespace host {
+
+class CommandLine {
+  public:
+    CommandLine();
+    CommandLine(const CommandLine&) = delete;
+    CommandLine& operator=(const CommandLine&) = delete;
+
+    // Reads the arguments. Returns nothing when a command is to be carried out, else the exit status:
+    // what was asked for (help, the version) or what is wrong has been told.
+    std::optional<int> read(int count, const char* const* arguments);
+
+    // The command that was given.
+    std::string command() const;
+
+    const CLI::App& app() const { return _app; }
+
+    std::vector<std::string> commandNames() const;
+    // The command of that name, or null.
+    const CLI::App* find(const std::string& command) const;
+
+    std::string plugin;                 // the module to load
+    std::vector<std::string> subjects;  // of describe
+    bool namesOnly = false;             // of list and devices
+    std::string helpTopic;              // of help
+    std::string shell;                  // of completion
+    SessionOptions session;             // of run
+
+  private:
+    void _addRun();
+    void _addPlugin(CLI::App& command);
+    std::string _explain(const CLI::ParseError& error, int count, const char* const* arguments);
+
+    CLI::App _app;
+};
+
+// A page for man(1) in its own markup.
+std::string manualPage(const CLI::App& app, const std::string& version);
+
+// A completion script for "bash" or "zsh"; empty for any other shell.
+std::string completionScript(const CLI::App& app, const std::string& shell);
+
+}  // namespace host
+
+#endif

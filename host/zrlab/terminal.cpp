@@ -1,0 +1,141 @@
+#include "host/zrlab/terminal.h"
+
+#include <cerrno>
+#include <chrono>
+#include <csignal>
+#include <cstdlib>
+#include <thread>
+
+#include <pthread.h>
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include "host/record/clean_text.h"
+
+namespace host {
+
+namespace {
+
+constexpr std::string_view kClearLine = "\r\x1b[K";
+
+bool writeWhole(int file, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = ::write(file, text.data(), text.size());
+        if (written < 0 && errno == EINTR) {
+            continue;
+        }
+        if (written < 0) {
+            return false;
+        }
+        text.remove_prefix(static_cast<std::size_t>(written));
+    }
+    return true;
+}
+
+std::string_view environment(const char* name) {
+    const char* value = std::getenv(name);
+    return value != nullptr ? value : "";
+}
+
+}  // namespace
+
+Terminal::Terminal()
+    : _errorIsTerminal(isatty(STDERR_FILENO) == 1 && environment("TERM") != "dumb") {}
+
+// The text's first `columns` characters. Every character that the program shows takes one column.
+std::string_view cutTo(std::string_view text, std::size_t columns) {
+    std::size_t at = 0;
+    for (; at < text.size(); ++at) {
+        const bool begins = (static_cast<unsigned char>(text[at]) & 0xC0) != 0x80;
+        if (begins && columns-- == 0) {
+            break;
+        }
+    }
+    return text.substr(0, at);
+}
+
+std::size_t widthOf(int terminal) {
+    winsize size{};
+    const bool known = ioctl(terminal, TIOCGWINSZ, &size) == 0 && size.ws_col > 0;
+    return known ? size.ws_col : 80;
+}
+
+bool takesColour(int file, Colour asked) {
+    if (asked != Colour::Automatic) {
+        return asked == Colour::Always;
+    }
+    return isatty(file) == 1 && environment("NO_COLOR").empty() && environment("TERM") != "dumb";
+}
+
+Terminal& Terminal::shared() {
+    static Terminal& terminal = *new Terminal;
+    return terminal;
+}
+
+void Terminal::endOnInterrupt() {
+    sigset_t signals;
+    sigemptyset(&signals);
+    sigaddset(&signals, SIGINT);
+    sigaddset(&signals, SIGTERM);
+    pthread_sigmask(SIG_BLOCK, &signals, nullptr);  // inherited by every thread started from now on
+    std::signal(SIGPIPE, SIG_IGN);                  // whoever writes sees it fail
+    std::signal(SIGXFSZ, SIG_IGN);                  // so too beyond a limit of file sizes
+    std::thread([this, signals] {
+        int signal = 0;
+        sigwait(&signals, &signal);
+        // A writer whose reader has stalled must not hold the program up for long.
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(500);
+        bool held = _mutex.tryLock();
+        while (!held && std::chrono::steady_clock::now() < deadline) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+            held = _mutex.tryLock();
+        }
+        if (_errorIsTerminal) {
+            writeWhole(STDERR_FILENO, kClearLine);
+        }
+        _exit(128 + signal);
+    }).detach();
+}
+
+bool Terminal::outputTakesColour(Colour asked) {
+    return takesColour(STDOUT_FILENO, asked);
+}
+
+bool Terminal::errorTakesColour(Colour asked) {
+    return takesColour(STDERR_FILENO, asked);
+}
+
+void Terminal::complain(std::string_view problem) {
+    line("zrlab: " + plainLine(problem));
+}
+
+bool Terminal::output(std::string_view text) {
+    const platform::MutexLock lock(_mutex);
+    if (_statusShown) {
+        writeWhole(STDERR_FILENO, kClearLine);
+        _statusShown = false;
+    }
+    return writeWhole(STDOUT_FILENO, text);
+}
+
+void Terminal::line(std::string_view text) {
+    const platform::MutexLock lock(_mutex);
+    std::string whole(_statusShown ? kClearLine : "");
+    whole += text;
+    whole += '\n';
+    _statusShown = false;
+    writeWhole(STDERR_FILENO, whole);
+}
+
+void Terminal::status(std::string_view text) {
+    const platform::MutexLock lock(_mutex);
+    if (!_errorIsTerminal || (text.empty() && !_statusShown)) {
+        return;
+    }
+    // One column stays free, or some terminals begin another line.
+    const std::string_view shown = cutTo(text, widthOf(STDERR_FILENO) - 1);
+    writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(shown));
+    _statusShown = !text.empty();
+}
+
+}  // namespace host

@@ -1,0 +1,60 @@
+// Terminal: the one place through which the program writes to standard output and standard error.
+//
+// Standard output carries the report and nothing else; standard error carries log lines, problems and
+// progress. A write is whole: an interrupt waits for the one in progress before it ends the program,
+// so no line and no file is cut.
+#ifndef ZR_HOST_ZRLAB_TERMINAL_H
+#define ZR_HOST_ZRLAB_TERMINAL_H
+
+#include <string>
+#include <string_view>
+
+#include "platform/mutex.h"
+
+namespace host {
+
+enum class Colour { Automatic, Always, Never };
+
+class Terminal {
+  public:
+    // The program's terminal; lives until the process ends.
+    static Terminal& shared();
+
+    // Tells a problem in one line on standard error: "zrlab: …".
+    void complain(std::string_view problem);
+
+    // From now on an interrupt (Ctrl-C) or a request to terminate ends the program at once with exit
+    // status 128 plus the signal's number: 130 for an interrupt. Call before any thread is started.
+    void endOnInterrupt();
+
+    // Whether standard output takes colour: as asked; Automatic means on a terminal, unless the
+    // environment has a NO_COLOR that is not empty or TERM is "dumb".
+    static bool outputTakesColour(Colour asked);
+    // The same of standard error.
+    static bool errorTakesColour(Colour asked);
+
+    // Whether standard error is a terminal that can take a status line.
+    bool progressIsTerminal() const { return _errorIsTerminal; }
+
+    // Writes to standard output, whole. False when it cannot be written (the reader has gone).
+    bool output(std::string_view text);
+    // Writes one line to standard error, above the status line.
+    void line(std::string_view text);
+    // Shows a status line on standard error, in place of the one before and cut to the terminal's
+    // width; only on a terminal. Empty text takes it away.
+    void status(std::string_view text);
+
+    // Held while something is written that an interrupt must not cut.
+    platform::Mutex& mutex() ZR_RETURNS_MUTEX(_mutex) { return _mutex; }
+
+  private:
+    Terminal();
+
+    const bool _errorIsTerminal;
+    platform::Mutex _mutex;
+    bool _statusShown ZR_GUARDED_BY(_mutex) = false;
+};
+
+}  // namespace host
+
+#endif

@@ -1,0 +1,61 @@
+#include "host/run/repeat_statistics.h"
+
+#include <cmath>
+#include <limits>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+namespace {
+
+using host::Judgement;
+using host::RunRecord;
+using host::Verdict;
+
+RunRecord run(Verdict verdict, double value, Judgement judgement) {
+    RunRecord record;
+    record.isDiagnostic = true;
+    record.verdict = verdict;
+    if (verdict != Verdict::Error) {
+        record.results.push_back({"noise", value, "events", std::nullopt, judgement});
+        record.results.push_back({"still", 0, "events", std::nullopt, Judgement::Within});
+    }
+    return record;
+}
+
+TEST(RepeatStatistics, FiguresOfEachResult) {
+    host::RepeatStatistics statistics("D");
+    for (const double value : {5.0, 1.0, 9.0}) {
+        statistics.add(run(Verdict::Passed, value, Judgement::Within));
+    }
+    EXPECT_EQ(statistics.record().results.at(0).median, 5.0);
+
+    statistics.add(run(Verdict::Failed, 100.0, Judgement::Outside));
+    statistics.add(run(Verdict::Failed, std::nan(""), Judgement::Outside));
+    statistics.add(run(Verdict::Error, 0, Judgement::Within));
+    const host::RepeatRecord record = statistics.record();
+    EXPECT_EQ(record.runs, 6U);
+    EXPECT_EQ(record.passed, 3U);
+    EXPECT_EQ(record.failed, 2U);
+    EXPECT_EQ(record.errors, 1U);
+    ASSERT_EQ(record.results.size(), 2U);
+    const host::ResultStatistics& noise = record.results[0];
+    EXPECT_EQ(noise.runs, 5U);
+    EXPECT_EQ(noise.outside, 2U);
+    EXPECT_EQ(noise.minimum, 1.0);
+    EXPECT_EQ(noise.median, 7.0);  // of 1, 5, 9, 100: the NaN has no place
+    EXPECT_EQ(noise.maximum, 100.0);
+}
+
+TEST(RepeatStatistics, AnExperimentAloneIsCountedByItsMeasurements) {
+    host::RepeatStatistics statistics("E");
+    RunRecord record;
+    record.verdict = Verdict::Passed;
+    record.measurements = {{"FrameCount", 3, "frames"}};
+    statistics.add(record);
+    ASSERT_EQ(statistics.record().results.size(), 1U);
+    EXPECT_EQ(statistics.record().results[0].maximum, 3.0);
+    EXPECT_EQ(statistics.record().results[0].outside, 0U);
+}
+
+}  // namespace

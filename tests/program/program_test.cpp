@@ -156,6 +156,10 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
 TEST(Program, RunsOnADeviceOfAModule) {
     EXPECT_THAT(zrlab({"devices", "--names", "--device-module", kBoardModule}).output,
                 AllOf(StartsWith("healthy\n"), HasSubstr("\nboard:rev-a\n")));
+    EXPECT_EQ(zrlab({"devices", "--kinds", "--device-module", kBoardModule}).output,
+              "simulator     Simulated devices: a gallery of profiles, or a profile's file; takes "
+              "--speed, can be made to fail\n"
+              "board         Boards without services; runs in real time\n");
     const test::Outcome outcome = zrlab(board({"--device", "board:rev-b", "--format", "json"}));
     EXPECT_EQ(outcome.status, 2) << outcome.errors;  // the board has no counters
     const Json document = Json::parse(outcome.output);

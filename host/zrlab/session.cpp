@@ -12,6 +12,7 @@
 #include <string_view>
 #include <utility>
 
+#include "devices/observed/observe.h"
 #include "devices/simulator/device.h"
 #include "devices/simulator/profile/reader.h"
 #include "frame/host_interface.h"
@@ -198,7 +199,8 @@ class Session {
         _openReports();
         _recorder = std::make_shared<RunRecorder>(_log, _wants("html"));
         _startLog();
-        platform::installServices(simulator::makeDevice(*profile, *speed, _recorder));
+        platform::installServices(
+            observed::observe(simulator::makeDevice(*profile, *speed), _recorder));
         platform::RunLoop::forThisThread();  // some experiments need one
         return std::nullopt;
     }

@@ -77,21 +77,21 @@ FaultTest::~FaultTest() {
 
 simulator::FrameOverride& FaultTest::from(std::uint64_t frame) {
     simulator::FrameOverride& range = camera().overrides.emplace_back();
-    range.firstFrame = frame;
+    range.frames.first = frame;
     return range;
 }
 
 simulator::FrameOverride& FaultTest::at(std::uint64_t frame) {
     simulator::FrameOverride& range = from(frame);
-    range.lastFrame = frame;
+    range.frames.last = frame;
     return range;
 }
 
 void FaultTest::install() {
     const auto progress = std::make_shared<simulator::StreamProgress>();
-    auto plugIn = simulator::makeCapturePlugIn(capture, speed, progress, _witness);
-    _plugIn = std::dynamic_pointer_cast<simulator::SimulatedCapture>(plugIn);
-    platform::installServices({.capture = std::move(plugIn),
+    _plugIn = observed::observeCapture(simulator::makeCapturePlugIn(capture, speed, progress),
+                                       observed::Reporter(_witness));
+    platform::installServices({.capture = _plugIn,
                                .meterix = simulator::makeMeterixFacility(meterix, progress),
                                .hid = nullptr,
                                .display = nullptr,
@@ -140,7 +140,7 @@ platform::ImageBufferRef FaultTest::buffer() {
 }
 
 std::size_t FaultTest::liveBuffers() const {
-    return _plugIn != nullptr ? _plugIn->liveBuffers() : 0;
+    return _plugIn != nullptr ? _plugIn->lentBuffers() : 0;
 }
 
 }  // namespace test

@@ -12,6 +12,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "devices/observed/capture.h"
 #include "devices/simulator/capture_service.h"
 #include "devices/simulator/meterix_facility.h"
 #include "platform/log.h"
@@ -166,7 +167,7 @@ class FaultTest : public ::testing::Test {
 
   private:
     std::shared_ptr<CaptureWitness> _witness = std::make_shared<CaptureWitness>();
-    std::shared_ptr<simulator::SimulatedCapture> _plugIn;
+    std::shared_ptr<observed::ObservedCapture> _plugIn;
     struct Made {
         std::weak_ptr<Experiment> experiment;
         long pending;  // references that stay after the test: the time-out's

@@ -2,10 +2,9 @@
 
 #include <cctype>
 #include <cstdint>
-#include <filesystem>
 #include <sstream>
-#include <system_error>
 
+#include "host/zrlab/default_plugin.h"
 #include "input/nearest.h"
 
 namespace host {
@@ -16,13 +15,6 @@ namespace {
 CLI::Validator oneOf(std::vector<std::string> words) {
     CLI::Validator validator = CLI::IsMember(std::move(words));
     return validator.description("");
-}
-
-// The module beside the program.
-std::string defaultPlugin() {
-    std::error_code none;
-    const auto program = std::filesystem::read_symlink("/proc/self/exe", none);
-    return (program.parent_path() / "zr_plugin.so").string();
 }
 
 constexpr const char* kRunExamples = R"(Examples:

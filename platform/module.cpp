@@ -1,5 +1,6 @@
 #include "platform/module.h"
 
+#include <exception>
 #include <filesystem>
 #include <system_error>
 
@@ -18,9 +19,12 @@ const void* loadModule(const std::string& path) {
     }
     // An absolute path keeps the loader from searching its own folders.
     const std::string absolute = std::filesystem::absolute(path).string();
+    // Through a pointer that the compiler cannot follow: the declaration of dlopen() promises not to
+    // throw, and an exception of an initializer would end the process.
+    void* (*volatile const open)(const char*, int) = dlopen;
     const void* module = nullptr;
     try {
-        module = dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
+        module = open(absolute.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
     } catch (const std::exception& exception) {
         throw ModuleProblem(std::string("its initializer failed: ") + exception.what());
     } catch (...) {

@@ -18,7 +18,8 @@ class ModuleProblem : public std::runtime_error {
 // ends: what it registered may be called at any time.
 //
 // Throws a ModuleProblem when there is no such file, when it is not a regular file, when the system's
-// loader refuses it (not a shared object, a symbol that nothing defines) and when an initializer throws.
+// loader refuses it (not a shared object, a symbol that nothing defines) and when an initializer throws. After the last
+// the loader's lock stays held by this thread: end the process soon.
 //
 // Any thread, one at a time.
 const void* loadModule(const std::string& path);

@@ -31,7 +31,7 @@ MAY_INCLUDE = {
                  "host/record"],
     "host/report": ["platform", "host/record"],
     "host/zrlab": ["platform", "frame/host_interface", "input", "devices/device",
-                   "devices/observed", "devices/simulator/device", "host/record", "host/report",
+                   "devices/observed", "devices/simulator/kind", "host/record", "host/report",
                    "host/run"],
 }
 # Where anything may be included from, and where no rule is needed.

@@ -2,9 +2,11 @@
 #ifndef ZR_HOST_REPORT_JSON_REPORT_H
 #define ZR_HOST_REPORT_JSON_REPORT_H
 
+#include <memory>
 #include <string>
 
 #include "host/record/run_record.h"
+#include "host/report/report_form.h"
 
 namespace host {
 
@@ -14,6 +16,8 @@ namespace host {
 // auxiliary data under "auxiliaryDataKinds", in the same shape; of a list whose elements are alike it
 // shows one.
 std::string jsonReport(const SessionRecord& session);
+
+std::shared_ptr<RunListener> openJsonReport(ReportSink sink, const TextStyle& style);
 
 }  // namespace host
 

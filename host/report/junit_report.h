@@ -12,13 +12,17 @@
 #ifndef ZR_HOST_REPORT_JUNIT_REPORT_H
 #define ZR_HOST_REPORT_JUNIT_REPORT_H
 
+#include <memory>
 #include <string>
 
 #include "host/record/run_record.h"
+#include "host/report/report_form.h"
 
 namespace host {
 
 std::string junitReport(const SessionRecord& session);
+
+std::shared_ptr<RunListener> openJunitReport(ReportSink sink, const TextStyle& style);
 
 }  // namespace host
 

@@ -18,26 +18,23 @@ namespace {
 
 constexpr std::string_view kClearLine = "\r\x1b[K";
 
-bool writeWhole(int file, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = ::write(file, text.data(), text.size());
-        if (written < 0 && errno == EINTR) {
-            continue;
-        }
-        if (written < 0) {
-            return false;
-        }
-        text.remove_prefix(static_cast<std::size_t>(written));
-    }
-    return true;
-}
-
 std::string_view environment(const char* name) {
     const char* value = std::getenv(name);
     return value != nullptr ? value : "";
 }
 
 }  // namespace
+
+bool writeWhole(int file, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = ::write(file, text.data(), text.size());
+        if (written < 0 && errno != EINTR) {
+            return false;
+        }
+        text.remove_prefix(written > 0 ? static_cast<std::size_t>(written) : 0);
+    }
+    return true;
+}
 
 Terminal::Terminal()
     : _errorIsTerminal(isatty(STDERR_FILENO) == 1 && environment("TERM") != "dumb") {}

@@ -7,13 +7,17 @@
 #ifndef ZR_HOST_REPORT_HTML_PAGE_H
 #define ZR_HOST_REPORT_HTML_PAGE_H
 
+#include <memory>
 #include <string>
 
 #include "host/record/run_record.h"
+#include "host/report/report_form.h"
 
 namespace host {
 
 std::string htmlReport(const SessionRecord& session);
+
+std::shared_ptr<RunListener> openHtmlReport(ReportSink sink, const TextStyle& style);
 
 }  // namespace host
 

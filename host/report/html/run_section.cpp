@@ -270,15 +270,16 @@ std::string measurementsHtml(const RunRecord& run) {
 std::string parametersHtml(const RunRecord& run) {
     Table table("Parameters as they were given to each part",
                 {{"Parameter"}, {"Value", "number"}, {"Part"}});
-    const auto add = [&table](const PartRecord& record, Part part) {
-        for (const auto& [name, value] : record.parameters) {
+    const auto add = [&](Part part) {
+        const PartPlan& plan = partOf(run, part);
+        for (const auto& [name, value] : plan.parameters) {
             table.row({htmlText(name), htmlText(value.text()),
-                       fmt::format("{} {}", partText(part), htmlText(record.name))});
+                       fmt::format("{} {}", partText(part), htmlText(plan.name))});
         }
     };
-    add(run.experiment, Part::Experiment);
-    if (run.analysis.has_value()) {
-        add(*run.analysis, Part::Analysis);
+    add(Part::Experiment);
+    if (run.analysisSeconds.has_value()) {
+        add(Part::Analysis);
     }
     return table.html();
 }
@@ -354,8 +355,8 @@ std::string runHtml(const RunRecord& run,
         "<section class=\"run\" id=\"{0}\" aria-labelledby=\"{0}-name\">\n"
         "<header>\n<h2 id=\"{0}-name\">{1}</h2>\n{2}<p class=\"summary\">{3}</p>\n{4}</header>\n"
         "{5}</section>\n",
-        id, htmlText(run.name), withOutcome ? outcome : "", htmlText(run.summary), resultStrip(run),
-        sections.html(run.name));
+        id, htmlText(run.plan.name), withOutcome ? outcome : "", htmlText(run.plan.summary),
+        resultStrip(run), sections.html(run.plan.name));
 }
 
 }  // namespace host

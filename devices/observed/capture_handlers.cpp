@@ -1,0 +1,169 @@
+#include "devices/observed/capture_handlers.h"
+
+#include <algorithm>
+#include <chrono>
+#include <utility>
+
+#include "platform/welkin/capture.h"
+
+namespace observed {
+
+namespace {
+
+using platform::Value;
+using Clock = std::chrono::steady_clock;
+
+constexpr std::string_view kOutput = kRylCaptureStreamVideoOutputID_PrimaryScaler;
+constexpr std::string_view kFrameHandler =
+    kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler;
+constexpr std::string_view kEventHandler = kRylCaptureStreamVideoOutputHandlerKey_EventHandler;
+
+thread_local int handlersOnThisThread = 0;
+
+// A call of a client's handler.
+class HandlerCall {
+  public:
+    HandlerCall(StreamWatch& stream, std::string_view handler) {
+        ++handlersOnThisThread;
+        if (stream.device->invalidated && !stream.lateHandlerReported.exchange(true)) {
+            stream.reporter().misused(
+                platform::format("%@ was called after invalidate() had returned", handler));
+        }
+    }
+    ~HandlerCall() { --handlersOnThisThread; }
+    HandlerCall(const HandlerCall&) = delete;
+    HandlerCall& operator=(const HandlerCall&) = delete;
+};
+
+// A call of a frame handler, of which a stream makes one at a time.
+class FrameHandlerCall {
+  public:
+    explicit FrameHandlerCall(StreamWatch& stream)
+        : _call(stream, "a frame handler"), _stream(stream) {
+        if (stream.frameHandlersInside++ > 0 && !stream.overlapReported.exchange(true)) {
+            stream.reporter().misused("two frame handlers of one stream were called at once");
+        }
+    }
+    ~FrameHandlerCall() { --_stream.frameHandlersInside; }
+    FrameHandlerCall(const FrameHandlerCall&) = delete;
+    FrameHandlerCall& operator=(const FrameHandlerCall&) = delete;
+
+  private:
+    const HandlerCall _call;
+    StreamWatch& _stream;
+};
+
+// These two hold the client's handler as the value that it wrote: a copy of the function would be
+// another object, with a state of its own.
+class WatchedFrameHandler {
+  public:
+    WatchedFrameHandler(Value client, std::shared_ptr<StreamWatch> stream)
+        : _client(std::move(client)), _stream(std::move(stream)) {}
+
+    void operator()(const platform::ImageBufferRef& buffer, platform::MediaTime time) const {
+        const FrameHandlerCall call(*_stream);
+        DeliveredFrame frame{
+            .number = ++_stream->frames, .time = time, .delivered = Clock::now(), .metadata = {}};
+        const auto& handler = *_client.object<WLRylFrameHandler>();
+        if (buffer == nullptr) {
+            handler(buffer, time);
+        } else {
+            constexpr auto kMetadata = kRylCaptureSampleBufferAttachmentKey_MetadataDictionary;
+            if (const auto* metadata = buffer->attachment(kMetadata).dictionary()) {
+                frame.metadata = *metadata;
+            }
+            handler(_stream->device->plugIn->lentBuffers->lend(buffer, _stream, frame.delivered),
+                    time);
+        }
+        _stream->reporter().report([&](Observer& observer) { observer.frameDelivered(frame); });
+    }
+
+    const Value& client() const { return _client; }
+
+  private:
+    Value _client;
+    std::shared_ptr<StreamWatch> _stream;
+};
+
+class WatchedEventHandler {
+  public:
+    WatchedEventHandler(Value client, std::shared_ptr<StreamWatch> stream)
+        : _client(std::move(client)), _stream(std::move(stream)) {}
+
+    void operator()(std::int32_t code, platform::MediaTime time, std::int64_t info) const {
+        const HandlerCall call(*_stream, "an event handler");
+        const DeliveredEvent event{
+            .code = code, .time = time, .info = info, .delivered = Clock::now()};
+        (*_client.object<WLRylEventHandler>())(code, time, info);
+        _stream->reporter().report([&](Observer& observer) { observer.eventDelivered(event); });
+    }
+
+    const Value& client() const { return _client; }
+
+  private:
+    Value _client;
+    std::shared_ptr<StreamWatch> _stream;
+};
+
+// The handlers property with another frame and event handler of the output, if it has those.
+template <class ReplaceFrameHandler, class ReplaceEventHandler>
+Value replaceHandlers(const Value& handlers,
+                      ReplaceFrameHandler replaceFrameHandler,
+                      ReplaceEventHandler replaceEventHandler) {
+    const platform::Dictionary* output = handlers[kOutput].dictionary();
+    if (output == nullptr) {
+        return handlers;
+    }
+    platform::MutableDictionary replaced = output->entries();
+    if (const auto* handler = (*output)[kFrameHandler].object<WLRylFrameHandler>()) {
+        replaced.set(kFrameHandler, replaceFrameHandler((*output)[kFrameHandler], *handler));
+    }
+    if (const auto* handler = (*output)[kEventHandler].object<WLRylEventHandler>()) {
+        replaced.set(kEventHandler, replaceEventHandler((*output)[kEventHandler], *handler));
+    }
+    platform::MutableDictionary outputs = handlers.dictionary()->entries();
+    outputs.set(kOutput, platform::Dictionary(std::move(replaced)));
+    return platform::Dictionary(std::move(outputs));
+}
+
+template <class Handler, class Watched>
+auto watching(const std::shared_ptr<StreamWatch>& stream) {
+    return [&stream](const Value& client, const Handler& handler) {
+        return handler ? Value::opaque(Handler(Watched(client, stream))) : client;
+    };
+}
+
+template <class Handler, class Watched>
+Value clientOf(const Value& value, const Handler& handler) {
+    const auto* watched = handler.template target<Watched>();
+    return watched != nullptr ? watched->client() : value;
+}
+
+}  // namespace
+
+Value watchHandlers(const Value& handlers, const std::shared_ptr<StreamWatch>& stream) {
+    return replaceHandlers(handlers, watching<WLRylFrameHandler, WatchedFrameHandler>(stream),
+                           watching<WLRylEventHandler, WatchedEventHandler>(stream));
+}
+
+Value unwatchHandlers(const Value& handlers) {
+    return replaceHandlers(handlers, clientOf<WLRylFrameHandler, WatchedFrameHandler>,
+                           clientOf<WLRylEventHandler, WatchedEventHandler>);
+}
+
+bool hasFrameHandler(const Value& handlers) {
+    const platform::Dictionary* outputs = handlers.dictionary();
+    return outputs != nullptr &&
+           std::any_of(outputs->entries().begin(), outputs->entries().end(),
+                       [](const auto& output) {
+                           const auto* handler =
+                               output.second[kFrameHandler].template object<WLRylFrameHandler>();
+                           return handler != nullptr && *handler;
+                       });
+}
+
+bool isInsideHandler() {
+    return handlersOnThisThread > 0;
+}
+
+}  // namespace observed

@@ -1,0 +1,23 @@
+// The decorator around a device: everything passes through it unchanged, and an observer learns what the
+// device delivers and which rules of its interfaces the device or its client breaks.
+#ifndef ZR_DEVICES_OBSERVED_OBSERVE_H
+#define ZR_DEVICES_OBSERVED_OBSERVE_H
+
+#include <memory>
+
+#include "devices/observed/observer.h"
+#include "platform/services.h"
+
+namespace observed {
+
+// The device's services, observed: the capture service, the counter reports and the HID bus. The
+// display and the registry are returned as they are. A null service stays null. Observed services can
+// be observed again.
+//
+// A broken rule is reported, and the call goes on to the device all the same: whether it is refused is
+// up to the device. Reports end when the observer goes; the services work on without it.
+platform::Services observe(platform::Services device, std::weak_ptr<Observer> observer);
+
+}  // namespace observed
+
+#endif

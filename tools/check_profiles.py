@@ -1,7 +1,7 @@
 #!/usr/bin/python3
-"""Checks the schema of device profiles, that it accepts every profile of the gallery, one with every key
-and the examples of the page about profiles, and that it rejects the broken profiles that the program
-rejects too. The page lists the gallery as it is.
+"""Checks the schema of device profiles: it accepts every profile of the gallery, one with every key and the
+examples on the page about profiles, and it rejects the broken profiles that the program rejects too. The
+page explains every key; every profile of the gallery has a summary and its expected outcomes.
 
 check_profiles.py PROFILES-FOLDER PAGE
 """
@@ -43,10 +43,9 @@ def main():
             problems.append(f"{name}: {error.json_path}: {error.message}")
 
     outcomes = json.loads((folder / OUTCOMES).read_text())
-    for name in sorted(set(gallery) | set(outcomes)):
-        cells = [f"`{name}`", gallery.get(name, {}).get("summary", "?"), *(one.split(":")[0] for one in outcomes.get(name, {}).values())]
-        if f"| {' | '.join(cells)} |\n" not in page:
-            problems.append(f"{name}: no profile, no outcomes or no such row in {sys.argv[2]}")
+    problems += [f"{name}: not in both the gallery and {OUTCOMES}"
+                 for name in sorted(set(gallery) ^ set(outcomes))]
+    problems += [f"{name}: no summary" for name, one in sorted(gallery.items()) if not one.get("summary")]
 
     broken = json.loads((SAMPLES / "broken_profiles.json").read_text())
     for row in broken:
@@ -60,6 +59,8 @@ def main():
     used = {key for part in parts_of(every_key) if isinstance(part, dict)
             for key in part}
     problems += [f"every_key: does not use \"{key}\"" for key in sorted(described - used)]
+    explained = set(re.findall(r"[$\w]+", " ".join(re.findall(r"`([^`\n]+)`", page))))
+    problems += [f"{sys.argv[2]}: does not explain \"{key}\"" for key in sorted(described - explained)]
 
     for problem in problems:
         print(problem)

@@ -1,5 +1,5 @@
 # How every target of the project is built: language level, warnings as errors, sanitizers, and one
-# library a folder that links exactly what the folder may include.
+# library per folder that links exactly what the folder may include.
 
 find_package(Threads REQUIRED)
 
@@ -28,6 +28,14 @@ if(ZR_COVERAGE)
   target_link_options(zr_build_flags INTERFACE --coverage)
 endif()
 
+# zr_hide_symbols(NAME)
+# Whatever the target's code is linked into does not export it. Only the shared libraries export.
+function(zr_hide_symbols name)
+  set_target_properties(${name} PROPERTIES
+    CXX_VISIBILITY_PRESET hidden
+    VISIBILITY_INLINES_HIDDEN ON)
+endfunction()
+
 # zr_component(NAME SHARED|STATIC SOURCES file... [USES target...] [PRIVATE_USES target...])
 # A library of this folder. USES are the folders that its headers show; PRIVATE_USES stay inside.
 function(zr_component name type)
@@ -36,5 +44,7 @@ function(zr_component name type)
   target_link_libraries(${name} PUBLIC zr_build_flags ${arg_USES} PRIVATE ${arg_PRIVATE_USES})
   if(type STREQUAL "SHARED")
     set_target_properties(${name} PROPERTIES OUTPUT_NAME "zr_${name}")
+  else()
+    zr_hide_symbols(${name})
   endif()
 endfunction()

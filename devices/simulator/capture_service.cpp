@@ -1,23 +1,21 @@
 #include "devices/simulator/capture_service.h"
 
 #include <algorithm>
-#include <chrono>
+#include <atomic>
 #include <utility>
+#include <vector>
 
 #include "devices/simulator/capture_stream.h"
-#include "platform/deadline.h"
-#include "platform/text_format.h"
 
 namespace simulator {
 
 namespace {
 
-constexpr std::chrono::seconds kBufferGrace{1};
-
 // One client's connection to the device.
 class SimulatedDevice final : public WLRylCaptureDevice {
   public:
-    explicit SimulatedDevice(const std::shared_ptr<CaptureContext>& context) : _context(context) {
+    explicit SimulatedDevice(const std::shared_ptr<const CaptureContext>& context)
+        : _context(context) {
         for (const StreamProfile& profile : context->profile.streams) {
             _streams.push_back(std::make_shared<SimulatedStream>(context, profile));
         }
@@ -33,7 +31,7 @@ class SimulatedDevice final : public WLRylCaptureDevice {
     }
 
     std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot error) override {
-        if (!_isUsable("its streams") || _context->profile.streamList.strikes(error)) {
+        if (_invalidated || _context->profile.streamList.strikes(error)) {
             return std::nullopt;
         }
         return WLRylCaptureStreamList(_streams.begin(), _streams.end());
@@ -41,7 +39,7 @@ class SimulatedDevice final : public WLRylCaptureDevice {
 
     bool requestControlOfStreams(const WLRylCaptureStreamList& streams,
                                  platform::ErrorSlot error) override {
-        return _isUsable("control") &&
+        return !_invalidated &&
                std::all_of(streams.begin(), streams.end(), [&](const auto& requested) {
                    const auto own = std::find(_streams.begin(), _streams.end(), requested);
                    return own != _streams.end() && (*own)->grantControl(error);
@@ -49,7 +47,7 @@ class SimulatedDevice final : public WLRylCaptureDevice {
     }
 
     bool invalidate(platform::ErrorSlot error) override {
-        if (!_isUsable("its invalidation") || _context->profile.invalidate.strikes(error)) {
+        if (_invalidated || _context->profile.invalidate.strikes(error)) {
             return false;
         }
         _invalidated = true;
@@ -60,32 +58,14 @@ class SimulatedDevice final : public WLRylCaptureDevice {
     }
 
   private:
-    bool _isUsable(std::string_view what) {
-        if (_invalidated) {
-            _context->misused(
-                platform::format("a device was asked for %@ after it was invalidated", what));
-        }
-        return !_invalidated;
-    }
-
-    const std::shared_ptr<CaptureContext> _context;
+    const std::shared_ptr<const CaptureContext> _context;
     std::vector<std::shared_ptr<SimulatedStream>> _streams;
-    bool _invalidated = false;
+    std::atomic<bool> _invalidated{false};  // any thread may ask
 };
 
-class PlugIn final : public SimulatedCapture {
+class PlugIn final : public WLISPCapturePlugIn {
   public:
-    explicit PlugIn(std::shared_ptr<CaptureContext> context) : _context(std::move(context)) {}
-    PlugIn(const PlugIn&) = delete;
-    PlugIn& operator=(const PlugIn&) = delete;
-
-    ~PlugIn() override {
-        // Receipts that are queued still give theirs back.
-        const auto held = _context->liveBuffers.drain(platform::deadlineAfter(kBufferGrace));
-        if (held > 0) {
-            _context->misused(platform::format("%@ image buffers were never given back", held));
-        }
-    }
+    explicit PlugIn(std::shared_ptr<const CaptureContext> context) : _context(std::move(context)) {}
 
     std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot error) override {
         if (_context->profile.device.strikes(error)) {
@@ -94,23 +74,20 @@ class PlugIn final : public SimulatedCapture {
         return std::make_shared<SimulatedDevice>(_context);
     }
 
-    std::size_t liveBuffers() const override { return _context->liveBuffers.count(); }
-
   private:
-    const std::shared_ptr<CaptureContext> _context;
+    const std::shared_ptr<const CaptureContext> _context;
 };
 
 }  // namespace
 
 std::shared_ptr<WLISPCapturePlugIn> makeCapturePlugIn(CaptureProfile profile,
                                                       double speed,
-                                                      std::shared_ptr<StreamProgress> progress,
-                                                      std::weak_ptr<observed::Observer> observer) {
+                                                      std::shared_ptr<StreamProgress> progress) {
     if (!profile.plugIn) {
         return nullptr;
     }
-    return std::make_shared<PlugIn>(std::make_shared<CaptureContext>(
-        std::move(profile), speed, std::move(progress), std::move(observer)));
+    return std::make_shared<PlugIn>(std::make_shared<const CaptureContext>(
+        CaptureContext{std::move(profile), speed, std::move(progress)}));
 }
 
 }  // namespace simulator

@@ -1,4 +1,4 @@
-// A stream of the simulated capture service, and the count of image buffers that are out.
+// A stream of the simulated capture service.
 #ifndef ZR_DEVICES_SIMULATOR_CAPTURE_STREAM_H
 #define ZR_DEVICES_SIMULATOR_CAPTURE_STREAM_H
 
@@ -16,49 +16,21 @@
 
 namespace simulator {
 
-// The image buffers that somebody holds, over all streams of a plug-in. Any thread.
-class LiveBuffers {
-  public:
-    std::size_t count() const;
-    void add();
-    void remove();
-    // Waits until there are none, at most until `deadline`; how many there are then.
-    std::size_t drain(std::chrono::steady_clock::time_point deadline);
-
-  private:
-    mutable platform::Mutex _mutex;
-    platform::Condition _changed;
-    std::size_t _count ZR_GUARDED_BY(_mutex) = 0;
-};
-
 // What a plug-in, its devices and their streams share.
 struct CaptureContext {
-    CaptureContext(CaptureProfile deviceProfile,
-                   double deviceSpeed,
-                   std::shared_ptr<StreamProgress> deviceProgress,
-                   std::weak_ptr<observed::Observer> deviceObserver)
-        : profile(std::move(deviceProfile))
-        , speed(deviceSpeed)
-        , progress(std::move(deviceProgress))
-        , observer(std::move(deviceObserver)) {}
-
-    const CaptureProfile profile;
-    const double speed;
-    const std::shared_ptr<StreamProgress> progress;
-    const std::weak_ptr<observed::Observer> observer;
-    LiveBuffers liveBuffers;
-
-    void misused(std::string_view what) const;
+    CaptureProfile profile;
+    double speed;
+    std::shared_ptr<StreamProgress> progress;
 };
 
-// Owner    Its device and whoever holds the stream; while it delivers also its delivery thread, so
-//          the last reference may go there.
-// Threads  Any; no lock is held while a handler or the observer runs.
+// Owner    Its device and the client; while it delivers also its delivery thread, so the last reference
+//          may go there.
+// Threads  Any; no lock is held while a handler runs.
 class SimulatedStream final : public WLRylCaptureStream,
                               public std::enable_shared_from_this<SimulatedStream> {
   public:
     // `profile` lies in the context.
-    SimulatedStream(std::shared_ptr<CaptureContext> context, const StreamProfile& profile)
+    SimulatedStream(std::shared_ptr<const CaptureContext> context, const StreamProfile& profile)
         : _context(std::move(context)), _profile(profile) {}
 
     platform::Value valueForProperty(std::string_view property, platform::ErrorSlot error) override;
@@ -79,24 +51,23 @@ class SimulatedStream final : public WLRylCaptureStream,
 
   private:
     enum class State { Idle, Running, Stopping, Stopped, Invalid };
-    enum class Turn { Deliver, Starved, Over };
     using TimePoint = std::chrono::steady_clock::time_point;
 
-    bool _isUsable(std::string_view operation, std::string_view what, bool needsControl);
+    bool _isUsable(bool needsControl);
     platform::Value _end() ZR_REQUIRES(_mutex);
     void _waitForHandler() ZR_REQUIRES(_mutex);
 
     // The delivery thread.
     void _deliver(std::uint64_t run, double rate);
     TimePoint _dueTime(std::uint64_t frame, double rate, TimePoint started) const;
-    Turn _awaitTurn(std::uint64_t run, TimePoint due);
+    bool _awaitTurn(std::uint64_t run, TimePoint due);
     void _endTurn();
     void _handOver(std::uint64_t frame, std::uint64_t microseconds);
     platform::Value _handlers();
     platform::ImageBufferRef _makeBuffer(const platform::Value& metadata);
     void _bufferCameBack();
 
-    const std::shared_ptr<CaptureContext> _context;
+    const std::shared_ptr<const CaptureContext> _context;
     const StreamProfile& _profile;
 
     platform::Mutex _mutex;

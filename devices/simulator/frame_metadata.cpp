@@ -4,6 +4,7 @@
 #include <cmath>
 #include <utility>
 
+#include "devices/simulator/mix_bits.h"
 #include "platform/welkin/capture.h"
 
 namespace simulator {
@@ -13,24 +14,17 @@ namespace {
 constexpr double kWarmUpSeconds = 60;
 constexpr std::string_view kNoDictionary = "corrupt";
 
-bool covers(const FrameOverride& range, std::uint64_t frame) {
-    return range.firstFrame <= frame && frame <= range.lastFrame;
-}
-
-// A number in [0, 1) that depends on nothing else (splitmix64).
+// A number in [0, 1) that depends on nothing else.
 double chance(std::uint64_t seed, std::uint64_t frame) {
-    std::uint64_t bits = seed + frame * 0x9E3779B97F4A7C15U;
-    bits = (bits ^ (bits >> 30U)) * 0xBF58476D1CE4E5B9U;
-    bits = (bits ^ (bits >> 27U)) * 0x94D049BB133111EBU;
-    bits ^= bits >> 31U;
+    const std::uint64_t bits = mixBits(seed + frame * kSplitMixStep);
     return static_cast<double>(bits >> 11U) / static_cast<double>(1ULL << 53U);
 }
 
-void applyOverride(const FrameOverride& range, platform::MutableDictionary& metadata) {
-    for (const auto& [key, value] : range.set) {
+void applyOverride(const FrameOverride& change, platform::MutableDictionary& metadata) {
+    for (const auto& [key, value] : change.set) {
         metadata.set(key, value);
     }
-    for (const std::string& key : range.remove) {
+    for (const std::string& key : change.remove) {
         metadata.remove(key);
     }
 }
@@ -40,7 +34,7 @@ void applyOverride(const FrameOverride& range, platform::MutableDictionary& meta
 bool isDropped(const StreamProfile& profile, std::uint64_t frame) {
     return std::any_of(
         profile.overrides.begin(), profile.overrides.end(),
-        [&](const FrameOverride& range) { return range.dropped && covers(range, frame); });
+        [&](const FrameOverride& change) { return change.dropped && change.frames.covers(frame); });
 }
 
 platform::Value frameMetadata(const StreamProfile& profile, std::uint64_t frame, double seconds) {
@@ -56,17 +50,17 @@ platform::Value frameMetadata(const StreamProfile& profile, std::uint64_t frame,
             metadata.set(key, std::round(warm * 100) / 100);
         }
     }
-    for (const FrameOverride& range : profile.overrides) {
-        if (!covers(range, frame)) {
+    for (const FrameOverride& change : profile.overrides) {
+        if (!change.frames.covers(frame)) {
             continue;
         }
-        if (range.noMetadata) {
+        if (change.noMetadata) {
             return {};
         }
-        if (range.metadataIsNoDictionary) {
+        if (change.metadataIsNoDictionary) {
             return kNoDictionary;
         }
-        applyOverride(range, metadata);
+        applyOverride(change, metadata);
     }
     return platform::Dictionary(std::move(metadata));
 }

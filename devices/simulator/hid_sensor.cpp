@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cmath>
 #include <deque>
 #include <set>
 #include <string_view>
@@ -11,10 +10,10 @@
 
 #include <pthread.h>
 
+#include "devices/simulator/due_time.h"
 #include "devices/simulator/image_report.h"
 #include "platform/mutex.h"
 #include "platform/number.h"
-#include "platform/text_format.h"
 
 namespace simulator {
 
@@ -27,7 +26,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t kMostQueued = 64;
 
-// The feature reports that set the modes without which no image comes, and the value of both.
+// The feature reports that set the modes which the sensor needs for images, and the value of both.
 constexpr std::int64_t kPowerModeReportID = 171;
 constexpr std::int64_t kStreamingModeReportID = 172;
 constexpr std::byte kModeOn{1};
@@ -36,11 +35,10 @@ constexpr std::byte kModeOn{1};
 //
 // Owner    The user's handle, its thread while it makes reports, and its event source while that
 //          delivers one: it may die on any of their threads.
-// Threads  Any; no lock is held while a callback, the observer or a run loop is called.
+// Threads  Any; no lock is held while a callback or a run loop is called.
 class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_from_this<Sensor> {
   public:
-    Sensor(HidDeviceProfile profile, double speed, std::weak_ptr<observed::Observer> observer)
-        : _profile(std::move(profile)), _speed(speed), _observer(std::move(observer)) {}
+    Sensor(HidDeviceProfile profile, double speed) : _profile(std::move(profile)), _speed(speed) {}
 
     // What the user holds. The device closes when it goes.
     std::shared_ptr<WLIOHIDDeviceInterface> makeHandle() {
@@ -72,9 +70,7 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
     };
     using DeliveryRef = std::shared_ptr<Delivery>;
 
-    bool _isOpenFor(std::string_view operation);
-    void _checkThread(std::string_view operation);
-    void _misused(std::string_view how) const;
+    bool _isOpen();
     DeliveryRef _currentDelivery();
     void _endDelivery();
     void _letGo();
@@ -82,7 +78,6 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
     // The sensor's thread.
     void _startProducing();
     void _produce(const DeliveryRef& delivery, std::uint64_t number);
-    Clock::time_point _dueTime(Clock::time_point started, std::uint64_t reports) const;
     bool _enqueue(const DeliveryRef& delivery, SensorReport report, Clock::time_point due);
 
     // The run loop's thread.
@@ -90,7 +85,6 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
 
     const HidDeviceProfile _profile;
     const double _speed;
-    const std::weak_ptr<observed::Observer> _observer;
 
     platform::Mutex _mutex;
     platform::Condition _changed;
@@ -99,30 +93,19 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
     Callback _callback ZR_GUARDED_BY(_mutex);
     DeliveryRef _delivery ZR_GUARDED_BY(_mutex);  // null while it is not scheduled
     std::uint64_t _nextReport ZR_GUARDED_BY(_mutex) = 1;
-    std::uint64_t _imagesDelivered ZR_GUARDED_BY(_mutex) = 0;
 };
 
 bool Sensor::open(ErrorSlot error) {
-    State state;
-    {
-        const MutexLock lock(_mutex);
-        state = _state;
-    }
-    if (state == State::Open) {
-        _misused("opened while it is open");
-    }
-    if (state != State::Closed || _profile.open.strikes(error)) {
+    const MutexLock lock(_mutex);
+    if (_state != State::Closed || _profile.open.strikes(error)) {
         return false;
     }
-    const MutexLock lock(_mutex);
     _state = State::Open;
     _nextReport = 1;
-    _imagesDelivered = 0;
     return true;
 }
 
 void Sensor::setInputReportCallback(WLHIDInputReportCallback callback) {
-    _checkThread("given a callback");
     Callback other;  // the one before goes without the lock: it may own anything
     if (callback) {
         other = std::make_shared<const WLHIDInputReportCallback>(std::move(callback));
@@ -134,12 +117,7 @@ void Sensor::setInputReportCallback(WLHIDInputReportCallback callback) {
 bool Sensor::setFeatureReportWithID(std::int64_t reportID,
                                     std::span<const std::byte> data,
                                     ErrorSlot error) {
-    _checkThread("sent a feature report");
-    if (!_isOpenFor("sent a feature report")) {
-        return false;
-    }
-    if (data.empty() || std::to_integer<std::int64_t>(data.front()) != reportID) {
-        _misused("sent a feature report whose data does not begin with its ID");
+    if (!_isOpen() || data.empty() || std::to_integer<std::int64_t>(data.front()) != reportID) {
         return false;
     }
     const auto fault = _profile.featureReports.find(reportID);
@@ -155,7 +133,7 @@ bool Sensor::setFeatureReportWithID(std::int64_t reportID,
 }
 
 void Sensor::scheduleWithRunLoop(const std::shared_ptr<RunLoop>& runLoop, std::string_view mode) {
-    if (!_isOpenFor("scheduled")) {
+    if (!_isOpen()) {
         return;
     }
     _endDelivery();
@@ -175,12 +153,10 @@ void Sensor::scheduleWithRunLoop(const std::shared_ptr<RunLoop>& runLoop, std::s
         const MutexLock lock(_mutex);
         _delivery = delivery;
     }
-    _checkThread("scheduled");
     _startProducing();
 }
 
 void Sensor::unscheduleFromRunLoop(const std::shared_ptr<RunLoop>& runLoop, std::string_view mode) {
-    _checkThread("unscheduled");
     const DeliveryRef delivery = _currentDelivery();
     if (delivery != nullptr && delivery->runLoop.lock() == runLoop && delivery->mode == mode) {
         _endDelivery();
@@ -188,7 +164,6 @@ void Sensor::unscheduleFromRunLoop(const std::shared_ptr<RunLoop>& runLoop, std:
 }
 
 bool Sensor::close(ErrorSlot error) {
-    _checkThread("closed");
     _endDelivery();
     {
         const MutexLock lock(_mutex);
@@ -208,31 +183,9 @@ void Sensor::_letGo() {
     _callback.swap(dropped);
 }
 
-bool Sensor::_isOpenFor(std::string_view operation) {
-    State state;
-    {
-        const MutexLock lock(_mutex);
-        state = _state;
-    }
-    if (state == State::Closed) {
-        _misused(platform::format("%@ while it is not open", operation));
-    }
-    return state == State::Open;
-}
-
-// A scheduled device is used on the thread of its run loop; one whose run loop has gone, on any.
-void Sensor::_checkThread(std::string_view operation) {
-    const DeliveryRef delivery = _currentDelivery();
-    const auto runLoop = delivery != nullptr ? delivery->runLoop.lock() : nullptr;
-    if (runLoop != nullptr && runLoop != RunLoop::current()) {
-        _misused(platform::format("%@ on another thread than its run loop's", operation));
-    }
-}
-
-void Sensor::_misused(std::string_view how) const {
-    if (const auto observer = _observer.lock()) {
-        observer->misused(platform::format("HID device %@: %@", _profile.product, how));
-    }
+bool Sensor::_isOpen() {
+    const MutexLock lock(_mutex);
+    return _state == State::Open;
 }
 
 Sensor::DeliveryRef Sensor::_currentDelivery() {
@@ -274,7 +227,8 @@ void Sensor::_produce(const DeliveryRef& delivery, std::uint64_t number) {
     while (auto report = nextReport(_profile, number)) {
         number = report->number + 1;
         const bool last = report->unplugged;
-        const Clock::time_point due = _dueTime(started, report->number - before);
+        const auto reports = static_cast<double>(report->number - before);
+        const auto due = dueTime(started, reports / _profile.reportsPerSecond, _speed);
         if (!_enqueue(delivery, std::move(*report), due)) {
             return;
         }
@@ -283,16 +237,6 @@ void Sensor::_produce(const DeliveryRef& delivery, std::uint64_t number) {
             return;
         }
     }
-}
-
-// When the last of so many reports since the start is due; never, beyond the clock's end.
-Clock::time_point Sensor::_dueTime(Clock::time_point started, std::uint64_t reports) const {
-    if (!(_speed > 0) || std::isinf(_speed)) {
-        return started;
-    }
-    const double seconds = static_cast<double>(reports) / (_profile.reportsPerSecond * _speed);
-    const std::chrono::nanoseconds delay(platform::Number(seconds * 1e9).as<std::int64_t>());
-    return delay < Clock::time_point::max() - started ? started + delay : Clock::time_point::max();
 }
 
 // Waits until the report is due and has room; false when the delivery has ended.
@@ -318,7 +262,6 @@ void Sensor::_deliverOne(const DeliveryRef& delivery) {
     SensorReport report;
     Callback callback;
     bool more;
-    std::uint64_t imageNumber = 0;  // none
     {
         const MutexLock lock(_mutex);
         if (_delivery != delivery || delivery->queue.empty()) {
@@ -331,9 +274,6 @@ void Sensor::_deliverOne(const DeliveryRef& delivery) {
         callback = _callback;
         if (report.unplugged) {
             _state = State::Unplugged;
-        } else if (callback != nullptr && report.id == kImageReportID &&
-                   report.data.size() >= kImageReportSize) {
-            imageNumber = ++_imagesDelivered;
         }
     }
     if (more) {
@@ -343,11 +283,6 @@ void Sensor::_deliverOne(const DeliveryRef& delivery) {
         _endDelivery();
     } else if (callback != nullptr) {
         (*callback)(report.id, report.data, report.error);
-    }
-    if (imageNumber != 0) {
-        if (const auto observer = _observer.lock()) {
-            observer->imageDelivered(imageNumber);
-        }
     }
 }
 
@@ -374,7 +309,6 @@ bool matches(const HidDeviceProfile& device, const platform::Dictionary& matchin
 struct Bus {
     const HidProfile profile;
     const double speed;
-    const std::weak_ptr<observed::Observer> observer;
 };
 
 // Threads: one at a time.
@@ -388,8 +322,7 @@ class SimulatedManager final : public WLHIDManager {
             if (std::any_of(matching.begin(), matching.end(), [&device](const auto& dictionary) {
                     return matches(device, dictionary);
                 })) {
-                _devices.push_back(
-                    std::make_shared<Sensor>(device, _bus->speed, _bus->observer)->makeHandle());
+                _devices.push_back(std::make_shared<Sensor>(device, _bus->speed)->makeHandle());
             }
         }
     }
@@ -415,11 +348,9 @@ class SimulatedFacility final : public platform::HidFacility {
 
 }  // namespace
 
-std::shared_ptr<platform::HidFacility> makeHidFacility(HidProfile profile,
-                                                       double speed,
-                                                       std::weak_ptr<observed::Observer> observer) {
-    return std::make_shared<SimulatedFacility>(std::make_shared<const Bus>(
-        Bus{.profile = std::move(profile), .speed = speed, .observer = std::move(observer)}));
+std::shared_ptr<platform::HidFacility> makeHidFacility(HidProfile profile, double speed) {
+    return std::make_shared<SimulatedFacility>(
+        std::make_shared<const Bus>(Bus{.profile = std::move(profile), .speed = speed}));
 }
 
 }  // namespace simulator

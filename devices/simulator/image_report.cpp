@@ -6,6 +6,8 @@
 #include <limits>
 #include <numbers>
 
+#include "devices/simulator/mix_bits.h"
+
 namespace simulator {
 
 namespace {
@@ -18,23 +20,20 @@ constexpr std::byte kFiller{0xFF};
 
 using Data = std::vector<std::byte>;
 
-bool covers(const ReportOverride& range, std::uint64_t number) {
-    return range.firstReport <= number && number <= range.lastReport;
-}
-
 // The first number from `number` on that is not dropped; nothing when all are.
 std::optional<std::uint64_t> afterDropped(const HidDeviceProfile& profile, std::uint64_t number) {
     for (;;) {
-        const auto drop = std::find_if(
-            profile.overrides.begin(), profile.overrides.end(),
-            [&](const ReportOverride& range) { return range.dropped && covers(range, number); });
+        const auto drop = std::find_if(profile.overrides.begin(), profile.overrides.end(),
+                                       [&](const ReportOverride& change) {
+                                           return change.dropped && change.reports.covers(number);
+                                       });
         if (drop == profile.overrides.end()) {
             return number;
         }
-        if (drop->lastReport == std::numeric_limits<std::uint64_t>::max()) {
+        if (drop->reports.last == std::numeric_limits<std::uint64_t>::max()) {
             return std::nullopt;
         }
-        number = drop->lastReport + 1;
+        number = drop->reports.last + 1;
     }
 }
 
@@ -44,12 +43,9 @@ void put(Data& data, std::size_t offset, std::uint32_t value) {
     }
 }
 
-// Evenly spread over -1 to 1, the same each time it is asked for the same place.
+// Evenly spread over -1 to 1, always the same for the same place.
 double noiseAt(std::uint64_t report, std::uint64_t place) {
-    std::uint64_t bits = report * 0x9E3779B97F4A7C15U + place * 0xD1B54A32D192ED03U;
-    bits = (bits ^ (bits >> 30)) * 0xBF58476D1CE4E5B9U;
-    bits = (bits ^ (bits >> 27)) * 0x94D049BB133111EBU;
-    bits ^= bits >> 31;
+    const std::uint64_t bits = mixBits(report * kSplitMixStep + place * 0xD1B54A32D192ED03U);
     return static_cast<double>(bits) / 0x1p63 - 1;
 }
 
@@ -107,10 +103,10 @@ std::optional<SensorReport> nextReport(const HidDeviceProfile& profile, std::uin
         return report;
     }
     report.data = imageRecord(profile, *sent);
-    for (const ReportOverride& range : profile.overrides) {
-        if (covers(range, *sent)) {
-            report.id = range.reportID.value_or(report.id);
-            report.data.resize(range.length.value_or(report.data.size()), kFiller);
+    for (const ReportOverride& change : profile.overrides) {
+        if (change.reports.covers(*sent)) {
+            report.id = change.reportID.value_or(report.id);
+            report.data.resize(change.length.value_or(report.data.size()), kFiller);
         }
     }
     if (!report.data.empty()) {

@@ -20,7 +20,7 @@ struct SensorReport {
     std::int64_t id = kImageReportID;
     std::vector<std::byte> data = {};  // begins with the report ID
     platform::ErrorRef error = {};     // in place of the data
-    bool unplugged = false;            // in place of anything: the device is gone
+    bool unplugged = false;            // in place of everything else: the device is gone
 };
 
 // The first report from `number` on that is not dropped; nothing when there is none.

@@ -30,7 +30,7 @@ devices::Device openProfile(const devices::Request& request) {
     return {.name = profile->name,
             .summary = profile->summary,
             .facts = {{"platform", "simulated device"}},
-            .services = makeDevice(*profile, request.speed, {})};
+            .services = makeDevice(*profile, request.speed)};
 }
 
 }  // namespace

@@ -7,7 +7,7 @@
 
 namespace simulator {
 
-// Written by the capture threads, read by whoever takes a snapshot of the counters.
+// Atomic: the capture threads write it while a snapshot of the counters reads it on another thread.
 struct StreamProgress {
     std::atomic<std::uint64_t> frames{0};        // frames delivered since the device was made
     std::atomic<std::uint64_t> microseconds{0};  // device time spent streaming, over all frames

@@ -99,7 +99,9 @@ CommandLine::CommandLine()
     _addRun();
 
     CLI::App* devices = _app.add_subcommand("devices", "List the devices that a run can use");
-    devices->add_flag("--names", namesOnly, "Only the names, one per line");
+    CLI::Option* names = devices->add_flag("--names", namesOnly, "Only the names, one per line");
+    devices->add_flag("--kinds", kindsOnly, "List the kinds of devices and what they can do")
+        ->excludes(names);
     _addDeviceModule(*devices);
 
     CLI::App* help = _app.add_subcommand("help", "Show the help of a command");

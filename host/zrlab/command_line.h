@@ -35,6 +35,7 @@ class CommandLine {
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe
     bool namesOnly = false;             // of list and devices
+    bool kindsOnly = false;             // of devices
     std::string helpTopic;              // of help
     std::string shell;                  // of completion
     SessionOptions session;             // of run

@@ -97,7 +97,17 @@ int describe(const std::vector<std::string>& names) {
     return print(out);
 }
 
-int devices(bool namesOnly) {
+int deviceKinds() {
+    std::string out;
+    for (const devices::Kind& kind : devices::kinds()) {
+        out += fmt::format("{:<12}  {}; {}{}\n", kind.name, kind.summary,
+                           kind.takesSpeed ? "takes --speed" : "runs in real time",
+                           kind.hasFaults ? ", can be made to fail" : "");
+    }
+    return print(out);
+}
+
+int listedDevices(bool namesOnly) {
     const auto listed = listDevices();
     std::size_t width = 0;
     for (const ListedDevice& device : listed) {
@@ -153,7 +163,7 @@ int run(int count, const char* const* arguments) {
     const std::string command = commandLine.command();
     if (command == "devices") {
         registerDeviceKinds(commandLine.session.device.modules);
-        return devices(commandLine.namesOnly);
+        return commandLine.kindsOnly ? deviceKinds() : listedDevices(commandLine.namesOnly);
     }
     if (command == "help") {
         return help(commandLine.helpTopic);

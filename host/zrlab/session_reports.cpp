@@ -1,3 +1,5 @@
+#include "host/zrlab/session_reports.h"
+
 #include <filesystem>
 #include <set>
 #include <system_error>
@@ -7,7 +9,6 @@
 
 #include "host/record/problem.h"
 #include "host/report/report_forms.h"
-#include "host/zrlab/session_reports.h"
 #include "host/zrlab/terminal.h"
 
 namespace host {

@@ -29,9 +29,9 @@ std::string load(const std::string& path) {
 }
 
 devices::Kind kindNamed(const std::string& name) {
-    return {.name = name,
-            .summary = "A kind",
-            .open = [](const devices::Request&) { return devices::Device(); }};
+    return {.name = name, .summary = "A kind", .open = [](const devices::Request&) {
+                return devices::Device();
+            }};
 }
 
 TEST(DeviceModule, RegistersItsKindOnce) {
@@ -52,8 +52,8 @@ TEST(DeviceModule, ABadOneIsNamedWithTheReason) {
     EXPECT_EQ(load("/no/such.so"), "no such file");
     EXPECT_EQ(load(ZR_TEST_MODULES), "not a file");
     EXPECT_THAT(load(__FILE__), HasSubstr("cannot be loaded: "));
-    EXPECT_THAT(load(module("unresolved")), AllOf(HasSubstr("cannot be loaded: "),
-                                                  HasSubstr("nobodyHasThisFunction")));
+    EXPECT_THAT(load(module("unresolved")),
+                AllOf(HasSubstr("cannot be loaded: "), HasSubstr("nobodyHasThisFunction")));
     EXPECT_EQ(load(module("silent")), "it registers no kind of device");
     EXPECT_EQ(load(module("other_version")),
               "it is built for version 2 of the device interface, this is version 1");
@@ -68,8 +68,7 @@ TEST(DeviceKind, IsRefusedUnlessWellFormed) {
         {kindNamed("Board"), "the kind name \"Board\" is not made of a-z, 0-9 and -"},
         {kindNamed("2nd"), "the kind name \"2nd\" is not made of a-z, 0-9 and -"},
         {kindNamed("a:b"), "the kind name \"a:b\" is not made of a-z, 0-9 and -"},
-        {{.name = "idle", .summary = "Opens nothing"},
-         "the kind \"idle\" cannot open a device"},
+        {{.name = "idle", .summary = "Opens nothing"}, "the kind \"idle\" cannot open a device"},
     };
     for (const auto& [kind, reason] : rows) {
         devices::registerKind(kind);

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "devices/observed/hid.h"
 #include "platform/services.h"
 #include "platform/text_format.h"
 
@@ -109,10 +110,12 @@ KirraTest::~KirraTest() {
 
 void KirraTest::install() {
     _tap = std::make_shared<Tap>();
-    platform::installServices({.hid = std::make_shared<TappedBus>(
-                                   simulator::makeHidFacility(hid, 0, _witness), nullptr, _tap),
-                               .display = simulator::makeDisplayService(display),
-                               .registry = simulator::makeDeviceRegistry(display)});
+    platform::installServices(
+        {.hid = std::make_shared<TappedBus>(
+             observed::observeHid(simulator::makeHidFacility(hid, 0), observed::Reporter(_witness)),
+             nullptr, _tap),
+         .display = simulator::makeDisplayService(display),
+         .registry = simulator::makeDeviceRegistry(display)});
 }
 
 std::shared_ptr<ZRKirraImageExperiment> KirraTest::make(platform::Number images,

@@ -108,7 +108,7 @@ TEST(Module, BrokenOnesAreNamedWithTheReason) {
     EXPECT_EQ(load("/no/such.so"), "plug-in module /no/such.so: no such file");
     EXPECT_EQ(load(ZR_BROKEN_MODULES),
               "plug-in module " + std::string(ZR_BROKEN_MODULES) + ": not a file");
-    EXPECT_THAT(load(__FILE__), HasSubstr("cannot be loaded: "));
+    EXPECT_THAT(load(ZR_NOT_A_MODULE), HasSubstr("cannot be loaded: "));
     EXPECT_THAT(load(broken("unresolved.so")), HasSubstr("nobodyHasThisFunction"));
     EXPECT_EQ(load(broken("silent.so")),
               "plug-in module " + broken("silent.so") + ": it registers nothing");

@@ -6,6 +6,41 @@
 
 namespace test {
 
+namespace {
+
+// A device of hand-fed streams, and the plug-in that has it.
+struct HandFedCapture final : WLISPCapturePlugIn, WLRylCaptureDevice {
+    explicit HandFedCapture(WLRylCaptureStreamList all) : list(std::move(all)) {}
+
+    std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot /*error*/) override {
+        return std::make_shared<HandFedCapture>(list);
+    }
+    std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot /*error*/) override {
+        return list;
+    }
+    bool requestControlOfStreams(const WLRylCaptureStreamList& /*streams*/,
+                                 platform::ErrorSlot /*error*/) override {
+        return true;
+    }
+    bool invalidate(platform::ErrorSlot /*error*/) override { return true; }
+
+    const WLRylCaptureStreamList list;
+};
+
+template <class Handler>
+Handler handlerOf(const ZRVantorFaultExperiment& experiment, std::string_view key) {
+    const platform::Value handlers = experiment.stream()->valueForProperty(
+        kRylCaptureStreamProperty_VideoOutputHandlers, nullptr);
+    return *handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler][key].object<Handler>();
+}
+
+}  // namespace
+
+HandFedStream::HandFedStream() {
+    values.set(kRylCaptureStreamProperty_PortType, kRylCapturePortType_FrontFacingInfraredCamera);
+    values.set(kRylCaptureStreamProperty_ErrorCounters, platform::Dictionary());
+}
+
 bool eventually(const std::function<bool()>& condition) {
     const auto deadline = platform::deadlineAfter(kGenerous);
     while (!condition()) {
@@ -42,25 +77,31 @@ FaultTest::~FaultTest() {
 
 simulator::FrameOverride& FaultTest::from(std::uint64_t frame) {
     simulator::FrameOverride& range = camera().overrides.emplace_back();
-    range.firstFrame = frame;
+    range.frames.first = frame;
     return range;
 }
 
 simulator::FrameOverride& FaultTest::at(std::uint64_t frame) {
     simulator::FrameOverride& range = from(frame);
-    range.lastFrame = frame;
+    range.frames.last = frame;
     return range;
 }
 
 void FaultTest::install() {
     const auto progress = std::make_shared<simulator::StreamProgress>();
-    auto plugIn = simulator::makeCapturePlugIn(capture, speed, progress, _witness);
-    _plugIn = std::dynamic_pointer_cast<simulator::SimulatedCapture>(plugIn);
-    platform::installServices({.capture = std::move(plugIn),
+    _plugIn = observed::observeCapture(simulator::makeCapturePlugIn(capture, speed, progress),
+                                       observed::Reporter(_witness));
+    platform::installServices({.capture = _plugIn,
                                .meterix = simulator::makeMeterixFacility(meterix, progress),
                                .hid = nullptr,
                                .display = nullptr,
                                .registry = nullptr});
+}
+
+void FaultTest::install(WLRylCaptureStreamList streams) {
+    platform::installServices({.capture = std::make_shared<HandFedCapture>(std::move(streams)),
+                               .meterix = simulator::makeMeterixFacility(
+                                   meterix, std::make_shared<simulator::StreamProgress>())});
 }
 
 std::shared_ptr<ZRVantorFaultExperiment> FaultTest::make(double frameCount,
@@ -82,11 +123,13 @@ ZRExperimentResultRef FaultTest::run(double frameCount, double timeout) {
 }
 
 WLRylFrameHandler FaultTest::frameHandler(const Experiment& experiment) {
-    const platform::Value handlers = experiment.stream()->valueForProperty(
-        kRylCaptureStreamProperty_VideoOutputHandlers, nullptr);
-    return *handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                    [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                        .object<WLRylFrameHandler>();
+    return handlerOf<WLRylFrameHandler>(experiment,
+                                        kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler);
+}
+
+WLRylEventHandler FaultTest::eventHandler(const Experiment& experiment) {
+    return handlerOf<WLRylEventHandler>(experiment,
+                                        kRylCaptureStreamVideoOutputHandlerKey_EventHandler);
 }
 
 platform::ImageBufferRef FaultTest::buffer() {
@@ -97,7 +140,7 @@ platform::ImageBufferRef FaultTest::buffer() {
 }
 
 std::size_t FaultTest::liveBuffers() const {
-    return _plugIn != nullptr ? _plugIn->liveBuffers() : 0;
+    return _plugIn != nullptr ? _plugIn->lentBuffers() : 0;
 }
 
 }  // namespace test

@@ -4,12 +4,12 @@
 #define ZR_DEVICES_SIMULATOR_PROFILE_CAPTURE_PROFILE_H
 
 #include <cstdint>
-#include <limits>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "devices/simulator/profile/fault.h"
+#include "devices/simulator/profile/number_range.h"
 #include "platform/string_map.h"
 #include "platform/value.h"
 
@@ -17,8 +17,7 @@ namespace simulator {
 
 // What is different about a range of frames. Several may cover one frame: applied in their order.
 struct FrameOverride {
-    std::uint64_t firstFrame = 1;
-    std::uint64_t lastFrame = std::numeric_limits<std::uint64_t>::max();  // the last one covered
+    NumberRange frames;
     platform::MutableDictionary set;  // metadata entries added or replaced
     std::vector<std::string> remove;  // metadata entries taken away
     bool noMetadata = false;
@@ -26,7 +25,7 @@ struct FrameOverride {
     bool dropped = false;                 // lost: counted by the sensor and never delivered
 };
 
-// An event that is told right before the frame of that number.
+// An event that is delivered right before the frame of that number.
 struct FrameEvent {
     std::uint64_t frame = 1;
     std::int32_t code = 0;
@@ -41,8 +40,8 @@ struct StreamProfile {
     platform::MutableDictionary metadata;  // of every frame
     std::vector<std::int32_t>
         lightSources;  // of successive frames, in turn; none: as in `metadata`
-    // Metadata numbers that rise while the module warms up, and by how much in the end. Two thirds
-    // of the way take a minute of device time.
+    // Metadata numbers that rise exponentially as the module warms up (time constant 60 s of device
+    // time); the value is the total rise.
     platform::StringMap<double> warming;
     std::vector<FrameOverride> overrides;
     std::vector<FrameEvent> events;

@@ -2,7 +2,6 @@
 #include <algorithm>
 #include <string>
 #include <string_view>
-#include <tuple>
 #include <vector>
 
 #include "devices/simulator/profile/part_readers.h"
@@ -56,7 +55,7 @@ const ShortName* find(const ShortName (&names)[N], std::string_view name) {
     return found == std::end(names) ? nullptr : found;
 }
 
-// The service's key; a name that is none of its own stands for itself.
+// The service's key; every other name stands for itself.
 std::string_view metadataKey(std::string_view name) {
     const ShortName* found = find(kMetadataNames, name);
     return found == nullptr ? name : found->key;
@@ -88,30 +87,28 @@ void readMetadata(const JsonNode& node, platform::MutableDictionary& metadata) {
     });
 }
 
-void readOverrideMetadata(const JsonNode& node, FrameOverride& range) {
+void readOverrideMetadata(const JsonNode& node, FrameOverride& change) {
     if (node.isObject()) {
         node.forEachKey([&](const std::string& name, const JsonNode& value) {
             if (value.isNull()) {
-                range.remove.emplace_back(metadataKey(name));
+                change.remove.emplace_back(metadataKey(name));
             } else {
-                range.set.set(metadataKey(name), readValue(value));
+                change.set.set(metadataKey(name), readValue(value));
             }
         });
         return;
     }
     const std::string text = node.json().is_string() ? node.asText() : "";
-    range.noMetadata = text == "missing";
-    range.metadataIsNoDictionary = text == "corrupt";
-    if (!range.noMetadata && !range.metadataIsNoDictionary) {
+    change.noMetadata = text == "missing";
+    change.metadataIsNoDictionary = text == "corrupt";
+    if (!change.noMetadata && !change.metadataIsNoDictionary) {
         node.fail(R"(neither metadata entries nor "missing" nor "corrupt")");
     }
 }
 
 constexpr JsonKey<FrameOverride> kFrameOverrideKeys[] = {
-    {"frames",
-     [](const JsonNode& node, FrameOverride& range) {
-         std::tie(range.firstFrame, range.lastFrame) = readRange(node, "frames");
-     }},
+    {"frames", [](const JsonNode& node,
+                  FrameOverride& change) { change.frames = readRange(node, "frames"); }},
     {"metadata", readOverrideMetadata},
     {"dropped", readMember<&FrameOverride::dropped>},
 };

@@ -6,7 +6,7 @@
 
 namespace simulator {
 
-// A display that is on, and what may be wrong with telling so.
+// A display that is on, and what can be wrong on the way to its power state.
 struct DisplayProfile {
     int mainDisplayStatus = 0;       // other than 0: there is no main display
     bool registryService = true;     // whether the display has a registry object

@@ -23,10 +23,11 @@ class Fault {
 
     bool fails() const { return _fails; }
 
-    // Whether the call fails; stores the error object then, if there is one and a slot for it.
+    // Returns whether the call fails. If it does and there is an error object, stores it in the slot
+    // (which may be null).
     bool strikes(platform::ErrorSlot slot) const {
         if (_fails) {
-            platform::failWith(slot, _error);
+            static_cast<void>(platform::failWith(slot, _error));
         }
         return _fails;
     }

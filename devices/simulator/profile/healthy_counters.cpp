@@ -1,5 +1,5 @@
 // The counters that a device without faults publishes: sixty of the projector module, all at zero,
-// and others around them that a reader must tell apart.
+// and others around them that a reader must leave out.
 #include <string>
 #include <string_view>
 #include <vector>
@@ -76,8 +76,8 @@ std::vector<Family> projectorFamilies() {
 
 MeterixProfile healthyMeterix() {
     MeterixProfile profile;
-    // Published by others, or by the same group under another subgroup: no business of the
-    // projector's, however alike some look.
+    // Published by others, or by the same group under another subgroup: not the projector's, although
+    // some look like it.
     profile.channels = {
         {"CPU", "CPU Core Performance States", "V0P0", 7},
         {"Q71ISP", "Q71ISP Frames", "Number Frames Out", 12},

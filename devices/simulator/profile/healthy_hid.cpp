@@ -7,7 +7,7 @@ namespace simulator {
 
 namespace {
 
-// A device that nobody touches.
+// A device that no experiment opens.
 HidDeviceProfile idleDevice(std::string product, std::int64_t usagePage, std::int64_t usage) {
     HidDeviceProfile device;
     device.product = std::move(product);

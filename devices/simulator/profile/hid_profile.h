@@ -5,21 +5,20 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <limits>
 #include <map>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "devices/simulator/profile/fault.h"
+#include "devices/simulator/profile/number_range.h"
 #include "platform/error.h"
 
 namespace simulator {
 
 // What is different about a range of reports. Several may cover one report: applied in their order.
 struct ReportOverride {
-    std::uint64_t firstReport = 1;
-    std::uint64_t lastReport = std::numeric_limits<std::uint64_t>::max();  // the last one covered
+    NumberRange reports = {};
     std::optional<std::size_t> length = {};     // bytes: cut short, or filled up with 0xFF
     std::optional<std::int64_t> reportID = {};  // in place of 118; its lowest byte begins the data
     bool dropped = false;  // lost on the way: its frame ID is missing from the sequence
@@ -37,9 +36,9 @@ struct ScanShape {
     double amplitude = 24000;  // counts
     double center = 19.5;      // samples from the first
     double width = 6;          // samples, standard deviation
-    double frequency = 0.09;   // cycles a sample, at the center
-    double chirp = 0.004;      // cycles a sample, gained each sample
-    double turn = 0.02;        // cycles a report
+    double frequency = 0.09;   // cycles per sample, at the center
+    double chirp = 0.004;      // cycles per sample, gained with each sample
+    double turn = 0.02;        // cycles per report
     double noise = 700;        // counts, at most
 };
 

@@ -3,7 +3,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <string>
-#include <tuple>
 
 #include "devices/simulator/profile/part_readers.h"
 #include "devices/simulator/profile/value_readers.h"
@@ -17,17 +16,15 @@ constexpr std::int64_t kHighestReportId = 0xFF;
 constexpr std::size_t kLongestReport = 0x10000;
 
 constexpr JsonKey<ReportOverride> kReportOverrideKeys[] = {
-    {"reports",
-     [](const JsonNode& node, ReportOverride& range) {
-         std::tie(range.firstReport, range.lastReport) = readRange(node, "reports");
-     }},
+    {"reports", [](const JsonNode& node,
+                   ReportOverride& change) { change.reports = readRange(node, "reports"); }},
     {"length",
-     [](const JsonNode& node, ReportOverride& range) {
-         range.length = node.asInteger<std::size_t>(0, kLongestReport);
+     [](const JsonNode& node, ReportOverride& change) {
+         change.length = node.asInteger<std::size_t>(0, kLongestReport);
      }},
     {"reportID",
-     [](const JsonNode& node, ReportOverride& range) {
-         range.reportID = node.asInteger<std::int64_t>(0, kHighestReportId);
+     [](const JsonNode& node, ReportOverride& change) {
+         change.reportID = node.asInteger<std::int64_t>(0, kHighestReportId);
      }},
     {"dropped", readMember<&ReportOverride::dropped>},
 };

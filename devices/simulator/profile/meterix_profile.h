@@ -18,7 +18,7 @@ struct CounterChannel {
     std::optional<std::uint64_t> count = 0;  // at the start; nothing: the channel has no count
 
     // What streaming adds to the count.
-    double risePerSecond = 0;       // events a second of device time, fractions accumulate
+    double risePerSecond = 0;       // events per second of device time, fractions accumulate
     std::uint64_t riseAtFrame = 0;  // the device's frame at which `riseBy` is added; 0 for never
     std::uint64_t riseBy = 0;
 };

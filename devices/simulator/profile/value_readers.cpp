@@ -4,6 +4,7 @@
 #include <limits>
 #include <memory>
 #include <string_view>
+#include <utility>
 
 namespace simulator {
 
@@ -73,19 +74,20 @@ platform::ErrorRef readError(const JsonNode& node) {
                                                    std::move(*parts.message), parts.underlying);
 }
 
-std::pair<std::uint64_t, std::uint64_t> readRange(const JsonNode& node, const std::string& what) {
+NumberRange readRange(const JsonNode& node, const std::string& what) {
     const std::string text = node.json().is_string() ? node.asText() : "";
     std::string_view rest = text;
-    const std::uint64_t first = takeOrdinal(rest);
-    std::uint64_t last = first;
+    NumberRange range;
+    range.first = takeOrdinal(rest);
+    range.last = range.first;
     if (!rest.empty() && rest.front() == '-') {
         rest.remove_prefix(1);
-        last = rest.empty() ? std::numeric_limits<std::uint64_t>::max() : takeOrdinal(rest);
+        range.last = rest.empty() ? std::numeric_limits<std::uint64_t>::max() : takeOrdinal(rest);
     }
-    if (first == 0 || last < first || !rest.empty()) {
+    if (range.first == 0 || range.last < range.first || !rest.empty()) {
         node.fail("not a range of " + what + R"(: "10", "10-20" or "10-", counted from 1)");
     }
-    return {first, last};
+    return range;
 }
 
 std::optional<std::uint64_t> readOptional(const JsonNode& node, std::uint64_t least) {

@@ -7,9 +7,9 @@
 #include <cstdint>
 #include <optional>
 #include <string>
-#include <utility>
 
 #include "devices/simulator/profile/fault.h"
+#include "devices/simulator/profile/number_range.h"
 #include "input/json_reader.h"
 #include "platform/error.h"
 #include "platform/value.h"
@@ -28,23 +28,23 @@ using input::readObject;
 // that error.
 Fault readFault(const JsonNode& node);
 
-// {"domain", "code", "message"} and perhaps an "underlying" error; null is no error object.
+// {"domain", "code", "message"} and perhaps an "underlying" error; null for null.
 platform::ErrorRef readError(const JsonNode& node);
 
-// "10", "10-20", "10-": numbers from 1, the last one included. `what` they number.
-std::pair<std::uint64_t, std::uint64_t> readRange(const JsonNode& node, const std::string& what);
+// "10", "10-20", "10-". `what` the numbers count, for the message of an error.
+NumberRange readRange(const JsonNode& node, const std::string& what);
 
-// A number of at least `least`; null is none.
+// A number of at least `least`; nothing for null.
 std::optional<std::uint64_t> readOptional(const JsonNode& node, std::uint64_t least = 0);
 
-// What a device measures, in any unit: beyond this a number of the profile is a slip.
+// What a device measures, in any unit: a number of a profile that is larger is a mistake.
 constexpr double kLargestQuantity = 1e9;
 
 // Numbers keep their kind: a whole one is the smallest of signed 32, signed 64 and unsigned 64 bits
-// that holds it, others are doubles. null holds nothing.
+// that holds it, others are doubles. null is a Value that holds nothing.
 platform::Value readValue(const JsonNode& node);
 
-// The same into a place of its kind; a null that the kind has no room for is an error.
+// The same into a variable. null is an error for a type that has no such value.
 inline void readInto(const JsonNode& node, bool& place) {
     place = node.asBool();
 }

@@ -17,7 +17,10 @@ devices::Device openBoard(const devices::Request& request) {
 [[gnu::constructor]] void registerKind() {
     devices::registerKind({.name = "board",
                            .summary = "Boards without services",
-                           .list = [] { return std::vector<devices::Entry>{{"rev-a", "first"}}; },
+                           .list =
+                               [] {
+                                   return std::vector<devices::Entry>{{"rev-a", "first"}};
+                               },
                            .open = openBoard});
 }
 

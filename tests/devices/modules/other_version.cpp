@@ -4,7 +4,8 @@
 namespace {
 
 [[gnu::constructor]] void registerKind() {
-    devices::detail::registerKind(devices::kInterfaceVersion + 1, {.name = "future", .summary = "Built later"});
+    devices::detail::registerKind(devices::kInterfaceVersion + 1,
+                                  {.name = "future", .summary = "Built later"});
 }
 
 }  // namespace

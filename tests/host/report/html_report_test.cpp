@@ -50,11 +50,11 @@ TEST(HtmlReport, TellsTheVerdictFirstThenWhatFailed) {
                                                             "Log",
                                                             "late",
                                                             "zrlab run Diagnostic"});
-    expectInOrder(host::htmlReport(test::brokenSession()),
-                  {"ERROR", "did not complete", "experiment Experiment, run",
-                   "Failed to start streaming.", "PlugInErrorDomain 204", "caused by",
-                   "Start was refused", "Capture 7", "caused by", "Stream is busy", "Service -3",
-                   "No manager available?!", "property written too early"});
+    expectInOrder(
+        host::htmlReport(test::brokenSession()),
+        {"ERROR", "did not complete", "experiment Experiment, run", "Failed to start streaming.",
+         "PlugInErrorDomain 204", "caused by", "Start was refused", "Capture 7", "caused by",
+         "Stream is busy", "Service -3", "No manager available?!", "property written too early"});
     expectInOrder(host::htmlReport(test::repeatedSession()),
                   {"17 of 20 runs passed", "Number of Channel 17", "Repetitions",
                    "20 runs: 17 passed, 2 failed, 1 in error", "show run 7", "Number of Channel 17",

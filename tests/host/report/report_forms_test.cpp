@@ -46,8 +46,8 @@ TEST(ReportForms, EachWritesASessionAndIsFound) {
 TEST(ReportForms, TextIsWrittenNameByName) {
     host::SessionRecord session = test::repeatedSession();
     std::string text;
-    const auto report = host::reportFormNamed("text")->open(
-        [&text](std::string_view piece) { text += piece; }, {});
+    const auto report =
+        host::reportFormNamed("text")->open([&text](std::string_view piece) { text += piece; }, {});
     report->nameEnded(session);
     EXPECT_THAT(text, HasSubstr("17 passed, 2 failed, 1 in error"));
     EXPECT_THAT(text, HasSubstr("\nrun 7:\nFAIL"));

@@ -67,9 +67,7 @@ TEST_F(OutputFile, KeepsModesLinksAndWhatIsNoFile) {
 
 TEST_F(OutputFile, SaysWhatCannotBeWrittenAndTouchesNothing) {
     const fs::path absent = _folder / "no" / "such" / "report";
-    const auto isRefused = [](const std::string& why) {
-        return ThrowsMessage<host::Problem>(why);
-    };
+    const auto isRefused = [](const std::string& why) { return ThrowsMessage<host::Problem>(why); };
     const std::string why = "cannot write " + absent.string() + ": No such file or directory";
     EXPECT_THAT([&] { host::requireWritable(absent); }, isRefused(why));
     EXPECT_THAT([&] { host::writeFile(absent, "x"); }, isRefused(why));

@@ -187,7 +187,7 @@ TEST_F(ProfileReader, AnExtensionChangesWhatItNamesAndKeepsTheRest) {
     EXPECT_EQ(*stream.metadata.find("Other"), platform::Value(3));
     EXPECT_TRUE(stream.metadata.contains("HardwareEvents"));
     ASSERT_THAT(stream.overrides, SizeIs(1));
-    EXPECT_EQ(stream.overrides[0].firstFrame, 3U);
+    EXPECT_EQ(stream.overrides[0].frames, (simulator::NumberRange{3, 3}));
     EXPECT_FALSE(stream.start.fails());
     const auto& channel = device.meterix.channels.back();
     EXPECT_EQ(std::tie(channel.name, channel.group, channel.subgroup, channel.count),
@@ -224,10 +224,8 @@ TEST_F(ProfileReader, KeepsTheKindsOfValuesAndTheChainsOfErrors) {
     EXPECT_EQ(metadata["own"]["list"],
               platform::Value(platform::List{true, platform::Value(), std::int32_t{-1}}));
     ASSERT_THAT(stream.overrides, SizeIs(4));
-    EXPECT_EQ(std::pair(stream.overrides[1].firstFrame, stream.overrides[1].lastFrame),
-              std::pair(4UL, 6UL));
-    EXPECT_EQ(std::pair(stream.overrides[2].firstFrame, stream.overrides[2].lastFrame),
-              std::pair(7UL, kLast));
+    EXPECT_EQ(stream.overrides[1].frames, (simulator::NumberRange{4, 6}));
+    EXPECT_EQ(stream.overrides[2].frames, (simulator::NumberRange{7, kLast}));
 }
 
 }  // namespace

@@ -1,0 +1,167 @@
+// Observed devices and streams that go on any thread, in any order, while frames arrive.
+#include <chrono>
+#include <functional>
+#include <future>
+#include <memory>
+#include <mutex>
+#include <thread>
+#include <utility>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "devices/observed/capture.h"
+#include "devices/simulator/capture_service.h"
+#include "tests/devices/observed/fake_capture.h"
+#include "tests/support/capture_witness.h"
+
+namespace {
+
+using platform::ImageBufferRef;
+using platform::MediaTime;
+using ::testing::IsEmpty;
+
+constexpr int kRounds = 50;
+
+class CaptureLifetime : public ::testing::Test {
+  protected:
+    CaptureLifetime() { profile.streams.back().events = {{.frame = 2, .code = 1}}; }
+    ~CaptureLifetime() override { EXPECT_THAT(witness->waitForMisuses(0), IsEmpty()); }
+
+    // A new device with a running stream. When `given` is over, the handlers have been dropped.
+    void start(
+        WLRylFrameHandler frame, WLRylEventHandler event = [](auto, auto, auto) {}) {
+        plugIn = observed::observeCapture(
+            simulator::makeCapturePlugIn(profile, 0, std::make_shared<simulator::StreamProgress>()),
+            observed::Reporter(witness));
+        device = plugIn->device(nullptr);
+        stream = device->streams(nullptr)->back();
+        ASSERT_TRUE(device->requestControlOfStreams({stream}, nullptr));
+        auto token = std::make_shared<int>();
+        handlers = token;
+        ASSERT_TRUE(stream->setValue(
+            test::captureHandlers(
+                [frame = std::move(frame), token = std::move(token)](
+                    const ImageBufferRef& buffer, MediaTime time) { frame(buffer, time); },
+                std::move(event)),
+            kRylCaptureStreamProperty_VideoOutputHandlers, nullptr));
+        ASSERT_TRUE(stream->start(nullptr));
+    }
+    void awaitHandlersEnd() const {
+        while (!handlers.expired()) {
+            std::this_thread::yield();
+        }
+    }
+
+    simulator::CaptureProfile profile = simulator::healthyCapture();
+    std::shared_ptr<test::CaptureWitness> witness = std::make_shared<test::CaptureWitness>();
+    std::shared_ptr<observed::ObservedCapture> plugIn;
+    std::shared_ptr<WLRylCaptureDevice> device;
+    std::shared_ptr<WLRylCaptureStream> stream;
+    std::weak_ptr<int> handlers;
+};
+
+// The handlers get the only references to everything. start() is given up in the first of them, so it
+// may not have returned yet: the test keeps the stream until then.
+TEST_F(CaptureLifetime, EverythingGoesInsideAHandler) {
+    for (int round = 0; round < kRounds; ++round) {
+        struct Owned {
+            std::shared_ptr<observed::ObservedCapture> plugIn;
+            std::shared_ptr<WLRylCaptureDevice> device;
+            std::shared_ptr<WLRylCaptureStream> stream;
+        } owned;
+        std::promise<void> handedOver;
+        const auto isHandedOver = handedOver.get_future().share();
+        const auto letGo = [&owned, isHandedOver](bool inFrame) {
+            isHandedOver.wait();
+            if (inFrame) {
+                EXPECT_TRUE(owned.stream == nullptr || owned.stream->stop(nullptr));
+            }
+            std::exchange(owned, {});
+        };
+        const bool inFrame = round % 2 == 0;
+        start([=](const auto&, auto) { inFrame ? letGo(true) : void(); },
+              [=](auto, auto, auto) { inFrame ? void() : letGo(false); });
+        owned = {std::move(plugIn), std::move(device), std::move(stream)};
+        handedOver.set_value();
+        awaitHandlersEnd();
+    }
+}
+
+// invalidate() waits for the handler in progress, and none comes after it.
+TEST_F(CaptureLifetime, IsInvalidatedWhileItDelivers) {
+    for (int round = 0; round < kRounds; ++round) {
+        int frames = 0;  // ordered by nothing but the end of invalidate()
+        start([&](const auto&, auto) { ++frames; });
+        witness->waitFor(static_cast<std::size_t>(round));
+        ASSERT_TRUE(device->invalidate(nullptr));
+        EXPECT_TRUE(handlers.expired());
+        EXPECT_GE(frames, 0);
+        EXPECT_EQ(plugIn->lentBuffers(), 0U);
+    }
+}
+
+// stop() under a lock of the client's, on another thread than the one that starts, while buffers are
+// given back on a third.
+TEST_F(CaptureLifetime, IsStoppedOnAnotherThread) {
+    for (int round = 0; round < kRounds; ++round) {
+        std::mutex clients;
+        std::promise<ImageBufferRef> first;
+        start([&, given = std::make_shared<std::once_flag>()](const ImageBufferRef& buffer, auto) {
+            std::call_once(*given, [&] { first.set_value(buffer); });
+        });
+        std::thread giver([&] { first.get_future().get() = nullptr; });
+        std::thread stopper([&, stopped = stream] {
+            const std::lock_guard lock(clients);
+            EXPECT_TRUE(stopped->stop(nullptr));
+        });
+        stream = nullptr;
+        {
+            const std::lock_guard lock(clients);
+            static_cast<void>(device->streams(nullptr));
+        }
+        stopper.join();
+        giver.join();
+        ASSERT_TRUE(device->invalidate(nullptr));
+    }
+}
+
+// Handlers that own their stream and device do not keep them for ever.
+TEST_F(CaptureLifetime, EndsWithHandlersThatOwnTheDevice) {
+    for (const bool twice : {false, true}) {
+        auto owned = std::make_shared<
+            std::pair<std::shared_ptr<WLRylCaptureDevice>, std::shared_ptr<WLRylCaptureStream>>>();
+        start([owned](const auto&, auto) {});
+        *owned = {device, stream};
+        if (twice) {
+            ASSERT_TRUE(stream->stop(nullptr));
+            ASSERT_TRUE(stream->start(nullptr));
+        }
+        owned = nullptr;
+        ASSERT_TRUE(device->invalidate(nullptr));
+        EXPECT_TRUE(handlers.expired());
+    }
+}
+
+// Buffers, the observer and the service end in every order.
+TEST_F(CaptureLifetime, BuffersOutliveWhatTheyCameFrom) {
+    for (int round = 0; round < kRounds; ++round) {
+        std::promise<ImageBufferRef> first;
+        start([&, given = std::make_shared<std::once_flag>()](const ImageBufferRef& buffer, auto) {
+            std::call_once(*given, [&] { first.set_value(buffer); });
+        });
+        ImageBufferRef buffer = first.get_future().get();
+        if (round % 2 == 0) {
+            witness = std::make_shared<test::CaptureWitness>();
+        }
+        plugIn = nullptr;
+        stream = nullptr;
+        device = nullptr;
+        constexpr auto kMetadata = kRylCaptureSampleBufferAttachmentKey_MetadataDictionary;
+        EXPECT_TRUE(buffer->attachment(kMetadata).isPresent());
+        buffer = nullptr;
+        awaitHandlersEnd();
+    }
+}
+
+}  // namespace

@@ -433,7 +433,7 @@ TEST(RunLoop, MayEndWhileItsSourcesAreSignalled) {
             source->signal();
         }
     });
-    for (int i = 0; i < 100; ++i) {
+    for (int i = 0; i < 100 || served == 0; ++i) {
         onNewThread([&] {
             const auto loop = RunLoop::forThisThread();
             loop->addSource(source, kRunLoopDefaultMode);
@@ -442,7 +442,6 @@ TEST(RunLoop, MayEndWhileItsSourcesAreSignalled) {
     }
     over = true;
     signaller.join();
-    EXPECT_GT(served, 0);
 }
 
 }  // namespace

@@ -1,5 +1,5 @@
 // The middle of a run: receives and validates frames, and stops once.
-#include <exception>
+#include <system_error>
 #include <utility>
 
 #include "frame/shared_helpers.h"
@@ -10,14 +10,14 @@ using platform::LogLevel;
 
 namespace {
 
-// Queues an item, or drops it when that fails: handlers and items must not throw. While the stream
-// runs, only the exhaustion of memory makes it fail; after the stop, when the queues are not held any
-// more, also that of threads, and then the item would change nothing.
+// Queues an item, or drops it when there is no thread to run it: handlers and items must not throw. That
+// happens only after the stop, when the queues are not held any more and the item would change nothing.
+// The exhaustion of memory ends the process: a frame that is lost would falsify the result.
 template <class Item>
 void queueOrDrop(platform::WorkQueue& queue, Item item) noexcept {
     try {
         queue.async(std::move(item));
-    } catch (const std::exception&) {
+    } catch (const std::system_error&) {
     }
 }
 

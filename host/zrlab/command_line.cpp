@@ -2,15 +2,14 @@
 
 #include <cctype>
 #include <cstdint>
-#include <filesystem>
 #include <sstream>
 #include <string_view>
-#include <system_error>
 
 #include <fmt/format.h>
 
 #include "host/record/problem.h"
 #include "host/report/report_forms.h"
+#include "host/zrlab/default_plugin.h"
 #include "input/nearest.h"
 
 namespace host {
@@ -21,13 +20,6 @@ namespace {
 CLI::Validator oneOf(std::vector<std::string> words) {
     CLI::Validator validator = CLI::IsMember(std::move(words));
     return validator.description("");
-}
-
-// The module beside the program.
-std::string defaultPlugin() {
-    std::error_code none;
-    const auto program = std::filesystem::read_symlink("/proc/self/exe", none);
-    return (program.parent_path() / "zr_plugin.so").string();
 }
 
 constexpr std::string_view kRunExamples = R"(Examples:

@@ -67,7 +67,7 @@ def forbidden(path, included):
 
 
 def sources(root):
-    """Every source file below `root`, but for what the build made and what is hidden."""
+    """Every source file below `root`, except what the build made and what is hidden."""
     for file in sorted(root.rglob("*")):
         path = file.relative_to(root)
         if file.suffix in (".h", ".cpp", ".inc") and path.parts[0] != "build":

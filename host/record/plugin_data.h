@@ -1,6 +1,6 @@
-// What the bench knows of the data that the plug-in's experiments take and make: which parameters count
-// what, what a frame's metadata holds, what an image is made of. Progress and drawings rest on it; an
-// experiment with other data is reported without them.
+// What the bench knows about the data that the plug-in's experiments take and return: what their
+// parameters count, what a frame's metadata holds, what an image is made of. Progress and drawings need
+// it; an experiment with other data is reported without them.
 #ifndef ZR_HOST_RECORD_PLUGIN_DATA_H
 #define ZR_HOST_RECORD_PLUGIN_DATA_H
 
@@ -11,10 +11,10 @@
 
 namespace host {
 
-// How far a run has come, in what it counts.
+// What the progress of a run is counted in.
 enum class Counted { Frames, Images };
 
-// The parameters of an experiment that say how many of what end it.
+// The parameters of an experiment that say after how many frames or images it ends.
 struct CountParameter {
     std::string_view parameter;
     Counted counted;

@@ -1,7 +1,7 @@
-// Problem: what keeps the bench from going on, and the program's exit status for it.
+// Problem: why the bench cannot go on, and the program's exit status for it.
 //
-// The one way in which the host's rooms report that something asked for cannot be done: a command line, a
-// module, a device, a file. It is thrown where it is found and shown in one line by the program.
+// Everything in host/ reports in this one way that what was asked for cannot be done: because of the command
+// line, a module, a device, a file. It is thrown where it is found and shown in one line by the program.
 #ifndef ZR_HOST_RECORD_PROBLEM_H
 #define ZR_HOST_RECORD_PROBLEM_H
 

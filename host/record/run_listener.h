@@ -6,7 +6,7 @@
 
 namespace host {
 
-// Called on the session's thread, but for logged(), which any thread may call, several at once.
+// Called on the session's thread, except logged(), which any thread may call, several at once.
 // A record is complete up to the moment of the call.
 class RunListener {
   public:

@@ -24,10 +24,10 @@
 
 namespace host {
 
-// What came of a run, from best to worst.
+// The outcome of a run, from best to worst.
 enum class Verdict {
     Passed,  // a diagnostic whose every limited result is within its limit; an experiment that ran
-    Failed,  // a result is outside of its limit
+    Failed,  // a result is outside its limit
     Error,   // something did not complete, so there is no verdict
 };
 
@@ -40,7 +40,7 @@ enum class Judgement {
 
 struct BoundRecord {
     double value;
-    bool open;  // the bound's own value lies outside of the limit
+    bool open;  // the bound's own value is outside the limit
 };
 
 struct LimitRecord {
@@ -72,7 +72,7 @@ struct FailureRecord {
         step;  // "create", "setup", "run", "teardown", "analyze" or "device": see kStep…
     // What the part reported; null when it failed without an error object.
     platform::ErrorRef error;
-    // What happened when there is no error object: an exception's message, say.
+    // What happened when there is no error object, such as an exception's message.
     std::string message;
 };
 
@@ -91,7 +91,7 @@ struct LogRecord {
 
 // A frame that the device delivered, with what a report draws of it.
 struct FrameRecord {
-    std::uint64_t number;  // 1 for the first
+    std::uint64_t number;  // as received: 1 for the first, frames lost on the way not counted
     double presentation;   // seconds on the device's clock
     double delivered;      // seconds of real time since the run began
     std::optional<double> lightSource;
@@ -118,13 +118,13 @@ struct RunRecord {
     Verdict verdict = Verdict::Error;
 };
 
-// What became of one measured result over the repetitions of a run.
+// One measured result over the repetitions of a run.
 struct ResultStatistics {
     std::string name;
     std::string unit;
     std::optional<LimitRecord> limit;
     std::uint64_t runs = 0;
-    std::uint64_t outside = 0;  // how often it was outside of its limit
+    std::uint64_t outside = 0;  // how often it was outside its limit
     double minimum = 0;
     double median = 0;
     double maximum = 0;

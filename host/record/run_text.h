@@ -1,4 +1,4 @@
-// The words that reports have in common, so that every form says the same in the same words.
+// The words that reports have in common, so that every form uses the same ones.
 #ifndef ZR_HOST_RECORD_RUN_TEXT_H
 #define ZR_HOST_RECORD_RUN_TEXT_H
 
@@ -37,7 +37,7 @@ std::string valueText(double value, std::string_view unit);
 // "Max Reports: 0 … 0 events", "no limit".
 std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view unit);
 
-// What came of the run in a few words: "2 of 64 limits not met".
+// The outcome of the run in a few words: "2 of 64 limits not met".
 std::string headline(const RunRecord& run);
 
 // The part of the run's plan; an experiment on its own has no analysis.

@@ -178,7 +178,7 @@ std::string jsonReport(const SessionRecord& session) {
     document["runs"] = arrayOf(session.runs, [](const RunRecord& run) { return jsonOf(run); });
     document["repeats"] =
         arrayOf(session.repeats, [](const RepeatRecord& repeat) { return jsonOf(repeat); });
-    // Text that is no UTF-8 (it may come from a device) must not stop the report.
+    // Text that is not UTF-8 (it may come from a device) must not stop the report.
     return document.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
 }
 

@@ -16,7 +16,7 @@ namespace {
 using Json = nlohmann::ordered_json;
 using host::jsonOf;
 
-// Errors are the bench's; it is the one piece of software that the run start names.
+// The source of errors: the bench, the only software that the run start names.
 constexpr const char* kSoftwareId = "zrlab";
 constexpr const char* kHardwareId = "device";
 constexpr std::string_view kPlatformFact = "platform";
@@ -183,7 +183,7 @@ void JsonlReport::runEnded(const RunRecord& run) {
         _writeStep("diagnosis", diagnosisOf(run));
     }
     _closeStep();
-    // What is only known now, a misused device, is no failure of a step.
+    // What is only known now, a broken rule of the device, is not a failure of a step.
     _writeFailures(run);
 }
 
@@ -202,7 +202,7 @@ void JsonlReport::_write(std::string_view kind, Json artifact) {
     Json line{{"sequenceNumber", _sequenceNumber++},
               {"timestamp", platform::Date::now().timestamp()}};
     line[kind] = std::move(artifact);
-    // Text that is no UTF-8 (it may come from a device) must not stop the report.
+    // Text that is not UTF-8 (it may come from a device) must not stop the report.
     _sink(line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n");
 }
 

@@ -9,9 +9,9 @@
 //   extension      one for each element of a list in the experiment's auxiliary data ("images")
 //   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
 //                  causes as message
-//   diagnosis      one a diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error"
+//   diagnosis      one per diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error"
 //   log            in the step that is open, between steps in the run
-// Numbers are written as host/json_value.h says.
+// Numbers are written as host/report/json_value.h says.
 #ifndef ZR_HOST_REPORT_JSONL_REPORT_H
 #define ZR_HOST_REPORT_JSONL_REPORT_H
 

@@ -123,7 +123,7 @@ class Suite {
                fmt::format("{}\n{}", placeText(failure, _run), causeText(failure, "\n")));
     }
 
-    // A measured result: what was found out in one line, and whether it failed.
+    // A measured result: its findings in one line, and whether it failed.
     void _result(std::string_view name, const std::string& finding, bool failed) {
         pugi::xml_node node = _case(name);
         if (failed) {

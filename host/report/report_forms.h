@@ -17,7 +17,7 @@ std::span<const ReportForm> reportForms();
 // The form of that name, or null.
 const ReportForm* reportFormNamed(std::string_view name);
 
-// The form that a file's ending asks for, upper case or lower; null when it is none of theirs.
+// The form that a file's ending asks for, upper case or lower; null when no form has it.
 const ReportForm* reportFormOf(const std::string& file);
 
 // The names of the forms for standard output, and the endings of all forms.

@@ -10,7 +10,7 @@
 
 namespace host {
 
-// Writes each name that was asked for as soon as it is done, a blank line between two of them.
+// Writes each name that was asked for as soon as it is done, with a blank line between two of them.
 std::shared_ptr<RunListener> openTextReport(ReportSink sink, const TextStyle& style);
 
 // One run.

@@ -152,7 +152,7 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
             plan.summary = plan.experiment.summary;
         }
     }
-    // An unknown parameter first: a misspelt one is also what leaves another without a value.
+    // An unknown parameter first: if it is a misspelled one, the right one is without a value.
     for (std::size_t i = 0; i < settings.size(); ++i) {
         if (!used[i]) {
             const std::string whose =

@@ -33,7 +33,7 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
                               const std::vector<std::string>& names,
                               const std::vector<ParameterSetting>& settings);
 
-// What a new instance of the part says of itself; nothing when the name is not registered.
+// The description that a new instance of the part gives; nothing when the name is not registered.
 std::optional<ZRDescription> describePart(const ZRLab& lab, Part part, std::string_view name);
 
 // The names that can be run: diagnostics, then experiments.

@@ -11,7 +11,7 @@ namespace host {
 
 namespace {
 
-// A run with a line per frame must not grow without bound; what is more is counted.
+// The log of a run with a line per frame must not grow without bound; further lines are counted.
 constexpr std::size_t kMostLines = 5000;
 
 std::optional<double> numberOf(const platform::Dictionary& metadata, std::string_view key) {

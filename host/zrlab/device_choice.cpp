@@ -13,8 +13,9 @@ namespace host {
 
 namespace {
 
-// The kinds that are built in. A row of code, since the linker drops from a library an object file whose
-// initializer is all that could register it. The first one takes a name without a kind.
+// The built-in kinds. They are listed here, and not registered by initializers of their own, because the
+// linker drops an object file of a library that only an initializer would need. The first one is meant by a
+// name without a kind.
 constexpr devices::Kind (*kBuiltIn[])() = {simulator::kind};
 
 // Any faster, frames could outrun their validation and results would depend on the machine's load.
@@ -36,7 +37,7 @@ double readSpeed(const std::string& text) {
 }
 
 // The length of the kind's name that `device` begins with; 0 when there is none. A file's name can have a
-// colon too, but hardly after such a word.
+// colon too; it is unlikely to have one after such a word.
 std::size_t kindLength(std::string_view device) {
     const std::size_t length = device.find_first_not_of("abcdefghijklmnopqrstuvwxyz0123456789-");
     return length != std::string_view::npos && device[length] == ':' ? length : 0;

@@ -40,7 +40,7 @@ struct Target {
     bool isFolder() const { return exists && S_ISDIR(status.st_mode); }
     bool isSpecial() const { return exists && !S_ISREG(status.st_mode); }
 
-    // What a file made in the ordinary way would get, unless there is one already.
+    // The mode that a file made in the ordinary way would get, unless there is one already.
     mode_t mode() const {
         if (exists) {
             return status.st_mode & 07777;

@@ -57,7 +57,7 @@ void Progress::_show() {
             continue;
         }
         next += period;
-        // The lock stays held: it guards nothing but the end, which has to wait for this line.
+        // The lock stays held: it guards only the end, which has to wait for this line.
         if (onTerminal) {
             terminal.status(_text());
         } else {

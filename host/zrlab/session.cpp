@@ -28,7 +28,7 @@ namespace {
 struct LogChoice {
     std::string_view name;
     platform::LogLevel minimum;
-    bool isShown;  // on standard error; reports hold the lines anyway
+    bool isShown;  // on standard error; reports hold the lines in any case
 };
 constexpr LogChoice kLogChoices[] = {{"debug", platform::LogLevel::Debug, true},
                                      {"default", platform::LogLevel::Default, true},
@@ -150,7 +150,7 @@ class Session {
         return runOnce(ZRLab::defaultLab(), plan, number, *_recorder, _reports->listeners());
     }
 
-    // A line per repetition, for those who watch.
+    // One line per repetition, when a person watches.
     void _showLine(const RunRecord& run) const {
         if (Terminal::shared().progressIsTerminal()) {
             Terminal::shared().line(textLine(

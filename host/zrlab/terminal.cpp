@@ -75,8 +75,8 @@ void Terminal::endOnInterrupt() {
     sigaddset(&signals, SIGINT);
     sigaddset(&signals, SIGTERM);
     pthread_sigmask(SIG_BLOCK, &signals, nullptr);  // inherited by every thread started from now on
-    std::signal(SIGPIPE, SIG_IGN);                  // whoever writes sees it fail
-    std::signal(SIGXFSZ, SIG_IGN);                  // so too beyond a limit of file sizes
+    std::signal(SIGPIPE, SIG_IGN);                  // the write fails instead
+    std::signal(SIGXFSZ, SIG_IGN);                  // the same beyond a limit of file sizes
     std::thread([this, signals] {
         int signal = 0;
         sigwait(&signals, &signal);
@@ -129,7 +129,7 @@ void Terminal::status(std::string_view text) {
     if (!_errorIsTerminal || (text.empty() && !_statusShown)) {
         return;
     }
-    // One column stays free, or some terminals begin another line.
+    // One column stays free, because some terminals begin another line.
     const std::string_view shown = cutTo(text, widthOf(STDERR_FILENO) - 1);
     writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(shown));
     _statusShown = !text.empty();

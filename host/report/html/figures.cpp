@@ -152,7 +152,7 @@ Band envelope(const std::string& name,
         double greatest = kNone;
         for (const auto& samples : images) {
             if (at < samples.size()) {
-                least = std::fmin(least, samples[at]);  // takes no notice of NaN
+                least = std::fmin(least, samples[at]);  // ignores NaN
                 greatest = std::fmax(greatest, samples[at]);
             }
         }
@@ -194,7 +194,7 @@ std::string imageTemperatureFigure(const platform::List& images, const std::stri
     double latest = 0;
     for (const platform::Value& value : images) {
         const ImageView image(value);
-        // A clock that falls back must not draw the line backwards.
+        // If the clock goes back, the line must not.
         latest = std::max(latest, (image.milliseconds.asDouble() - start) / 1000);
         points.push_back({latest, image.celsius.isPresent() ? image.celsius.asDouble() : kNone});
     }

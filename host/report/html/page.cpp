@@ -23,7 +23,7 @@ const RepeatRecord* repeatOf(const SessionRecord& session, std::size_t at) {
     return at < session.repeats.size() ? &session.repeats[at] : nullptr;
 }
 
-// What was run, and what came of it, in one line each.
+// What was run, and its outcome, in one line each.
 std::string subjectOf(const SessionRecord& session) {
     return session.runs.size() == 1 ? session.runs.front().plan.name
                                     : plural(session.runs.size(), "run", "runs");
@@ -71,7 +71,7 @@ std::string headHtml(const SessionRecord& session) {
                            factHtml("Bench", "zrlab " + session.version));
 }
 
-// With several runs: where to find each, and what came of it.
+// With several runs: a link to each, and its outcome.
 std::string contentsHtml(const SessionRecord& session) {
     if (session.runs.size() < 2) {
         return "";

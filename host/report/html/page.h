@@ -1,6 +1,6 @@
 // The report for people who look at a session later: one HTML page.
 //
-// The page is whole in itself: no network, no scripts. Verdict first, then for each run what failed and
+// The page is self-contained: no network, no scripts. Verdict first, then for each run what failed and
 // why, every result with its limit, the repetitions, drawings of its frames and images, parameters and
 // log. Light or dark as the reader's system is, printable, and usable by keyboard and screen reader.
 // Its size is bounded whatever the length of the runs.

@@ -26,7 +26,7 @@ struct Column {
     std::string_view style{};  // class of its cells: "number" lines them up at the right
 };
 
-// A table: a caption, a head cell a column, and rows whose first cell names the row.
+// A table: a caption, one head cell per column, and rows whose first cell names the row.
 class Table {
   public:
     Table(std::string caption, std::vector<Column> columns)
@@ -70,7 +70,7 @@ class Table {
     std::string _rows;
 };
 
-// The sections of a run, and the links to them. A section without content does not come about.
+// The sections of a run, and the links to them. A section without content is left out.
 class Sections {
   public:
     explicit Sections(const std::string& id) : _id(id) {}
@@ -261,7 +261,7 @@ std::string measurementsHtml(const RunRecord& run) {
         table.row({htmlText(one.name), numberText(one.value), htmlText(one.unit)});
     }
     const std::string html = table.html();
-    // Of a diagnostic the results say the same again.
+    // For a diagnostic the results repeat them.
     return run.results.empty()
                ? html
                : folded(plural(run.measurements.size(), "measurement", "measurements"), html);

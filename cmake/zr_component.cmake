@@ -1,5 +1,5 @@
 # How every target of the project is built: language level, warnings as errors, sanitizers, and one
-# library a folder that links exactly what the folder may include.
+# library per folder that links exactly what the folder may include.
 
 find_package(Threads REQUIRED)
 
@@ -8,6 +8,7 @@ set(CMAKE_CXX_STANDARD_REQUIRED ON)
 set(CMAKE_CXX_EXTENSIONS OFF)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
 
+# Every target of the project links this privately: none of it reaches a user of the libraries.
 add_library(zr_build_flags INTERFACE)
 target_compile_options(zr_build_flags INTERFACE -Wall -Wextra -Wpedantic -Werror)
 target_include_directories(zr_build_flags INTERFACE "${PROJECT_SOURCE_DIR}")
@@ -28,13 +29,30 @@ if(ZR_COVERAGE)
   target_link_options(zr_build_flags INTERFACE --coverage)
 endif()
 
+# zr_hide_symbols(NAME)
+# Whatever the target's code is linked into does not export it. Only the shared libraries export.
+function(zr_hide_symbols name)
+  set_target_properties(${name} PROPERTIES
+    CXX_VISIBILITY_PRESET hidden
+    VISIBILITY_INLINES_HIDDEN ON)
+endfunction()
+
 # zr_component(NAME SHARED|STATIC SOURCES file... [USES target...] [PRIVATE_USES target...])
 # A library of this folder. USES are the folders that its headers show; PRIVATE_USES stay inside.
+# A shared one is what plug-ins and device modules link: zrlab::NAME, here and in the package.
 function(zr_component name type)
   cmake_parse_arguments(PARSE_ARGV 2 arg "" "" "SOURCES;USES;PRIVATE_USES")
   add_library(${name} ${type} ${arg_SOURCES})
-  target_link_libraries(${name} PUBLIC zr_build_flags ${arg_USES} PRIVATE ${arg_PRIVATE_USES})
+  target_link_libraries(${name} PUBLIC ${arg_USES} PRIVATE zr_build_flags ${arg_PRIVATE_USES})
+  target_include_directories(${name} PUBLIC "$<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}>")
+  target_compile_features(${name} PUBLIC cxx_std_20)
   if(type STREQUAL "SHARED")
-    set_target_properties(${name} PROPERTIES OUTPUT_NAME "zr_${name}")
+    set_target_properties(${name} PROPERTIES
+      OUTPUT_NAME "zr_${name}"
+      VERSION "${PROJECT_VERSION}"
+      SOVERSION "${PROJECT_VERSION_MAJOR}")
+    add_library(zrlab::${name} ALIAS ${name})
+  else()
+    zr_hide_symbols(${name})
   endif()
 endfunction()

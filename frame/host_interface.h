@@ -4,9 +4,9 @@
 // The host drives everything. For a diagnostic it calls, on one thread and in this order:
 //   the experiment's factory, setup (when the class has it), run, teardown (when the class has it);
 //   the analysis's factory, setup (when the class has it), analyzeExperimentResult.
-// It owns every instance and every result that it receives. Failures are not thrown across this
-// boundary, but for the one exception that an image stream without a HID manager raises; only the
-// exhaustion of memory or threads may throw besides.
+// It owns every instance and every result that it receives. Failures do not cross this boundary as
+// exceptions. Two cases do: an image stream opened without a HID manager, and running out of memory or
+// threads.
 //
 // Threads. Unless a type says otherwise its objects are used by one thread at a time.
 #ifndef ZR_FRAME_HOST_INTERFACE_H
@@ -123,7 +123,7 @@ using ZRExperimentResultRef = std::shared_ptr<ZRExperimentResult>;
 // One end of a limit. Immutable and shared, an object with identity; one bound may serve as both.
 class ZRBound {
   public:
-    // An open bound leaves its own value outside of the limit, a closed one takes it in.
+    // An open bound excludes its own value; a closed bound includes it.
     ZRBound(MeasurementRef value, bool open) : _value(std::move(value)), _open(open) {}
 
     const MeasurementRef& value() const { return _value; }

@@ -28,7 +28,7 @@ bool isAlphaNumericCodePoint(char32_t codePoint) {
     return after != std::begin(kAlphanumericRanges) && codePoint <= std::prev(after)->last;
 }
 
-// Takes the first code point off `text`; nothing when its bytes are no UTF-8 (RFC 3629).
+// Takes the first code point off `text`; nothing when its bytes are not UTF-8 (RFC 3629).
 std::optional<char32_t> takeCodePoint(std::string_view& text) {
     struct Form {
         unsigned char mask, lead;

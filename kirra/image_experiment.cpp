@@ -46,6 +46,22 @@ platform::Dictionary dictionaryOf(const ZRKirraMendraImage& image) {
             {"timestampInMilliseconds", image.timestampInMilliseconds()}};
 }
 
+// Observes a run loop as long as it lives.
+class Observation {
+  public:
+    Observation(platform::RunLoop& runLoop, std::shared_ptr<platform::RunLoopObserver> observer)
+        : _runLoop(runLoop), _observer(std::move(observer)) {
+        _runLoop.addObserver(_observer, platform::kRunLoopCommonModes);
+    }
+    ~Observation() { _runLoop.removeObserver(_observer, platform::kRunLoopCommonModes); }
+    Observation(const Observation&) = delete;
+    Observation& operator=(const Observation&) = delete;
+
+  private:
+    platform::RunLoop& _runLoop;
+    const std::shared_ptr<platform::RunLoopObserver> _observer;
+};
+
 }  // namespace
 
 ZRDescription ZRKirraImageExperiment::experimentDescription() const {
@@ -96,13 +112,7 @@ ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
     if (!_stream->openWithRunLoop(runLoop, error)) {
         return nullptr;
     }
-    const auto observer = _makeExitObserver();
-    runLoop->addObserver(observer, platform::kRunLoopCommonModes);
-    const platform::RunLoopOutcome outcome =
-        runLoop->run(platform::kRunLoopDefaultMode, static_cast<double>(_timeoutInSeconds));
-    runLoop->removeObserver(observer, platform::kRunLoopCommonModes);
-
-    if (outcome == platform::RunLoopOutcome::TimedOut) {
+    if (_runObserved(*runLoop) == platform::RunLoopOutcome::TimedOut) {
         return platform::fail(error, kDomain, 6, nullptr, "Timed out after %lu seconds.",
                               _timeoutInSeconds);
     }
@@ -110,6 +120,11 @@ ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
         return platform::failWith(error, _asyncError);
     }
     return _buildResult();
+}
+
+platform::RunLoopOutcome ZRKirraImageExperiment::_runObserved(platform::RunLoop& runLoop) {
+    const Observation exit(runLoop, _makeExitObserver());
+    return runLoop.run(platform::kRunLoopDefaultMode, static_cast<double>(_timeoutInSeconds));
 }
 
 // Disconnects and closes the sensor on every way out of the run loop.

@@ -7,7 +7,7 @@
 //   "tmonDataInC"              float, degrees Celsius
 //   "timestampInMilliseconds"  unsigned 32-bit
 // It holds at least as many as asked for, and fewer when the run loop ran out of sources (the sensor
-// was unplugged, say) or somebody else stopped it. No measurements.
+// was unplugged, say) or other code stopped it. No measurements.
 //
 // Owner    Make it with std::make_shared. The host owns it; the stream and the exit observer hold it
 //          weakly.
@@ -50,7 +50,8 @@ class ZRKirraImageExperiment final : public ZRExperiment,
     //   3, 4, 5                               opening the stream failed: see ZRKirraImageStream
     //   6  "Timed out after %lu seconds."     what had arrived is dropped, a sensor's error too
     // or the sensor's own error, unchanged. Throws platform::InternalInconsistency when there is no
-    // HID manager. Whatever the outcome, the stream is closed when run() returns, once it was open.
+    // HID manager, and whatever a callback of the run loop throws. Whatever the outcome, a stream that
+    // was opened is closed when run() ends.
     ZRExperimentResultRef run(platform::ErrorSlot error) override;
 
     // Of the stream's delegate.
@@ -59,6 +60,7 @@ class ZRKirraImageExperiment final : public ZRExperiment,
 
   private:
     static bool _displayIsPowered(platform::ErrorSlot error);
+    platform::RunLoopOutcome _runObserved(platform::RunLoop& runLoop);
     std::shared_ptr<platform::RunLoopObserver> _makeExitObserver();
     ZRExperimentResultRef _buildResult() const;
 

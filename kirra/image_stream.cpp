@@ -72,10 +72,7 @@ void ZRKirraImageStream::close() {
         return;
     }
     _hidDevice->setInputReportCallback({});
-    // A run loop that has gone took its sources along.
-    if (const auto runLoop = _runLoop.lock()) {
-        _hidDevice->unscheduleFromRunLoop(runLoop, platform::kRunLoopDefaultMode);
-    }
+    _hidDevice->unscheduleFromRunLoop(_runLoop.lock(), platform::kRunLoopDefaultMode);
     _hidDevice->close(nullptr);
 }
 

@@ -45,8 +45,9 @@ class ZRKirraImageStream final : public std::enable_shared_from_this<ZRKirraImag
     bool openWithRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                          platform::ErrorSlot error);
 
-    // Removes the callback, unschedules and closes the sensor, ignoring the outcome. Does nothing
-    // before a sensor was matched. A callback in progress finishes.
+    // Removes the callback, unschedules and closes the sensor, ignoring the outcome: each call, also
+    // once the run loop is gone. Does nothing before a sensor was matched. A callback in progress
+    // finishes.
     void close();
 
     // The delegate, or null once it is gone.
@@ -56,8 +57,8 @@ class ZRKirraImageStream final : public std::enable_shared_from_this<ZRKirraImag
     }
 
   private:
-    // A report shorter than an image record is no image and is dropped; of a longer one the first 792
-    // bytes count.
+    // A report shorter than an image record is not an image and is dropped; of a longer one the first
+    // 792 bytes count.
     void _processInputReportWithID(std::int64_t reportID,
                                    std::span<const std::byte> data,
                                    const platform::ErrorRef& error);

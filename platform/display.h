@@ -13,8 +13,8 @@ namespace platform {
 using DisplayId = std::uint32_t;
 using RegistryObject = std::uint32_t;  // 0 is the empty object
 
-// The registry property that tells a display's power state, and the path in it: a dictionary that
-// holds a dictionary that holds a number, zero when the panel is off.
+// The registry property with a display's power state, and the path in it: a dictionary that holds a
+// dictionary that holds a number, zero when the panel is off.
 inline constexpr std::string_view kDisplayDebugInfo = "Quorm Debug Info";
 inline constexpr std::string_view kDisplayPowerInfo = "Quorm power info";
 inline constexpr std::string_view kDisplayPowerInfoPanel = "Quorm power info panel";

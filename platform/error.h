@@ -48,7 +48,7 @@ class Error {
 
 // The result of an operation that failed: converts to whatever the operation returns for failure.
 struct Failure {
-    // To bool and to nothing that a bool converts to: an optional number would hold a zero.
+    // To bool exactly: by way of a bool an optional number would hold a zero.
     template <std::same_as<bool> T>
     operator T() const {
         return false;

@@ -1,4 +1,4 @@
-// InternalInconsistency: raised where the system finds itself in a state that it takes for impossible.
+// InternalInconsistency: thrown when the system finds itself in a state that should be impossible.
 #ifndef ZR_PLATFORM_INTERNAL_INCONSISTENCY_H
 #define ZR_PLATFORM_INTERNAL_INCONSISTENCY_H
 

@@ -23,8 +23,9 @@ struct LogLine {
     std::string_view message;
 };
 
-// Receives lines, on the thread that logs them; several threads may be in write() at once. No lock
-// of the log is held during the call.
+// Receives lines, on the thread that logs them; several threads may be in write() at once. The log
+// holds no lock of its own during the call, but its caller may hold one (the fault experiment logs
+// under the lock of its stop): a sink must not call back into what logs.
 class LogSink {
   public:
     virtual ~LogSink() = default;

@@ -1,4 +1,5 @@
-// MediaTime: a media timestamp, a rational number of seconds with flags for what is no number.
+// MediaTime: a media timestamp, a rational number of seconds, with flags for times that are not
+// numbers.
 #ifndef ZR_PLATFORM_MEDIA_TIME_H
 #define ZR_PLATFORM_MEDIA_TIME_H
 
@@ -14,7 +15,7 @@ struct MediaTime {
     static constexpr std::uint32_t kIndefinite = 1U << 4;
 
     std::int64_t value = 0;
-    std::int32_t timescale = 1;  // units of `value` a second
+    std::int32_t timescale = 1;  // units of `value` per second
     std::uint32_t flags = kValid;
     std::int64_t epoch = 0;  // which time line; seconds() ignores it
 

@@ -1,7 +1,7 @@
 // A mutex whose uses clang's thread-safety analysis checks, its scoped lock and its condition.
 //
 // Fields say which mutex guards them with ZR_GUARDED_BY; functions that need it held with
-// ZR_REQUIRES. Under other compilers the annotations are nothing.
+// ZR_REQUIRES. Under other compilers the annotations expand to nothing.
 #ifndef ZR_PLATFORM_MUTEX_H
 #define ZR_PLATFORM_MUTEX_H
 

@@ -8,6 +8,7 @@
 //   floating point to an integer                  truncated toward zero, saturated at the target's
 //                                                 limits; NaN gives 0
 //   anything to double                            the nearest double
+// A float and a double keep their bits, those of a NaN included.
 #ifndef ZR_PLATFORM_NUMBER_H
 #define ZR_PLATFORM_NUMBER_H
 
@@ -43,7 +44,7 @@ class Number {
     // An absent number.
     constexpr Number() noexcept = default;
 
-    // Boxes `value` and keeps its kind. Implicit: a plain value serves wherever a number is asked.
+    // Boxes `value` and keeps its kind. Implicit: a plain value serves wherever a number is expected.
     template <Arithmetic T>
     constexpr Number(T value) noexcept : _bits(_bitsOf(value)), _kind(kindOf<T>()) {}
 
@@ -55,22 +56,32 @@ class Number {
     // The value as an integer of type T, converted as the table above says.
     template <std::integral T>
     requires(!std::same_as<T, bool>) constexpr T as() const noexcept {
-        return isFloating() ? _saturated<T>(std::bit_cast<double>(_bits)) : static_cast<T>(_bits);
+        return isFloating() ? _saturated<T>(asDouble()) : static_cast<T>(_bits);
     }
 
     constexpr double asDouble() const noexcept {
-        if (isFloating()) {
+        if (_kind == Kind::Double) {
             return std::bit_cast<double>(_bits);
+        }
+        if (_kind == Kind::Float) {
+            return static_cast<double>(asFloat());
         }
         return isSigned() ? static_cast<double>(static_cast<std::int64_t>(_bits))
                           : static_cast<double>(_bits);
     }
 
+    // The value that was boxed as a float, bit by bit. For a number of another kind the nearest float.
+    constexpr float asFloat() const noexcept {
+        return _kind == Kind::Float ? std::bit_cast<float>(static_cast<std::uint32_t>(_bits))
+                                    : static_cast<float>(asDouble());
+    }
+
     // Truth value: any present number other than zero, NaN included.
     constexpr bool isTrue() const noexcept { return isFloating() ? asDouble() != 0.0 : _bits != 0; }
 
-    // Plain decimal for integers, 1 and 0 for booleans, the shortest text that reads back to the
-    // same value for floating point, "(null)" when absent.
+    // Plain decimal for integers, 1 and 0 for booleans, "(null)" when absent. For floating point:
+    // plain decimal without a fraction when the value is integral and at most 2^53 in magnitude, else
+    // the shortest text that reads back to the same value; "nan" for every NaN, "inf" and "-inf".
     std::string text() const;
 
     // Same kind and same value; a NaN equals nothing, absent equals absent.
@@ -95,7 +106,8 @@ class Number {
     template <class T>
     static constexpr std::uint64_t _bitsOf(T value) noexcept {
         if constexpr (std::floating_point<T>) {
-            return std::bit_cast<std::uint64_t>(static_cast<double>(value));
+            using Bits = std::conditional_t<sizeof(T) == 4, std::uint32_t, std::uint64_t>;
+            return std::bit_cast<Bits>(value);
         } else {
             return static_cast<std::uint64_t>(value);
         }
@@ -117,8 +129,7 @@ class Number {
         return static_cast<T>(value);
     }
 
-    // Integers: two's complement, extended to 64 bits. Floating point: the bits of a double, which
-    // holds every float exactly.
+    // Integers: two's complement, extended to 64 bits. Floating point: the value's own bits.
     std::uint64_t _bits = 0;
     Kind _kind = Kind::Absent;
 };

@@ -1,14 +1,15 @@
 #include "platform/run_loop.h"
 
 #include <algorithm>
+#include <exception>
 #include <limits>
 #include <optional>
+#include <stdexcept>
 #include <string>
 #include <utility>
 
 #include "platform/deadline.h"
 #include "platform/mutex.h"
-#include "platform/number.h"
 
 namespace platform {
 
@@ -21,14 +22,10 @@ std::string_view memberOf(std::string_view mode) {
     return mode == kRunLoopCommonModes ? kRunLoopDefaultMode : mode;
 }
 
-TimePoint deadlineAfterSeconds(double seconds) {
-    return deadlineAfter(std::chrono::nanoseconds(Number(seconds * 1e9).as<std::int64_t>()));
-}
-
 // Order, then when it was added: rising in each list, and never the same twice in a loop.
 using Place = std::pair<int, std::uint64_t>;
 
-// Something added to a mode.
+// A source or an observer in a mode.
 template <class T>
 struct Entry {
     Place place;
@@ -39,9 +36,9 @@ template <class T>
 using Entries = std::vector<Entry<T>>;
 
 // How far a walk over a list has come. Each step looks at the list anew: what a callback removes is
-// not met any more, and what it adds waits for the next walk.
+// skipped, and what it adds waits for the next walk.
 struct Walk {
-    std::uint64_t end;  // the first place in time that came too late
+    std::uint64_t end;  // what was added from here on waits
     Place last{std::numeric_limits<int>::min(), 0};
 };
 
@@ -80,7 +77,7 @@ class RunLoop::State {
     Entries<RunLoopObserver> observers ZR_GUARDED_BY(mutex);
     Run* innermost ZR_GUARDED_BY(mutex) = nullptr;
 
-    // Whether something was added: not when it was there.
+    // Whether it was added; false when it was there already.
     template <class T>
     bool add(Entries<T>& entries,
              const std::shared_ptr<T>& object,
@@ -96,7 +93,7 @@ class RunLoop::State {
         return true;
     }
 
-    // Whether something was removed: not when it was not there.
+    // Whether it was removed; false when it was not there.
     template <class T>
     bool remove(Entries<T>& entries, const std::shared_ptr<T>& object, std::string_view mode)
         ZR_REQUIRES(mutex) {
@@ -108,11 +105,27 @@ class RunLoop::State {
         return true;
     }
 
-    void tell(const Run& run, RunLoopActivity activity) {
+    void notify(const Run& run, RunLoopActivity activity) {
         Walk walk = _startWalk();
         while (const auto observer = _nextObserver(walk, run, activity)) {
             observer->callback(activity);
         }
+    }
+
+    // Notifies every exit observer, whatever they throw. Returns the first exception of the run:
+    // `thrown` if there was one before, else that of an observer; null when there is none.
+    std::exception_ptr notifyExit(const Run& run, std::exception_ptr thrown) {
+        Walk walk = _startWalk();
+        while (const auto observer = _nextObserver(walk, run, RunLoopExit)) {
+            try {
+                observer->callback(RunLoopExit);
+            } catch (...) {
+                if (thrown == nullptr) {
+                    thrown = std::current_exception();
+                }
+            }
+        }
+        return thrown;
     }
 
     RunLoopOutcome serve(const Run& run, TimePoint limit) {
@@ -120,7 +133,7 @@ class RunLoop::State {
             if (const auto outcome = _outcome(run)) {
                 return *outcome;
             }
-            tell(run, RunLoopBeforeSources);
+            notify(run, RunLoopBeforeSources);
             Walk turn = _startWalk();
             while (const auto source = _takeReady(turn, run)) {
                 source->_callback();
@@ -132,9 +145,9 @@ class RunLoop::State {
                 return RunLoopOutcome::TimedOut;
             }
             if (_mustWait(run)) {
-                tell(run, RunLoopBeforeWaiting);
+                notify(run, RunLoopBeforeWaiting);
                 _wait(run, limit);
-                tell(run, RunLoopAfterWaiting);
+                notify(run, RunLoopAfterWaiting);
             }
         }
     }
@@ -246,12 +259,13 @@ RunLoopSource::~RunLoopSource() = default;
 void RunLoopSource::signal() {
     // An exchange, so that the callback sees what each signaller did before its signal.
     if (_signalled.exchange(true)) {
-        return;  // whoever set it wakes the loops
+        return;  // the call that set it wakes the loops
     }
     const MutexLock lock(_wakers->mutex);
     for (const auto& loop : _wakers->loops) {
-        {  // a loop that has looked at the flag already and does not wait yet holds the mutex
-            const MutexLock behindTheLook(loop->mutex);
+        {  // The loop holds the mutex between checking the flag and waiting; passing through it here
+            // prevents a lost wake-up.
+            const MutexLock passThrough(loop->mutex);
         }
         loop->changed.notifyAll();
     }
@@ -259,9 +273,19 @@ void RunLoopSource::signal() {
 
 namespace {
 
+// Whether the thread's end has begun to destroy its loop. It has no destructor, so it can be read
+// after that, too.
+thread_local bool threadIsEnding = false;
+
+struct ThreadsLoop {
+    ~ThreadsLoop() { threadIsEnding = true; }  // before the loop goes, and what it owns
+    std::shared_ptr<RunLoop> loop;
+};
+
+// Must not be used once the thread is ending.
 std::shared_ptr<RunLoop>& loopOfThisThread() {
-    static thread_local std::shared_ptr<RunLoop> loop;
-    return loop;
+    static thread_local ThreadsLoop storage;
+    return storage.loop;
 }
 
 }  // namespace
@@ -283,15 +307,18 @@ RunLoop::~RunLoop() {
 }
 
 std::shared_ptr<RunLoop> RunLoop::forThisThread() {
-    std::shared_ptr<RunLoop>& loop = loopOfThisThread();
-    if (loop == nullptr) {
-        loop.reset(new RunLoop);
+    if (auto loop = current()) {
+        return loop;
     }
-    return loop;
+    std::shared_ptr<RunLoop> made(new RunLoop);
+    if (!threadIsEnding) {
+        loopOfThisThread() = made;
+    }
+    return made;
 }
 
 std::shared_ptr<RunLoop> RunLoop::current() {
-    return loopOfThisThread();
+    return threadIsEnding ? nullptr : loopOfThisThread();
 }
 
 void RunLoop::addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode) {
@@ -326,17 +353,23 @@ void RunLoop::removeObserver(const std::shared_ptr<RunLoopObserver>& observer,
 }
 
 RunLoopOutcome RunLoop::run(std::string_view mode, double seconds) {
-    const TimePoint limit = deadlineAfterSeconds(seconds);
+    if (current().get() != this) {
+        throw std::logic_error("a run loop can only be run on its own thread");
+    }
+    const TimePoint limit = deadlineAfter(std::chrono::duration<double>(seconds));
     const State::Run run(*_state, mode);
-    RunLoopOutcome outcome;
+    RunLoopOutcome outcome = RunLoopOutcome::Finished;
+    std::exception_ptr thrown;
     try {
-        _state->tell(run, RunLoopEntry);
+        _state->notify(run, RunLoopEntry);
         outcome = _state->serve(run, limit);
     } catch (...) {
-        _state->tell(run, RunLoopExit);
-        throw;
+        thrown = std::current_exception();
     }
-    _state->tell(run, RunLoopExit);
+    thrown = _state->notifyExit(run, std::move(thrown));
+    if (thrown != nullptr) {
+        std::rethrow_exception(thrown);
+    }
     return outcome;
 }
 

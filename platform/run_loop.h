@@ -9,8 +9,9 @@
 // Threads  forThisThread(), current(), run(): the loop's own thread. Everything else: any thread.
 //          Callbacks and observers run on the loop's thread, with no lock held; they may add and
 //          remove sources and observers, signal, stop, and run the loop again (a nested run).
-// Failure  An exception that leaves a callback or an observer leaves run(), after the exit
-//          observers were told.
+// Failure  An exception that leaves a callback or an observer ends the run. Every exit observer is
+//          notified all the same, also when one of them throws; then the run's first exception leaves
+//          run().
 #ifndef ZR_PLATFORM_RUN_LOOP_H
 #define ZR_PLATFORM_RUN_LOOP_H
 
@@ -45,7 +46,8 @@ enum class RunLoopOutcome {
 
 class RunLoop;
 
-// A source: a callback that the loop runs once for a signal. Signals given before it runs are one.
+// A source: a callback that the loop runs once per signal. Signals given before it runs are merged
+// into one.
 class RunLoopSource {
   public:
     explicit RunLoopSource(std::function<void()> callback);
@@ -53,9 +55,9 @@ class RunLoopSource {
     RunLoopSource(const RunLoopSource&) = delete;
     RunLoopSource& operator=(const RunLoopSource&) = delete;
 
-    // Asks the loops that the source was added to to run it; the first to come does. Kept until a run
-    // serves it, also when the source was not added yet. What the caller did before is visible to the
-    // callback.
+    // Wakes every loop the source was added to; the first to get there runs it. The signal is kept
+    // until a run serves it, also when the source was not added yet. What the caller did before is
+    // visible to the callback.
     void signal();
 
   private:
@@ -67,8 +69,8 @@ class RunLoopSource {
     std::unique_ptr<Wakers> _wakers;
 };
 
-// An observer: told every activity of its mask, each time. Observers of one activity are told in
-// rising `order`, equal ones as they were added. Constant while it is added to a loop.
+// An observer: called at every activity of its mask. Observers of one activity are called in rising
+// `order`, those of equal order as they were added. Constant while it is added to a loop.
 struct RunLoopObserver {
     std::uint32_t activities;
     int order;
@@ -77,17 +79,20 @@ struct RunLoopObserver {
 
 class RunLoop {
   public:
-    // The calling thread's loop; made by the first call on a thread.
+    // The calling thread's loop; made by the first call on a thread. From when the thread's end begins
+    // to destroy its loop (a destructor can still ask), each call makes another loop, which belongs to
+    // its caller alone and cannot be run.
     static std::shared_ptr<RunLoop> forThisThread();
-    // The calling thread's loop, or null when the thread never asked for one.
+    // The calling thread's loop; null when the thread never asked for one, and from when its end
+    // begins to destroy the loop.
     static std::shared_ptr<RunLoop> current();
 
     ~RunLoop();
     RunLoop(const RunLoop&) = delete;
     RunLoop& operator=(const RunLoop&) = delete;
 
-    // Adding twice in one mode, or removing what is not there, does nothing. A source that is removed
-    // is not run any more; a callback in progress finishes.
+    // Adding twice in one mode, or removing what is not there, does nothing. A removed source is no
+    // longer run; a callback in progress finishes.
     void addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode);
     void removeSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode);
     void addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
@@ -99,12 +104,13 @@ class RunLoop {
     // when the mode has no source; after a turn also when the time has passed. So sources that are
     // ready when the run begins get one turn even with a limit of zero.
     // A negative limit or NaN counts as zero; one beyond the clock's end means no limit.
-    // Observers are told the entry and the exit of every run, however it ends; between them before
-    // each turn, and before and after each wait.
+    // Observers are notified at the entry and the exit of every run, however it ends; between them
+    // before each turn, and before and after each wait.
+    // Throws std::logic_error on any thread but the loop's own; nothing is run or notified then.
     RunLoopOutcome run(std::string_view mode, double seconds);
 
     // Ends the innermost run in progress as soon as the callback in progress returns; no further
-    // source is run before. Without a run in progress it does nothing.
+    // source is run. Without a run in progress it does nothing.
     void stop();
 
   private:

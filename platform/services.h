@@ -1,8 +1,8 @@
 // The set of operating-system and device services that the process works with.
 //
-// Whoever starts the process installs it (the bench: its simulated device; a product: the real
-// ones), before any experiment runs. The operations of the support library's classes find their
-// facility here; a facility that is null counts as not available.
+// The program installs it before any experiment runs (the bench: its simulated device; a product: the
+// real ones). The operations of the support library's classes find their facility here; a facility
+// that is null counts as not available.
 #ifndef ZR_PLATFORM_SERVICES_H
 #define ZR_PLATFORM_SERVICES_H
 

@@ -54,7 +54,7 @@ class StringMap {
     auto begin() const { return _entries.begin(); }
     auto end() const { return _entries.end(); }
 
-    // Written out: clang looks into T for a defaulted one, and T may be incomplete here.
+    // Not defaulted: clang would instantiate T's comparison here, and T may be incomplete.
     friend bool operator==(const StringMap& a, const StringMap& b) {
         return a._entries == b._entries;
     }

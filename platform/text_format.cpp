@@ -1,24 +1,22 @@
 #include "platform/text_format.h"
 
 #include <charconv>
+#include <cmath>
 
 namespace platform::detail {
 
 void appendNumber(std::string& out, const Number& number, Conversion conversion) {
-    if (conversion != Conversion::Double) {
+    const double value = number.asDouble();
+    if (conversion != Conversion::Double || std::isnan(value)) {
         out += number.text();
         return;
     }
     constexpr int kDecimals = 6;
     char buffer[352];  // the largest double has 309 digits before the decimal point
     // Not printf: its decimal point is the process's locale's.
-    const auto [end, problem] = std::to_chars(buffer, buffer + sizeof buffer, number.asDouble(),
-                                              std::chars_format::fixed, kDecimals);
-    std::string_view text(buffer, static_cast<std::size_t>(end - buffer));
-    if (text.starts_with("-nan")) {
-        text.remove_prefix(1);  // a NaN has no sign worth telling
-    }
-    out += text;
+    out.append(buffer, std::to_chars(buffer, buffer + sizeof buffer, value,
+                                     std::chars_format::fixed, kDecimals)
+                           .ptr);
 }
 
 void appendFormatted(std::string& out, std::string_view text, const Argument* arguments) {

@@ -1,9 +1,10 @@
 // Message formatting over the system's own format texts.
 //
-//   %@    the text form of an object: a string, a number (boxed or plain), anything with text()
+//   %@    the text form of an object: a string, a number (boxed or plain), anything with text(); a
+//         null C string prints as (null)
 //   %d    a signed integer in decimal
 //   %lu   an unsigned integer in decimal
-//   %lf   a double with six digits after the decimal point; nan, inf and -inf for what is no number
+//   %lf   a double with six digits after the decimal point; nan, inf or -inf when it is not finite
 //   %%    a per cent sign
 //
 // A text is checked against its arguments when it is compiled: a placeholder without an argument, an
@@ -105,6 +106,9 @@ Argument makeArgument(const T& object) {
                 const T& value = *static_cast<const T*>(erased);
                 if constexpr (std::is_arithmetic_v<T>) {
                     appendNumber(out, value, conversion);
+                } else if constexpr (std::convertible_to<T, const char*> && !std::is_array_v<T>) {
+                    const char* text = value;
+                    out += text != nullptr ? text : "(null)";
                 } else if constexpr (std::convertible_to<const T&, std::string_view>) {
                     out += std::string_view(value);
                 } else {

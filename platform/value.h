@@ -6,7 +6,7 @@
 // MutableList and MutableDictionary; turning one into a List or a Dictionary moves its entries.
 //
 // Absence. Asking a Value for something that it does not hold yields null; looking up a key that is
-// missing, or any key of a Value that is no dictionary, yields a Value that holds nothing. So a path
+// missing, or any key of a Value that is not a dictionary, yields a Value that holds nothing. So a path
 // of look-ups needs no checks on the way.
 #ifndef ZR_PLATFORM_VALUE_H
 #define ZR_PLATFORM_VALUE_H
@@ -49,7 +49,8 @@ class List {
     std::shared_ptr<const MutableList> _entries;
 };
 
-// An immutable, shared map from strings to values, in byte order of the keys.
+// An immutable, shared map from strings to values. Iterates over pairs of key and value in byte order
+// of the keys.
 class Dictionary {
   public:
     Dictionary();
@@ -58,12 +59,14 @@ class Dictionary {
 
     // The value under `key`; one that holds nothing when the key is missing.
     const Value& operator[](std::string_view key) const;
-    // The number under `key`; absent when the key is missing or its value is no number.
+    // The number under `key`; absent when the key is missing or its value is not a number.
     Number number(std::string_view key) const;
     bool contains(std::string_view key) const;
 
     std::size_t size() const { return entries().size(); }
     bool empty() const { return entries().empty(); }
+    auto begin() const { return entries().begin(); }
+    auto end() const { return entries().end(); }
     const MutableDictionary& entries() const { return *_entries; }
 
     friend bool operator==(const Dictionary& a, const Dictionary& b);

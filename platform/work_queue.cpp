@@ -1,6 +1,8 @@
 #include "platform/work_queue.h"
 
+#include <algorithm>
 #include <deque>
+#include <exception>
 #include <map>
 #include <optional>
 #include <thread>
@@ -23,21 +25,26 @@ constexpr std::size_t kThreadNameLength = 15;
 constexpr int kUserInteractiveNice = -5;
 constexpr int kBackgroundNice = 10;
 
-// Runs `body` on a thread of its own that nobody joins. An exception that leaves it ends the process
+// How long a queue with due items waits for another attempt to start its thread.
+constexpr std::chrono::milliseconds kRetryDelay{10};
+
+// Runs `body` on a thread of its own that is not joined. An exception that leaves it ends the process
 // where it was thrown, so that the debugger shows the culprit.
 template <class Body>
 void startThread(Body body) {
     std::thread([body = std::move(body)]() noexcept { body(); }).detach();
 }
 
+// Linux keeps 15 characters: the last ones, because labels that belong together begin alike.
 void nameThisThread(const std::string& name) {
-    pthread_setname_np(pthread_self(), name.substr(0, kThreadNameLength).c_str());
+    const std::size_t kept = std::min(name.size(), kThreadNameLength);
+    pthread_setname_np(pthread_self(), name.c_str() + name.size() - kept);
 }
 
 }  // namespace
 
-// What the owner, the thread and the delayed items share. It outlives the owner, and its thread ends
-// by itself, so that whoever drops the last reference never waits.
+// What the owner, the holds, the thread and the delayed items share. It outlives the owner, and its
+// thread ends by itself, so that dropping the last reference never waits.
 class WorkQueue::State : public std::enable_shared_from_this<State> {
   public:
     State(std::string name, Priority priorityClass)
@@ -49,27 +56,56 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     void push(Item item) {
         {
             const MutexLock lock(_mutex);
-            if (!_hasThread) {  // first: should there be no thread to be had, nothing was queued
-                startThread([self = shared_from_this()] { self->_serve(); });
-                _hasThread = true;
-            }
+            _needThread();  // first: if none can be started, nothing was queued
             _items.push_back(std::move(item));
         }
         _changed.notifyAll();
     }
 
-    void ownerHasGone() {
+    // Queues a delayed item whose time has come, or nothing when the item is empty. False when no
+    // thread can be started for what is queued: it stays queued until a later call succeeds.
+    bool pushDue(Item item) {
         {
             const MutexLock lock(_mutex);
-            _hasOwner = false;
+            if (item != nullptr) {
+                _items.push_back(std::move(item));
+            }
+            try {
+                if (!_items.empty()) {
+                    _needThread();
+                }
+            } catch (const std::exception&) {
+                return false;
+            }
+        }
+        _changed.notifyAll();
+        return true;
+    }
+
+    void hold() {
+        const MutexLock lock(_mutex);
+        _needThread();
+        ++_holds;
+    }
+    void release() {
+        {
+            const MutexLock lock(_mutex);
+            --_holds;
         }
         _changed.notifyAll();
     }
 
   private:
+    void _needThread() ZR_REQUIRES(_mutex) {
+        if (!_hasThread) {
+            startThread([self = shared_from_this()] { self->_serve(); });
+            _hasThread = true;
+        }
+    }
+
     void _serve() {
         nameThisThread(label);
-        // Refused without the right to raise a priority; the thread then keeps the one it has.
+        // Refused without the privilege to raise priorities; the thread then keeps the one it has.
         setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()),
                     priority == Priority::Background ? kBackgroundNice : kUserInteractiveNice);
         while (std::optional<Item> item = _next()) {
@@ -77,11 +113,12 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
         }
     }
 
-    // The next item, as soon as there is one; nothing once none can come from the owner any more.
+    // The next item, as soon as there is one; nothing when the thread is to end. That is decided
+    // under the lock that saw the queue empty: an item that comes later starts another thread.
     std::optional<Item> _next() {
         const MutexLock lock(_mutex);
         while (_items.empty()) {
-            if (!_hasOwner) {
+            if (_holds == 0) {
                 _hasThread = false;
                 return std::nullopt;
             }
@@ -96,7 +133,7 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     Condition _changed;
     std::deque<Item> _items ZR_GUARDED_BY(_mutex);
     bool _hasThread ZR_GUARDED_BY(_mutex) = false;
-    bool _hasOwner ZR_GUARDED_BY(_mutex) = true;
+    std::size_t _holds ZR_GUARDED_BY(_mutex) = 0;
 };
 
 // Where the delayed items of all queues wait.
@@ -110,55 +147,92 @@ class WorkQueue::Timer {
 
     void add(Clock::time_point due, std::shared_ptr<State> queue, Item item) {
         const MutexLock lock(_mutex);
-        if (!_hasThread) {
-            startThread([this] { _serve(); });
-            _hasThread = true;
-        }
+        _needThread();
         const auto added = _pending.emplace(due, Delayed{std::move(queue), std::move(item)});
         if (added == _pending.begin()) {
             _changed.notifyAll();
         }
     }
 
+    void hold() {
+        const MutexLock lock(_mutex);
+        _needThread();
+        ++_holds;
+    }
+    void release() {
+        const MutexLock lock(_mutex);
+        --_holds;
+        _changed.notifyAll();
+    }
+
   private:
     struct Delayed {
         std::shared_ptr<State> queue;
-        Item item;
+        Item item;  // empty: was queued already, but no thread could be started for it
     };
     using Pending = std::multimap<Clock::time_point, Delayed>;  // of equal times, the first added
+
+    void _needThread() ZR_REQUIRES(_mutex) {
+        if (!_hasThread) {
+            startThread([this] { _serve(); });
+            _hasThread = true;
+        }
+    }
 
     void _serve() {
         nameThisThread("delayed items");
         while (Pending::node_type due = _next()) {
-            due.mapped().queue->push(std::move(due.mapped().item));
+            Delayed& delayed = due.mapped();
+            if (!delayed.queue->pushDue(std::exchange(delayed.item, nullptr))) {
+                due.key() = Clock::now() + kRetryDelay;
+                const MutexLock lock(_mutex);
+                _pending.insert(std::move(due));
+            }
         }
     }
 
-    // The next item, as soon as it is due; nothing when none is pending.
+    // The next item, as soon as it is due; nothing when the thread is to end.
     Pending::node_type _next() {
         const MutexLock lock(_mutex);
-        while (!_pending.empty() && _pending.begin()->first > Clock::now()) {
-            const Clock::time_point due = _pending.begin()->first;
-            _changed.waitUntil(_mutex, due);
+        while (true) {
+            if (_pending.empty()) {
+                if (_holds == 0) {
+                    _hasThread = false;
+                    return {};
+                }
+                _changed.wait(_mutex);
+            } else if (const auto due = _pending.begin()->first; due > Clock::now()) {
+                _changed.waitUntil(_mutex, due);
+            } else {
+                return _pending.extract(_pending.begin());
+            }
         }
-        if (_pending.empty()) {
-            _hasThread = false;
-            return {};
-        }
-        return _pending.extract(_pending.begin());
     }
 
     Mutex _mutex;
     Condition _changed;
     Pending _pending ZR_GUARDED_BY(_mutex);
     bool _hasThread ZR_GUARDED_BY(_mutex) = false;
+    std::size_t _holds ZR_GUARDED_BY(_mutex) = 0;
 };
+
+WorkQueue::Hold::Hold(const WorkQueue& queue) : _state(queue._state) {
+    _state->hold();
+    try {
+        Timer::shared().hold();
+    } catch (...) {
+        _state->release();
+        throw;
+    }
+}
+WorkQueue::Hold::~Hold() {
+    Timer::shared().release();
+    _state->release();
+}
 
 WorkQueue::WorkQueue(std::string label, Priority priority)
     : _state(std::make_shared<State>(std::move(label), priority)) {}
-WorkQueue::~WorkQueue() {
-    _state->ownerHasGone();
-}
+WorkQueue::~WorkQueue() = default;
 
 const std::string& WorkQueue::label() const {
     return _state->label;
@@ -171,11 +245,11 @@ void WorkQueue::async(Item item) {
     _state->push(std::move(item));
 }
 
-void WorkQueue::after(std::chrono::nanoseconds delay, Item item) {
-    if (delay <= std::chrono::nanoseconds::zero()) {
-        async(std::move(item));
-    } else {
+void WorkQueue::after(std::chrono::duration<double> delay, Item item) {
+    if (delay.count() > 0) {
         Timer::shared().add(deadlineAfter(delay), _state, std::move(item));
+    } else {
+        async(std::move(item));
     }
 }
 

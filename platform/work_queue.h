@@ -3,15 +3,18 @@
 // Runs its items one at a time, in the order in which they were queued, on a thread of its own; what
 // one item did is visible to the next. A delayed item joins the end of the queue when its time comes.
 //
-// Owner    Whoever made it. Dropping the queue drops nothing that was queued: items already there
-//          and delayed items still run. The queue may be dropped on any thread, also inside one of
-//          its own items; nothing waits then.
+// Owner    Its maker. Dropping the queue drops nothing that was queued: items already there and
+//          delayed items still run. The queue may be dropped on any thread, also inside one of its
+//          own items; nothing waits then.
 // Threads  Every operation may be called on any thread, and never waits for a running item.
-// Cost     A queue without items has no thread. The thread starts with the first item and ends when
-//          the queue is empty and nobody holds it. All delayed items of the process wait on one
-//          further thread, which exists while there are any.
-// Failure  Queueing throws std::system_error when a thread is needed and there is none to be had; the
-//          item is then dropped. For a delayed item whose time has come that ends the process.
+// Cost     The queue's thread exists while there are items or the queue is held (see Hold). An item
+//          for a queue that is not held and has no items costs the start of a thread. The delayed
+//          items of all queues wait on one further thread, which exists while there are any or a
+//          queue is held.
+// Failure  Queueing and holding throw std::system_error when they need a thread and none can be
+//          started; the item is then dropped. On a held queue that does not happen. A delayed item
+//          whose time has come and for which no thread can be started stays queued, and the start is
+//          tried again until it succeeds.
 // Exit     Neither a queued nor a delayed item keeps the process from exiting.
 #ifndef ZR_PLATFORM_WORK_QUEUE_H
 #define ZR_PLATFORM_WORK_QUEUE_H
@@ -24,17 +27,35 @@
 namespace platform {
 
 class WorkQueue {
+  private:
+    class State;
+    class Timer;
+
   public:
     // How eagerly the operating system should run the thread: at nice -5, or at nice 10. Without the
-    // right to raise a priority UserInteractive stays at that of the thread which queued the item
-    // that started it.
+    // privilege to raise priorities, a UserInteractive queue keeps the niceness of the thread that
+    // started its thread by holding it or by queueing an item.
     enum class Priority { UserInteractive, Background };
 
     // An item owns what it captured; that is released right after it ran, on the queue's thread. An
     // exception that leaves an item ends the process.
     using Item = std::function<void()>;
 
-    // `label` names the thread for debuggers, cut to the 15 characters that Linux keeps.
+    // Holds a queue as long as it lives: the queue's thread and that of the delayed items exist, so
+    // that queueing needs no thread. Any number may hold one queue. A Hold may end on any thread, also
+    // inside an item of the queue, and after the queue.
+    class Hold {
+      public:
+        explicit Hold(const WorkQueue& queue);
+        ~Hold();
+        Hold(const Hold&) = delete;
+        Hold& operator=(const Hold&) = delete;
+
+      private:
+        std::shared_ptr<State> _state;
+    };
+
+    // The last 15 characters of `label`, as many as Linux keeps, name the thread for debuggers.
     WorkQueue(std::string label, Priority priority);
     ~WorkQueue();
     WorkQueue(const WorkQueue&) = delete;
@@ -45,13 +66,11 @@ class WorkQueue {
 
     void async(Item item);
 
-    // Queues `item` once `delay` has passed; at once when the delay is zero or negative, never when
-    // now plus the delay lies beyond the clock's end.
-    void after(std::chrono::nanoseconds delay, Item item);
+    // Queues `item` once `delay` has passed; at once when the delay is zero, negative or NaN, never
+    // when now plus the delay lies beyond the clock's end.
+    void after(std::chrono::duration<double> delay, Item item);
 
   private:
-    class State;
-    class Timer;
     std::shared_ptr<State> _state;
 };
 

@@ -1,6 +1,6 @@
 #!/usr/bin/python3
-"""Opens HTML reports in headless Chromium and checks what a reader, a screen reader and a machine without
-a network would meet. Names the page and the problem; exit status 1 when there is one.
+"""Opens HTML reports in headless Chromium and checks what matters to a reader, to a screen reader and on a
+machine without a network. Prints the page and the problem; exit status 1 when there is one.
 
 check_page.py [--screenshot FOLDER] [--must-contain TEXT]... PAGE.html...
 

@@ -1,6 +1,7 @@
 #!/usr/bin/python3
 """Checks test-and-validation output: every line against the Open Compute Project's JSON schemas, and the
-whole against what the schemas cannot say. Names file, line and reason; exit status 1 when there is one.
+whole against the rules that schemas cannot express. Prints file, line and reason of the first problem of each
+file; exit status 1 when there is one.
 
 validate_jsonl.py FILE...
 """
@@ -33,7 +34,7 @@ def line_checker():
 
 
 def reason_of(errors):
-    """The most telling of the reasons: the one that went furthest into the artifact; or None."""
+    """The most specific of the reasons: the one that went furthest into the artifact; or None."""
     reasons = [reason for error in errors for reason in (error, reason_of(error.context)) if reason]
     return max(reasons, key=lambda reason: len(reason.absolute_path), default=None)
 

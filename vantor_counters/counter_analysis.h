@@ -13,7 +13,7 @@ class ZRVantorMeterixAnalysis final : public ZRAnalysis {
   public:
     ZRDescription analysisDescription() const override;
 
-    // One measured result a name of kVantorCounterChannelNames, named after the channel, with the
+    // One measured result per name of kVantorCounterChannelNames, named after the channel, with the
     // experiment's own measurement and the limit "Max Reports" from 0 to 0 events. Measurements of
     // other channels are ignored.
     ZRAnalysisResultRef analyzeExperimentResult(const ZRExperimentResult& result,

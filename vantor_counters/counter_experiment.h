@@ -1,5 +1,5 @@
 // The counter-report experiment: the image signal processor's event counters as they stand now, one
-// measurement a channel in the unit `events`. It streams nothing and changes nothing on the device.
+// measurement per channel in the unit `events`. It streams nothing and changes nothing on the device.
 //
 // Threads  Everything runs on the calling thread; there is no waiting.
 // Errors   All in ZRMeterixErrorDomain with code 100. The underlying error is the last one that the

@@ -16,7 +16,7 @@ class ZRVantorFaultAnalysis final : public ZRAnalysis, public ZRSetup {
   public:
     ZRDescription analysisDescription() const override;
 
-    // Stores the parameter "frameCount", absent when it is missing or no number. Checks nothing and
+    // Stores the parameter "frameCount", absent when it is missing or not a number. Checks nothing and
     // always succeeds; the error slot is left alone.
     bool setupWithParameters(const platform::Dictionary& parameters,
                              ZRDiagnosticHost* host,

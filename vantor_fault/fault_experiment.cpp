@@ -1,4 +1,10 @@
+// The experiment as the host drives it: setup, the whole of a run, teardown.
 #include "vantor_fault/fault_experiment.h"
+
+#include <chrono>
+
+#include "frame/shared_helpers.h"
+#include "vantor_counters/counter_report.h"
 
 namespace {
 
@@ -47,6 +53,49 @@ bool ZRVantorFaultExperiment::setupWithParameters(const platform::Dictionary& pa
     }
     _timeout = timeout;
     return true;
+}
+
+ZRExperimentResultRef ZRVantorFaultExperiment::run(platform::ErrorSlot error) {
+    const auto self = shared_from_this();  // what the time-out will own
+    platform::ErrorRef reported;
+    if (!_selectStream(reported, error) || !_configureStream(reported, error)) {
+        return nullptr;
+    }
+
+    // Asking an absent report or snapshot for anything yields absence: one check at the end suffices.
+    const WLMeterix report =
+        WLMeterix::reportWithOnlySimpleChannels(&reported).reportByFilteringChannels(
+            isISPEventSubgroup);
+    const WLMeterixSnapshot baseline = report.snapshot(&reported);
+    if (!baseline) {
+        return platform::fail(error, ZRMeterixErrorDomain, 100, reported,
+                              "Cannot get Meterix before streaming.");
+    }
+    {
+        // Taken before the start and until the stop is recorded, so that no item can lack a thread.
+        const platform::WorkQueue::Hold receiving(_receivingQueue);
+        const platform::WorkQueue::Hold processing(_processingQueue);
+        if (!_stream->start(&reported)) {
+            return platform::fail(error, ZRCapturePlugInErrorDomain, 204, reported,
+                                  "Failed to start streaming zorvel.");
+        }
+        // Never cancelled: a time-out that comes after the stop finds nothing to do.
+        _processingQueue.after(std::chrono::duration<double>(_timeout), [self] {
+            ZRLogHandle().write(platform::LogLevel::Error,
+                                [] { return "Timeout has been reached."; });
+            self->_stopWithError(nullptr);
+        });
+        _done_semaphore.acquire();
+    }
+    if (_error != nullptr) {
+        return platform::failWith(error, _error);
+    }
+    _meterixDelta = report.snapshot(&reported).snapshotWithBaseline(baseline, &reported);
+    if (!_meterixDelta) {
+        return platform::fail(error, ZRMeterixErrorDomain, 100, reported,
+                              "Cannot get Meterix delta after streaming.");
+    }
+    return _buildResult();
 }
 
 bool ZRVantorFaultExperiment::teardown(platform::ErrorSlot error) {

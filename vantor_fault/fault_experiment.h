@@ -1,5 +1,5 @@
 // ZRVantorFaultExperiment: streams the infrared camera of the Vantor depth module with its projector
-// in the dense-interleaved structured-light mode, at a fixed 30 frames a second, until the requested
+// in the dense-interleaved structured-light mode, at a fixed 30 frames per second, until the requested
 // number of frames was validated or the time-out expires. Its result holds the number of frames
 // received, the camera's hardware error counters and how far the image signal processor's event
 // counters moved meanwhile.
@@ -10,14 +10,17 @@
 // An unlit frame, bad metadata, the last frame and the time-out all ask for the same stop, which
 // happens once: the first to ask decides the outcome.
 //
-//     configured -> streaming -> stopped -> torn down      one run an instance
+//     configured -> streaming -> stopped -> torn down      one run per instance
 //
 // Owner    Make it with std::make_shared. The host owns it; a queued processing item and the pending
-//          time-out own it too, so it outlives a finished run until its time-out has passed. Handlers
-//          and receipts do not. The last reference may go on any thread, also inside an own item or
-//          a handler.
+//          time-out own it too, so it outlives a finished run until its time-out has passed; its
+//          threads do not. Handlers and receipts do not own it. The last reference may go on any
+//          thread, also inside one of its items or a handler.
 // Threads  The public operations: the host's thread, one at a time. run() blocks that thread until
 //          streaming is over.
+//          The threads of both queues start before the stream does and end after its stop. When they
+//          cannot be started, run() throws std::system_error and the stream never starts. A frame or
+//          an event that is delivered after the stop and finds no thread is dropped.
 // Locks    The stop runs under the experiment's lock, the capture service's stop() included. The
 //          handlers never take it, so a service may wait for a handler inside stop().
 #ifndef ZR_VANTOR_FAULT_FAULT_EXPERIMENT_H
@@ -28,6 +31,7 @@
 #include <memory>
 #include <optional>
 #include <semaphore>
+#include <string>
 #include <string_view>
 #include <utility>
 
@@ -46,7 +50,7 @@ class ZRVantorFaultExperiment final : public ZRExperiment,
   public:
     // Uses the front infrared camera.
     ZRVantorFaultExperiment();
-    // Uses the first stream of that port type: a constant, not copied.
+    // Uses the first stream of that port type.
     explicit ZRVantorFaultExperiment(std::string_view capturePort);
 
     ZRDescription experimentDescription() const override;
@@ -83,7 +87,7 @@ class ZRVantorFaultExperiment final : public ZRExperiment,
     bool teardown(platform::ErrorSlot error) override;
 
     // The port type of the stream to use.
-    std::string_view port() const { return _port; }
+    const std::string& port() const { return _port; }
     void setPort(std::string_view port) { _port = port; }
 
     // The sensor format that is written to the stream.
@@ -120,7 +124,7 @@ class ZRVantorFaultExperiment final : public ZRExperiment,
     // The host's thread; streaming begins after the last write.
     std::uint64_t _stopCount = 0;
     double _timeout = 0;  // seconds
-    std::string_view _port;
+    std::string _port;
     std::uint64_t _formatIndex = 0;
     std::shared_ptr<WLRylCaptureDevice> _device;
     std::shared_ptr<WLRylCaptureStream> _stream;

@@ -19,11 +19,13 @@ bool ZRVantorFaultExperiment::_selectStream(platform::ErrorRef& reported,
     }
     for (const auto& stream : *streams) {
         const Value portType =
-            stream->valueForProperty(kRylCaptureStreamProperty_PortType, &reported);
+            stream != nullptr
+                ? stream->valueForProperty(kRylCaptureStreamProperty_PortType, &reported)
+                : Value();
         if (!portType.isPresent()) {
-            // Reported, and yet no end of the run: another stream may be the one.
-            platform::fail(error, ZRCapturePlugInErrorDomain, 202, reported,
-                           "Failed to get stream port type!");
+            // Reported only: another stream may be the one.
+            static_cast<void>(platform::fail(error, ZRCapturePlugInErrorDomain, 202, reported,
+                                             "Failed to get stream port type!"));
         } else if (portType.string() != nullptr && *portType.string() == _port) {
             _stream = stream;
             return true;

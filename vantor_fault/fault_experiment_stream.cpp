@@ -1,9 +1,8 @@
-// The second phase of a run: streams, receives and validates frames, and stops once.
-#include <chrono>
+// The middle of a run: receives and validates frames, and stops once.
+#include <system_error>
+#include <utility>
 
 #include "frame/shared_helpers.h"
-#include "platform/number.h"
-#include "vantor_counters/counter_report.h"
 #include "vantor_fault/fault_experiment.h"
 #include "vantor_fault/frame_description.h"
 
@@ -11,8 +10,15 @@ using platform::LogLevel;
 
 namespace {
 
-std::chrono::nanoseconds delayOf(double seconds) {
-    return std::chrono::nanoseconds(platform::Number(seconds * 1e9).as<std::int64_t>());
+// Queues an item, or drops it when there is no thread to run it: handlers and items must not throw. That
+// happens only after the stop, when the queues are not held any more and the item would change nothing.
+// The exhaustion of memory ends the process: a frame that is lost would falsify the result.
+template <class Item>
+void queueOrDrop(platform::WorkQueue& queue, Item item) noexcept {
+    try {
+        queue.async(std::move(item));
+    } catch (const std::system_error&) {
+    }
 }
 
 // The two light sources that count as the projector's.
@@ -23,58 +29,20 @@ bool isLit(const ZRVantorFrameDescription& description) {
 
 }  // namespace
 
-ZRExperimentResultRef ZRVantorFaultExperiment::run(platform::ErrorSlot error) {
-    const auto self = shared_from_this();  // what the time-out will own
-    platform::ErrorRef reported;
-    if (!_selectStream(reported, error) || !_configureStream(reported, error)) {
-        return nullptr;
-    }
-
-    // Asking an absent report or snapshot for anything yields absence: one check an end suffices.
-    const WLMeterix report =
-        WLMeterix::reportWithOnlySimpleChannels(&reported).reportByFilteringChannels(
-            isISPEventSubgroup);
-    const WLMeterixSnapshot baseline = report.snapshot(&reported);
-    if (!baseline) {
-        return platform::fail(error, ZRMeterixErrorDomain, 100, reported,
-                              "Cannot get Meterix before streaming.");
-    }
-    if (!_stream->start(&reported)) {
-        return platform::fail(error, ZRCapturePlugInErrorDomain, 204, reported,
-                              "Failed to start streaming zorvel.");
-    }
-    // Never cancelled: a time-out that comes after the stop finds nothing to do.
-    _processingQueue.after(delayOf(_timeout), [self] {
-        ZRLogHandle().write(LogLevel::Error, [] { return "Timeout has been reached."; });
-        self->_stopWithError(nullptr);
-    });
-
-    _done_semaphore.acquire();
-    if (_error != nullptr) {
-        return platform::failWith(error, _error);
-    }
-    _meterixDelta = report.snapshot(&reported).snapshotWithBaseline(baseline, &reported);
-    if (!_meterixDelta) {
-        return platform::fail(error, ZRMeterixErrorDomain, 100, reported,
-                              "Cannot get Meterix delta after streaming.");
-    }
-    return _buildResult();
-}
-
 void ZRVantorFaultExperiment::_handlePixelBuffer(platform::ImageBufferRef buffer,
                                                  platform::MediaTime withTimeStamp) {
-    _receivingQueue.async(
-        [weak = weak_from_this(), buffer = std::move(buffer), withTimeStamp]() mutable {
-            if (const auto self = weak.lock()) {
-                self->_receiveFrame(std::move(buffer), withTimeStamp);
-            }
-        });
+    queueOrDrop(_receivingQueue,
+                [weak = weak_from_this(), buffer = std::move(buffer), withTimeStamp]() mutable {
+                    if (const auto self = weak.lock()) {
+                        self->_receiveFrame(std::move(buffer), withTimeStamp);
+                    }
+                });
 }
 
 void ZRVantorFaultExperiment::_handleEvent(std::int32_t event,
                                            platform::MediaTime withTimeStamp,
                                            std::int64_t /*info*/) {
-    _receivingQueue.async([event, withTimeStamp] {
+    queueOrDrop(_receivingQueue, [event, withTimeStamp] {
         ZRLogHandle().write(LogLevel::Debug, [&] {
             return platform::format("Processing event %d at %lf.", event, withTimeStamp.seconds());
         });
@@ -94,13 +62,15 @@ void ZRVantorFaultExperiment::_receiveFrame(platform::ImageBufferRef buffer,
     ZRLogHandle().write(LogLevel::Debug,
                         [&] { return platform::format("Received frame %@.", ordinal); });
 
-    const platform::Value& attachment =
-        buffer->attachment(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary);
-    if (!attachment.isPresent()) {
+    const platform::Value* attachment =
+        buffer != nullptr
+            ? &buffer->attachment(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary)
+            : nullptr;
+    if (attachment == nullptr || !attachment->isPresent()) {
         _stopWithError(ZRMakeError(ZRCapturePlugInErrorDomain, 206, "Frame metadata is missing!"));
         return;
     }
-    const platform::Dictionary* metadata = attachment.dictionary();
+    const platform::Dictionary* metadata = attachment->dictionary();
     if (metadata == nullptr) {
         _stopWithError(
             ZRMakeError(ZRCapturePlugInErrorDomain, 206, "Frame metadata is not a dictionary!"));
@@ -114,8 +84,8 @@ void ZRVantorFaultExperiment::_receiveFrame(platform::ImageBufferRef buffer,
         return;
     }
     buffer.reset();
-    _processingQueue.async([self = shared_from_this(), description = std::move(description),
-                            ordinal] { self->_processFrame(*description, ordinal); });
+    queueOrDrop(_processingQueue, [self = shared_from_this(), description = std::move(description),
+                                   ordinal] { self->_processFrame(*description, ordinal); });
 }
 
 void ZRVantorFaultExperiment::_processFrame(const ZRVantorFrameDescription& description,

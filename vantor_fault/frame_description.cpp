@@ -3,33 +3,10 @@
 #include <sstream>
 
 #include "platform/text_format.h"
-#include "platform/welkin/capture.h"
-
-constexpr std::array<ZRVantorFrameDescription::Source, ZRVantorFrameDescription::kColumnCount>
-    ZRVantorFrameDescription::kSources = {{
-        {"MetaDataProjectorMode", true},
-        {kRylCaptureStreamMetadata_InfraredLightSource, true},
-        {"MetaDataProjectorIndex", true},
-        {"MetaDataProjectorPowerLow", true},
-        {"MetaDataProjectorPowerHigh", true},
-        {"MetaDataProjectorPowerFlood", true},
-        {"MetaDataProjectorProbeMode", true},
-        {"MetaDataProjectorPowerProbeA", true},
-        {"MetaDataProjectorPowerProbeB", true},
-        {"MetaDataProjectorPulseWidth", true},
-        {kRylCaptureStreamMetadata_FloodActiveTemperature, false},
-        {"NTCTemperatureIdle", true},
-        {"NTCTemperatureStandby", true},
-        {"NTCTemperatureActive", true},
-        {"DIETemperatureIdle", true},
-        {"DIETemperatureStandby", true},
-        {"DIETemperatureActive", true},
-        {"HardwareEvents", true},
-    }};
 
 ZRVantorFrameDescription::ZRVantorFrameDescription() {
     _numbers.fill(0);
-    _numbers[FloodActiveTemperature] = Number();
+    _numbers[Column::FloodActiveTemperature] = Number();
 }
 
 std::shared_ptr<ZRVantorFrameDescription> ZRVantorFrameDescription::descriptionWithMonotonicCount(
@@ -39,7 +16,7 @@ std::shared_ptr<ZRVantorFrameDescription> ZRVantorFrameDescription::descriptionW
     auto description = std::make_shared<ZRVantorFrameDescription>();
     description->_monotonicCount = monotonicCount;
     description->_presentationTime = presenationTime;
-    for (std::size_t column = 0; column < kColumnCount; ++column) {
+    for (std::size_t column = 0; column < std::size(kSources); ++column) {
         const Number number = metadata.number(kSources[column].key);
         if (!number.isPresent() && kSources[column].required) {
             return nullptr;

@@ -1,33 +1,61 @@
 // ZRVantorFrameDescription: the part of a frame's metadata that concerns the projector and the
 // module's temperatures, with the frame's number, its presentation time and the moment of the record.
 //
-// Owner    Shared. The fault experiment makes one a frame on its receiving queue and hands it on to
+// Owner    Shared. The fault experiment makes one per frame on its receiving queue and hands it on to
 //          its processing queue.
 // Threads  Not synchronised: written by its maker only, any thread may read it afterwards.
-// Units    Numbers are kept exactly as the capture service supplied them, kind included. Nothing is
-//          read into them but the light source (1 and 2 lit the frame) and one hardware event bit.
+// Units    Numbers are kept exactly as the capture service supplied them, kind included. Only the
+//          light source (1 and 2 lit the frame) and one hardware event bit are interpreted.
 #ifndef ZR_VANTOR_FAULT_FRAME_DESCRIPTION_H
 #define ZR_VANTOR_FAULT_FRAME_DESCRIPTION_H
 
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <iterator>
 #include <memory>
 #include <string>
+#include <string_view>
 
 #include "platform/media_time.h"
 #include "platform/number.h"
 #include "platform/value.h"
 #include "platform/wall_clock.h"
+#include "platform/welkin/capture.h"
+
+// The eighteen numbers, in the order in which they are read and printed. A row yields the property's
+// getter and setter, its column, and the metadata key that it is read from.
+//        setter's name, getter, metadata key, whether a description needs it
+#define ZR_FRAME_NUMBERS(ROW)                                                                    \
+    ROW(ProjectorMode, projectorMode, "MetaDataProjectorMode", true)                             \
+    ROW(InfraredLightSource, infraredLightSource, kRylCaptureStreamMetadata_InfraredLightSource, \
+        true)                                                                                    \
+    ROW(ProjectorIndex, projectorIndex, "MetaDataProjectorIndex", true)                          \
+    ROW(ProjectorPowerLow, projectorPowerLow, "MetaDataProjectorPowerLow", true)                 \
+    ROW(ProjectorPowerHigh, projectorPowerHigh, "MetaDataProjectorPowerHigh", true)              \
+    ROW(ProjectorPowerFlood, projectorPowerFlood, "MetaDataProjectorPowerFlood", true)           \
+    ROW(ProjectorProbeMode, projectorProbeMode, "MetaDataProjectorProbeMode", true)              \
+    ROW(ProjectorPowerProbeA, projectorPowerProbeA, "MetaDataProjectorPowerProbeA", true)        \
+    ROW(ProjectorPowerProbeB, projectorPowerProbeB, "MetaDataProjectorPowerProbeB", true)        \
+    ROW(ProjectorPulseWidth, projectorPulseWidth, "MetaDataProjectorPulseWidth", true)           \
+    ROW(FloodActiveTemperature, floodActiveTemperature,                                          \
+        kRylCaptureStreamMetadata_FloodActiveTemperature, false)                                 \
+    ROW(NTCTemperatureIdle, NTCTemperatureIdle, "NTCTemperatureIdle", true)                      \
+    ROW(NTCTemperatureStandby, NTCTemperatureStandby, "NTCTemperatureStandby", true)             \
+    ROW(NTCTemperatureActive, NTCTemperatureActive, "NTCTemperatureActive", true)                \
+    ROW(DIETemperatureIdle, DIETemperatureIdle, "DIETemperatureIdle", true)                      \
+    ROW(DIETemperatureStandby, DIETemperatureStandby, "DIETemperatureStandby", true)             \
+    ROW(DIETemperatureActive, DIETemperatureActive, "DIETemperatureActive", true)                \
+    ROW(HardwareEvents, hardwareEvents, "HardwareEvents", true)
 
 class ZRVantorFrameDescription {
   public:
-    // Frame 0 at the zero time, made now; every number an integer 0 but for the flood temperature,
+    // Frame 0 at the zero time, made now; every number an integer 0 except the flood temperature,
     // which is absent.
     ZRVantorFrameDescription();
 
     // The description of a frame with this metadata. Null when the metadata lacks a value under a
-    // required key or holds something else than a number there (booleans count as numbers). Only the
+    // required key or holds something other than a number there (booleans count as numbers). Only the
     // flood temperature is optional: it stays absent then. `metadata` may be empty: null.
     static std::shared_ptr<ZRVantorFrameDescription> descriptionWithMonotonicCount(
         std::uint64_t monotonicCount,
@@ -43,8 +71,8 @@ class ZRVantorFrameDescription {
 
     // The frame as a row of 21 fields, and the row of their names; both end with a line feed. Fields
     // are separated by single commas and not quoted. The names of the eighteen numbers are their
-    // metadata keys (one name cannot serve a class and its instances, so the class's has a suffix). An
-    // absent number prints "(null)", a time that is no number "nan" or "inf".
+    // metadata keys. An absent number prints "(null)", a time that is not finite "nan", "inf" or
+    // "-inf". (C++ cannot overload a static member on an instance member, hence the suffix Header.)
     std::string csvRepresentation() const;
     static std::string csvRepresentationHeader();
 
@@ -61,78 +89,39 @@ class ZRVantorFrameDescription {
 
     using Number = platform::Number;
 
-    const Number& projectorMode() const { return _numbers[ProjectorMode]; }
-    void setProjectorMode(Number value) { _numbers[ProjectorMode] = value; }
-    const Number& infraredLightSource() const { return _numbers[InfraredLightSource]; }
-    void setInfraredLightSource(Number value) { _numbers[InfraredLightSource] = value; }
-    const Number& projectorIndex() const { return _numbers[ProjectorIndex]; }
-    void setProjectorIndex(Number value) { _numbers[ProjectorIndex] = value; }
-    const Number& projectorPowerLow() const { return _numbers[ProjectorPowerLow]; }
-    void setProjectorPowerLow(Number value) { _numbers[ProjectorPowerLow] = value; }
-    const Number& projectorPowerHigh() const { return _numbers[ProjectorPowerHigh]; }
-    void setProjectorPowerHigh(Number value) { _numbers[ProjectorPowerHigh] = value; }
-    const Number& projectorPowerFlood() const { return _numbers[ProjectorPowerFlood]; }
-    void setProjectorPowerFlood(Number value) { _numbers[ProjectorPowerFlood] = value; }
-    const Number& projectorProbeMode() const { return _numbers[ProjectorProbeMode]; }
-    void setProjectorProbeMode(Number value) { _numbers[ProjectorProbeMode] = value; }
-    const Number& projectorPowerProbeA() const { return _numbers[ProjectorPowerProbeA]; }
-    void setProjectorPowerProbeA(Number value) { _numbers[ProjectorPowerProbeA] = value; }
-    const Number& projectorPowerProbeB() const { return _numbers[ProjectorPowerProbeB]; }
-    void setProjectorPowerProbeB(Number value) { _numbers[ProjectorPowerProbeB] = value; }
-    const Number& projectorPulseWidth() const { return _numbers[ProjectorPulseWidth]; }
-    void setProjectorPulseWidth(Number value) { _numbers[ProjectorPulseWidth] = value; }
-    const Number& floodActiveTemperature() const { return _numbers[FloodActiveTemperature]; }
-    void setFloodActiveTemperature(Number value) { _numbers[FloodActiveTemperature] = value; }
-    const Number& NTCTemperatureIdle() const { return _numbers[NtcTemperatureIdle]; }
-    void setNTCTemperatureIdle(Number value) { _numbers[NtcTemperatureIdle] = value; }
-    const Number& NTCTemperatureStandby() const { return _numbers[NtcTemperatureStandby]; }
-    void setNTCTemperatureStandby(Number value) { _numbers[NtcTemperatureStandby] = value; }
-    const Number& NTCTemperatureActive() const { return _numbers[NtcTemperatureActive]; }
-    void setNTCTemperatureActive(Number value) { _numbers[NtcTemperatureActive] = value; }
-    const Number& DIETemperatureIdle() const { return _numbers[DieTemperatureIdle]; }
-    void setDIETemperatureIdle(Number value) { _numbers[DieTemperatureIdle] = value; }
-    const Number& DIETemperatureStandby() const { return _numbers[DieTemperatureStandby]; }
-    void setDIETemperatureStandby(Number value) { _numbers[DieTemperatureStandby] = value; }
-    const Number& DIETemperatureActive() const { return _numbers[DieTemperatureActive]; }
-    void setDIETemperatureActive(Number value) { _numbers[DieTemperatureActive] = value; }
-    const Number& hardwareEvents() const { return _numbers[HardwareEvents]; }
-    void setHardwareEvents(Number value) { _numbers[HardwareEvents] = value; }
+    // projectorMode(), setProjectorMode(), and so on.
+#define ZR_PROPERTY(Name, getter, key, required) \
+    const Number& getter() const {               \
+        return _numbers[Column::Name];           \
+    }                                            \
+    void set##Name(Number value) {               \
+        _numbers[Column::Name] = value;          \
+    }
+    ZR_FRAME_NUMBERS(ZR_PROPERTY)
+#undef ZR_PROPERTY
 
   private:
-    // The numbers, in the order in which they are read and printed.
-    enum Column : std::size_t {
-        ProjectorMode,
-        InfraredLightSource,
-        ProjectorIndex,
-        ProjectorPowerLow,
-        ProjectorPowerHigh,
-        ProjectorPowerFlood,
-        ProjectorProbeMode,
-        ProjectorPowerProbeA,
-        ProjectorPowerProbeB,
-        ProjectorPulseWidth,
-        FloodActiveTemperature,
-        NtcTemperatureIdle,
-        NtcTemperatureStandby,
-        NtcTemperatureActive,
-        DieTemperatureIdle,
-        DieTemperatureStandby,
-        DieTemperatureActive,
-        HardwareEvents,
+    struct Column {
+#define ZR_ENUMERATOR(Name, getter, key, required) Name,
+        enum : std::size_t { ZR_FRAME_NUMBERS(ZR_ENUMERATOR) };
+#undef ZR_ENUMERATOR
     };
-    static constexpr std::size_t kColumnCount = HardwareEvents + 1;
 
     // What each column is read from.
     struct Source {
         std::string_view key;
         bool required;
     };
-    static const std::array<Source, kColumnCount> kSources;
+#define ZR_SOURCE(Name, getter, key, required) {key, required},
+    static constexpr Source kSources[] = {ZR_FRAME_NUMBERS(ZR_SOURCE)};
+#undef ZR_SOURCE
 
     std::uint64_t _monotonicCount = 0;
     platform::MediaTime _presentationTime;
     platform::Date _creationDate = platform::Date::now();
-    std::array<Number, kColumnCount> _numbers;
+    std::array<Number, std::size(kSources)> _numbers;
 };
+
+#undef ZR_FRAME_NUMBERS
 
 #endif

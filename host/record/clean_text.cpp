@@ -11,7 +11,7 @@ namespace {
 
 constexpr std::string_view kReplacement = "\xEF\xBF\xBD";
 
-// What is no UTF-8 replaced; the library's writer does that.
+// The text with what is not UTF-8 replaced; the library's writer does that.
 std::string asUtf8(std::string_view text) {
     using nlohmann::json;
     return json::parse(json(text).dump(-1, ' ', false, json::error_handler_t::replace))

@@ -7,14 +7,14 @@
 
 namespace host {
 
-// The text with U+FFFD in place of whatever is no UTF-8 or no character of XML 1.0 (control characters
-// but for tab and line ends, say): names and messages may come from a device as they are.
+// The text with U+FFFD in place of whatever is not UTF-8 or not a character of XML 1.0 (such as control
+// characters other than tab and line ends): names and messages may come from a device as they are.
 std::string cleanText(std::string_view text);
 
 // The clean text with &, <, >, " and ' as entities: for the content and the attributes of HTML.
 std::string htmlText(std::string_view text);
 
-// The text in one line that drives no terminal: every control character is a question mark.
+// The text in one line that cannot control a terminal: every control character becomes a question mark.
 std::string plainLine(std::string_view text);
 
 }  // namespace host

@@ -1,4 +1,4 @@
-// RunListener: is told what a session does, as it happens. A report that streams is one.
+// RunListener: follows what a session does, as it happens. Reports are listeners.
 #ifndef ZR_HOST_RECORD_RUN_LISTENER_H
 #define ZR_HOST_RECORD_RUN_LISTENER_H
 
@@ -6,7 +6,7 @@
 
 namespace host {
 
-// Called on the session's thread, but for logged(), which any thread may call, several at once.
+// Called on the session's thread, except logged(), which any thread may call, several at once.
 // A record is complete up to the moment of the call.
 class RunListener {
   public:
@@ -21,6 +21,9 @@ class RunListener {
     virtual void partEnded(const RunRecord& /*run*/, Part /*part*/) {}
     // The verdict is known.
     virtual void runEnded(const RunRecord& /*run*/) {}
+    // A name that was asked for is done, with all its repetitions: its record, and its figures when it
+    // was repeated, are the last of the session's.
+    virtual void nameEnded(const SessionRecord& /*session*/) {}
     virtual void sessionEnded(const SessionRecord& /*session*/) {}
 };
 

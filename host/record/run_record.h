@@ -1,7 +1,7 @@
 // The record of a run: everything that a report shows, whatever its form.
 //
 // The host fills a record while it drives an experiment or a diagnostic; reports only read it. Plain
-// data, owned by whoever made it, used by one thread at a time.
+// data with one owner, used by one thread at a time.
 #ifndef ZR_HOST_RECORD_RUN_RECORD_H
 #define ZR_HOST_RECORD_RUN_RECORD_H
 
@@ -15,6 +15,8 @@
 #include <utility>
 #include <vector>
 
+#include "host/record/plugin_data.h"
+#include "host/record/run_plan.h"
 #include "platform/error.h"
 #include "platform/log.h"
 #include "platform/value.h"
@@ -22,11 +24,11 @@
 
 namespace host {
 
-// What came of a run, from best to worst.
+// The outcome of a run, from best to worst.
 enum class Verdict {
     Passed,  // a diagnostic whose every limited result is within its limit; an experiment that ran
-    Failed,  // a result is outside of its limit
-    Error,   // something could not be run to its end, so there is no verdict
+    Failed,  // a result is outside its limit
+    Error,   // something did not complete, so there is no verdict
 };
 
 // Where a result stands with respect to its limit.
@@ -38,7 +40,7 @@ enum class Judgement {
 
 struct BoundRecord {
     double value;
-    bool open;  // the bound's own value lies outside of the limit
+    bool open;  // the bound's own value is outside the limit
 };
 
 struct LimitRecord {
@@ -63,16 +65,14 @@ struct MeasurementRecord {
     std::string unit;
 };
 
-// The two parts of a diagnostic; an experiment that runs on its own has the first only.
-enum class Part { Experiment, Analysis };
-
 // A failure of one step of a part.
 struct FailureRecord {
     Part part;
-    std::string_view step;  // "setup", "run", "teardown", "analyze" or "device": see kStep…
+    std::string_view
+        step;  // "create", "setup", "run", "teardown", "analyze" or "device": see kStep…
     // What the part reported; null when it failed without an error object.
     platform::ErrorRef error;
-    // What happened when there is no error object: an exception's message, say.
+    // What happened when there is no error object, such as an exception's message.
     std::string message;
 };
 
@@ -83,14 +83,6 @@ inline constexpr std::string_view kStepTeardown = "teardown";
 inline constexpr std::string_view kStepAnalyze = "analyze";
 inline constexpr std::string_view kStepDevice = "device";  // the device was misused
 
-struct PartRecord {
-    std::string name;     // as registered
-    std::string summary;  // of its description
-    // The parameters that the part declares and was given, in the order of declaration.
-    std::vector<std::pair<std::string, platform::Number>> parameters;
-    double seconds = 0;  // setup, run and teardown together
-};
-
 struct LogRecord {
     platform::Date time;
     platform::LogLevel level;
@@ -99,30 +91,23 @@ struct LogRecord {
 
 // A frame that the device delivered, with what a report draws of it.
 struct FrameRecord {
-    std::uint64_t number;  // 1 for the first
+    std::uint64_t number;  // as received: 1 for the first, frames lost on the way not counted
     double presentation;   // seconds on the device's clock
     double delivered;      // seconds of real time since the run began
     std::optional<double> lightSource;
-    // Active, standby and idle temperatures as the metadata carries them, in the order of
-    // kTemperatureKeys.
-    std::array<std::optional<double>, 7> temperatures;
+    // As the metadata carries them, in the order of kTemperatures.
+    std::array<std::optional<double>, kTemperatureCount> temperatures;
 };
-
-inline constexpr std::array<std::string_view, 7> kTemperatureNames = {
-    "NTC idle",    "NTC standby", "NTC active",  "DIE idle",
-    "DIE standby", "DIE active",  "Flood active"};
 
 // One run of a diagnostic, or of an experiment on its own.
 struct RunRecord {
-    std::string name;     // as it was asked for
-    std::string summary;  // the diagnostic's, or the experiment's
-    bool isDiagnostic = false;
+    RunPlan plan;              // what was run
     std::uint64_t number = 1;  // which repetition, from 1
     platform::Date started = platform::Date::now();
     double seconds = 0;
 
-    PartRecord experiment;
-    std::optional<PartRecord> analysis;
+    double experimentSeconds = 0;           // setup, run and teardown together
+    std::optional<double> analysisSeconds;  // nothing when the analysis was not reached
 
     std::vector<MeasurementRecord> measurements;  // of the experiment, by name
     platform::Dictionary auxiliaryData;           // of the experiment
@@ -133,13 +118,13 @@ struct RunRecord {
     Verdict verdict = Verdict::Error;
 };
 
-// What became of one measured result over the repetitions of a run.
+// One measured result over the repetitions of a run.
 struct ResultStatistics {
     std::string name;
     std::string unit;
     std::optional<LimitRecord> limit;
     std::uint64_t runs = 0;
-    std::uint64_t outside = 0;  // how often it was outside of its limit
+    std::uint64_t outside = 0;  // how often it was outside its limit
     double minimum = 0;
     double median = 0;
     double maximum = 0;
@@ -156,46 +141,24 @@ struct RepeatRecord {
     std::vector<ResultStatistics> results;
 };
 
-// What will be run for a name that was asked for.
-struct PlannedRecord {
-    std::string name;
-    PartRecord experiment;
-    std::optional<PartRecord> analysis;
-};
-
 // Everything that one call of the program did.
 struct SessionRecord {
     std::string version;      // of the program
     std::string commandLine;  // as it was given
     std::string deviceName;
     std::string deviceSummary;
+    // What the device says of itself: names and texts, in its order.
+    std::vector<std::pair<std::string, std::string>> deviceFacts;
     platform::Date started = platform::Date::now();
     double seconds = 0;
-    // One entry a name asked for; known when the session starts.
-    std::vector<PlannedRecord> planned;
-    // One record a name asked for; of a repeated run the first that did not pass, else the last.
+    // One entry per name asked for; known when the session starts.
+    std::vector<RunPlan> planned;
+    // One record per name asked for; of a repeated run the first that did not pass, else the last.
     std::vector<RunRecord> runs;
-    // One entry a name when runs were repeated; empty otherwise.
+    // One entry per name when runs were repeated; empty otherwise.
     std::vector<RepeatRecord> repeats;
     Verdict verdict = Verdict::Passed;  // the worst of all runs, repetitions included
 };
-
-// "PASS", "FAIL", "ERROR".
-std::string_view verdictText(Verdict verdict);
-
-// "experiment", "analysis".
-std::string_view partText(Part part);
-
-// The failure in one line: the error's description, or what happened instead.
-std::string failureText(const FailureRecord& failure);
-
-// A number as people and parsers read it: the shortest decimal text that reads back to the same
-// value; nan, inf, -inf.
-std::string numberText(double value);
-
-// The limit as a range: "0 … 0 events", "≥ 30 frames", "> 0 and < 5 errors", "no bounds"; without a
-// unit the numbers alone.
-std::string limitText(const LimitRecord& limit, std::string_view unit);
 
 }  // namespace host
 

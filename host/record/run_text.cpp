@@ -5,7 +5,59 @@
 
 #include <fmt/format.h>
 
+#include "platform/number.h"
+
 namespace host {
+
+std::string_view verdictText(Verdict verdict) {
+    switch (verdict) {
+        case Verdict::Passed:
+            return "PASS";
+        case Verdict::Failed:
+            return "FAIL";
+        case Verdict::Error:
+            break;
+    }
+    return "ERROR";
+}
+
+std::string_view partText(Part part) {
+    return part == Part::Experiment ? "experiment" : "analysis";
+}
+
+std::string failureText(const FailureRecord& failure) {
+    if (failure.error != nullptr) {
+        return failure.error->localizedDescription();
+    }
+    return failure.message.empty() ? "it failed without saying why" : failure.message;
+}
+
+std::string numberText(double value) {
+    return platform::Number(value).text();
+}
+
+std::string limitText(const LimitRecord& limit, std::string_view unit) {
+    const auto bound = [](std::string_view closedSign, std::string_view openSign, BoundRecord end) {
+        return std::string(end.open ? openSign : closedSign) + " " + numberText(end.value);
+    };
+    std::string text;
+    if (limit.lower.has_value() && limit.upper.has_value() && !limit.lower->open &&
+        !limit.upper->open) {
+        text = numberText(limit.lower->value) + " … " + numberText(limit.upper->value);
+    } else {
+        if (limit.lower.has_value()) {
+            text = bound("≥", ">", *limit.lower);
+        }
+        if (limit.upper.has_value()) {
+            text += text.empty() ? "" : " and ";
+            text += bound("≤", "<", *limit.upper);
+        }
+    }
+    if (text.empty()) {
+        return "no bounds";
+    }
+    return unit.empty() ? text : text + " " + std::string(unit);
+}
 
 std::string plural(std::uint64_t count, std::string_view one, std::string_view many) {
     return fmt::format("{} {}", count, count == 1 ? one : many);
@@ -22,10 +74,10 @@ std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view 
 
 std::string headline(const RunRecord& run) {
     if (run.verdict == Verdict::Error) {
-        return "could not be run to its end";
+        return "did not complete";
     }
-    if (!run.isDiagnostic) {
-        return "ran to its end";
+    if (!run.plan.isDiagnostic()) {
+        return "completed";
     }
     const auto countOf = [&run](Judgement judgement) {
         return std::count_if(run.results.begin(), run.results.end(),
@@ -37,8 +89,8 @@ std::string headline(const RunRecord& run) {
                        : fmt::format("all {} limits met", limited);
 }
 
-const PartRecord& partOf(const RunRecord& run, Part part) {
-    return part == Part::Analysis && run.analysis.has_value() ? *run.analysis : run.experiment;
+const PartPlan& partOf(const RunRecord& run, Part part) {
+    return part == Part::Analysis ? run.plan.analysis.value() : run.plan.experiment;
 }
 
 std::string placeText(const FailureRecord& failure, const RunRecord& run) {

@@ -1,4 +1,4 @@
-// The sentences that reports have in common, so that every form says the same in the same words.
+// The words that reports have in common, so that every form uses the same ones.
 #ifndef ZR_HOST_RECORD_RUN_TEXT_H
 #define ZR_HOST_RECORD_RUN_TEXT_H
 
@@ -11,6 +11,23 @@
 
 namespace host {
 
+// "PASS", "FAIL", "ERROR".
+std::string_view verdictText(Verdict verdict);
+
+// "experiment", "analysis".
+std::string_view partText(Part part);
+
+// The failure in one line: the error's description, or what happened instead.
+std::string failureText(const FailureRecord& failure);
+
+// A number as people and parsers read it: the shortest decimal text that reads back to the same value;
+// nan, inf, -inf.
+std::string numberText(double value);
+
+// The limit as a range: "0 … 0 events", "≥ 30 frames", "> 0 and < 5 errors", "no bounds"; without a
+// unit the numbers alone.
+std::string limitText(const LimitRecord& limit, std::string_view unit);
+
 // "1 frame", "2 frames".
 std::string plural(std::uint64_t count, std::string_view one, std::string_view many);
 
@@ -20,11 +37,11 @@ std::string valueText(double value, std::string_view unit);
 // "Max Reports: 0 … 0 events", "no limit".
 std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view unit);
 
-// What came of the run in a few words: "2 of 64 limits not met".
+// The outcome of the run in a few words: "2 of 64 limits not met".
 std::string headline(const RunRecord& run);
 
-// The part's record; the experiment's when the analysis was never reached.
-const PartRecord& partOf(const RunRecord& run, Part part);
+// The part of the run's plan; an experiment on its own has no analysis.
+const PartPlan& partOf(const RunRecord& run, Part part);
 
 // Where it failed: "experiment VantorFaultExperiment, run".
 std::string placeText(const FailureRecord& failure, const RunRecord& run);

@@ -76,7 +76,7 @@ std::string_view judgementText(Judgement judgement) {
     return kTexts[static_cast<std::size_t>(judgement)];
 }
 
-Json jsonOf(const PartRecord& part) {
+Json jsonOf(const PartPlan& part, double seconds) {
     Json parameters = Json::object();
     for (const auto& [name, value] : part.parameters) {
         parameters[name] = jsonOf(value);
@@ -84,7 +84,7 @@ Json jsonOf(const PartRecord& part) {
     return {{"name", part.name},
             {"summary", part.summary},
             {"parameters", std::move(parameters)},
-            {"seconds", part.seconds}};
+            {"seconds", seconds}};
 }
 
 template <class Records, class Convert>
@@ -97,14 +97,16 @@ Json arrayOf(const Records& records, Convert&& convert) {
 }
 
 Json jsonOf(const RunRecord& run) {
-    Json object{{"name", run.name},
-                {"summary", run.summary},
+    Json object{{"name", run.plan.name},
+                {"summary", run.plan.summary},
                 {"verdict", verdictText(run.verdict)},
                 {"run", run.number},
                 {"started", run.started.timestamp()},
                 {"seconds", run.seconds},
-                {"experiment", jsonOf(run.experiment)},
-                {"analysis", run.analysis.has_value() ? jsonOf(*run.analysis) : Json()}};
+                {"experiment", jsonOf(run.plan.experiment, run.experimentSeconds)},
+                {"analysis", run.analysisSeconds.has_value()
+                                 ? jsonOf(*run.plan.analysis, *run.analysisSeconds)
+                                 : Json()}};
     object["failures"] = arrayOf(run.failures, [](const FailureRecord& failure) {
         return Json{{"part", partText(failure.part)},
                     {"step", failure.step},
@@ -153,21 +155,35 @@ Json jsonOf(const RepeatRecord& repeat) {
     return object;
 }
 
+Json deviceOf(const SessionRecord& session) {
+    Json facts = Json::object();
+    for (const auto& [name, text] : session.deviceFacts) {
+        facts[name] = text;
+    }
+    return {{"name", session.deviceName},
+            {"summary", session.deviceSummary},
+            {"facts", std::move(facts)}};
+}
+
 }  // namespace
 
 std::string jsonReport(const SessionRecord& session) {
     Json document{{"program", "zrlab"},
                   {"version", session.version},
                   {"commandLine", session.commandLine},
-                  {"device", {{"name", session.deviceName}, {"summary", session.deviceSummary}}},
+                  {"device", deviceOf(session)},
                   {"started", session.started.timestamp()},
                   {"seconds", session.seconds},
                   {"verdict", verdictText(session.verdict)}};
     document["runs"] = arrayOf(session.runs, [](const RunRecord& run) { return jsonOf(run); });
     document["repeats"] =
         arrayOf(session.repeats, [](const RepeatRecord& repeat) { return jsonOf(repeat); });
-    // Text that is no UTF-8 (it may come from a device) must not stop the report.
+    // Text that is not UTF-8 (it may come from a device) must not stop the report.
     return document.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+}
+
+std::shared_ptr<RunListener> openJsonReport(ReportSink sink, const TextStyle& /*style*/) {
+    return wholeReport(std::move(sink), jsonReport);
 }
 
 }  // namespace host

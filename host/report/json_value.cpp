@@ -5,7 +5,7 @@
 #include <cstdlib>
 #include <string>
 
-#include "host/record/run_record.h"
+#include "host/record/run_text.h"
 
 namespace host {
 

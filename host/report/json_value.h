@@ -1,4 +1,4 @@
-// Numbers and values as JSON: the one rule of every report that is JSON.
+// Numbers and values as JSON: the one rule for all reports in JSON.
 //
 // Integers stay integers, floating point has the shortest digits that read back to the same value,
 // booleans are true and false; NaN and the infinities, which JSON cannot carry, are the strings "nan",

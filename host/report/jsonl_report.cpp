@@ -16,11 +16,12 @@ namespace {
 using Json = nlohmann::ordered_json;
 using host::jsonOf;
 
-// Errors are the bench's; it is the one piece of software that the run start names.
+// The source of errors: the bench, the only software that the run start names.
 constexpr const char* kSoftwareId = "zrlab";
 constexpr const char* kHardwareId = "device";
+constexpr std::string_view kPlatformFact = "platform";
 
-Json parametersOf(const PartRecord& part) {
+Json parametersOf(const PartPlan& part) {
     Json parameters = Json::object();
     for (const auto& [name, value] : part.parameters) {
         parameters[name] = jsonOf(value);
@@ -30,7 +31,7 @@ Json parametersOf(const PartRecord& part) {
 
 Json parametersOf(const SessionRecord& session) {
     Json parameters = Json::object();
-    for (const PlannedRecord& planned : session.planned) {
+    for (const RunPlan& planned : session.planned) {
         Json& entry = parameters[planned.name];
         entry["experiment"] = parametersOf(planned.experiment);
         if (planned.analysis.has_value()) {
@@ -40,17 +41,34 @@ Json parametersOf(const SessionRecord& session) {
     return parameters;
 }
 
+// The fact "platform" has an entry of its own in the standard; the others are metadata.
+Json platformsOf(const SessionRecord& session) {
+    Json platforms = Json::array();
+    for (const auto& [name, text] : session.deviceFacts) {
+        if (name == kPlatformFact) {
+            platforms.push_back({{"info", text}});
+        }
+    }
+    return platforms;
+}
+
 Json deviceOf(const SessionRecord& session) {
+    Json metadata{{"summary", session.deviceSummary}};
+    for (const auto& [name, text] : session.deviceFacts) {
+        if (name != kPlatformFact) {
+            metadata[name] = text;
+        }
+    }
     return {{"dutInfoId", session.deviceName},
             {"name", session.deviceName},
-            {"platformInfos", Json::array({{{"info", "simulated device"}}})},
+            {"platformInfos", platformsOf(session)},
             {"softwareInfos", Json::array({{{"softwareInfoId", kSoftwareId},
                                             {"name", "zrlab"},
                                             {"version", session.version},
                                             {"softwareType", "APPLICATION"}}})},
             {"hardwareInfos",
              Json::array({{{"hardwareInfoId", kHardwareId}, {"name", session.deviceName}}})},
-            {"metadata", {{"summary", session.deviceSummary}}}};
+            {"metadata", std::move(metadata)}};
 }
 
 Json measurementOf(const std::string& name, double value, const std::string& unit) {
@@ -84,7 +102,7 @@ Json diagnosisOf(const RunRecord& run) {
     };
     static constexpr Row kRows[] = {{"pass", "PASS"}, {"fail", "FAIL"}, {"error", "UNKNOWN"}};
     const Row& row = kRows[static_cast<std::size_t>(run.verdict)];
-    return {{"verdict", run.name + "-" + row.suffix},
+    return {{"verdict", run.plan.name + "-" + row.suffix},
             {"type", row.type},
             {"message", headline(run)},
             {"hardwareInfoId", kHardwareId}};
@@ -118,7 +136,7 @@ void JsonlReport::runStarted(const RunRecord& /*run*/) {
 void JsonlReport::partStarted(const RunRecord& run, Part part) {
     const platform::MutexLock lock(_mutex);
     _closeStep();
-    _step = fmt::format("{}-{}-{}-{}", _steps++, run.name, run.number, partText(part));
+    _step = fmt::format("{}-{}-{}-{}", _steps++, run.plan.name, run.number, partText(part));
     _writeStep("testStepStart", {{"name", partOf(run, part).name}});
 }
 
@@ -161,11 +179,11 @@ void JsonlReport::partEnded(const RunRecord& run, Part part) {
 
 void JsonlReport::runEnded(const RunRecord& run) {
     const platform::MutexLock lock(_mutex);
-    if (run.isDiagnostic) {
+    if (run.plan.isDiagnostic()) {
         _writeStep("diagnosis", diagnosisOf(run));
     }
     _closeStep();
-    // What is only known now, a misused device, is no failure of a step.
+    // What is only known now, a broken rule of the device, is not a failure of a step.
     _writeFailures(run);
 }
 
@@ -184,7 +202,7 @@ void JsonlReport::_write(std::string_view kind, Json artifact) {
     Json line{{"sequenceNumber", _sequenceNumber++},
               {"timestamp", platform::Date::now().timestamp()}};
     line[kind] = std::move(artifact);
-    // Text that is no UTF-8 (it may come from a device) must not stop the report.
+    // Text that is not UTF-8 (it may come from a device) must not stop the report.
     _sink(line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n");
 }
 
@@ -223,6 +241,10 @@ void JsonlReport::_closeStep() {
         _step.clear();
         _stepFailed = false;
     }
+}
+
+std::shared_ptr<RunListener> openJsonlReport(ReportSink sink, const TextStyle& /*style*/) {
+    return std::make_shared<JsonlReport>(std::move(sink));
 }
 
 }  // namespace host

@@ -1,5 +1,5 @@
 // The report for factory systems: Open Compute Project test-and-validation output, version 2.0, one
-// artifact a line, written as it happens.
+// artifact per line, written as it happens.
 //
 // The session is the test run; each part of each of its runs is a test step of its own. What the
 // artifacts hold:
@@ -9,15 +9,15 @@
 //   extension      one for each element of a list in the experiment's auxiliary data ("images")
 //   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
 //                  causes as message
-//   diagnosis      one a diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error"
+//   diagnosis      one per diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error"
 //   log            in the step that is open, between steps in the run
-// Numbers are written as host/json_value.h says.
+// Numbers are written as host/report/json_value.h says.
 #ifndef ZR_HOST_REPORT_JSONL_REPORT_H
 #define ZR_HOST_REPORT_JSONL_REPORT_H
 
 #include <cstddef>
 #include <cstdint>
-#include <functional>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -25,6 +25,7 @@
 #include <nlohmann/json_fwd.hpp>
 
 #include "host/record/run_listener.h"
+#include "host/report/report_form.h"
 #include "platform/mutex.h"
 
 namespace host {
@@ -33,8 +34,7 @@ class JsonlReport final : public RunListener {
   public:
     // `sink` takes one whole line, its line end included. It is called on the thread that makes the
     // line, one call at a time, with this report's lock held: it must not log.
-    explicit JsonlReport(std::function<void(std::string_view line)> sink)
-        : _sink(std::move(sink)) {}
+    explicit JsonlReport(ReportSink sink) : _sink(std::move(sink)) {}
 
     void sessionStarted(const SessionRecord& session) override;
     void runStarted(const RunRecord& run) override;
@@ -56,7 +56,7 @@ class JsonlReport final : public RunListener {
     void _writeFailures(const RunRecord& run) ZR_REQUIRES(_mutex);
     void _closeStep() ZR_REQUIRES(_mutex);
 
-    const std::function<void(std::string_view line)> _sink;
+    const ReportSink _sink;
 
     platform::Mutex _mutex;
     std::uint64_t _sequenceNumber ZR_GUARDED_BY(_mutex) = 0;
@@ -68,6 +68,8 @@ class JsonlReport final : public RunListener {
     std::size_t _failuresWritten ZR_GUARDED_BY(_mutex) = 0;
     bool _ended ZR_GUARDED_BY(_mutex) = false;
 };
+
+std::shared_ptr<RunListener> openJsonlReport(ReportSink sink, const TextStyle& style);
 
 }  // namespace host
 

@@ -46,15 +46,18 @@ class Suite {
         : _node(node), _session(session), _run(run) {}
 
     Counts write(const RepeatRecord* repeat) {
-        setAttribute(_node, "name", _run.name);
+        setAttribute(_node, "name", _run.plan.name);
         setAttribute(_node, "timestamp", _run.started.timestamp());
         setSeconds(_node, repeat != nullptr ? repeat->seconds : _run.seconds);
         _properties = _node.append_child("properties");
         _property("device", _session.deviceName);
         _property("commandLine", _session.commandLine);
-        _parameters(_run.experiment, Part::Experiment);
-        if (_run.analysis.has_value()) {
-            _parameters(*_run.analysis, Part::Analysis);
+        for (const auto& [name, text] : _session.deviceFacts) {
+            _property("device." + name, text);
+        }
+        _parameters(Part::Experiment);
+        if (_run.analysisSeconds.has_value()) {
+            _parameters(Part::Analysis);
         }
         for (const FailureRecord& failure : _run.failures) {
             _failedStep(failure);
@@ -65,7 +68,7 @@ class Suite {
             _singleRun();
         }
         if (_counts.tests == 0) {
-            setSeconds(_case("run"), _run.experiment.seconds);
+            setSeconds(_case("run"), _run.experimentSeconds);
         }
         std::string log;
         for (const LogRecord& line : _run.log) {
@@ -86,8 +89,8 @@ class Suite {
         setAttribute(property, "value", value);
     }
 
-    void _parameters(const PartRecord& record, Part part) {
-        for (const auto& [name, value] : record.parameters) {
+    void _parameters(Part part) {
+        for (const auto& [name, value] : partOf(_run, part).parameters) {
             _property(fmt::format("{}.{}", partText(part), name), value.text());
         }
     }
@@ -96,7 +99,7 @@ class Suite {
         ++_counts.tests;
         pugi::xml_node node = _node.append_child("testcase");
         setAttribute(node, "name", name);
-        setAttribute(node, "classname", _run.name);
+        setAttribute(node, "classname", _run.plan.name);
         return node;
     }
 
@@ -114,12 +117,13 @@ class Suite {
     void _failedStep(const FailureRecord& failure) {
         const pugi::xml_node node =
             _case(fmt::format("{} {}", partText(failure.part), failure.step));
-        setSeconds(node, partOf(_run, failure.part).seconds);
+        setSeconds(node, failure.part == Part::Analysis ? _run.analysisSeconds.value_or(0)
+                                                        : _run.experimentSeconds);
         _error(node, symptomText(failure, " "), failureText(failure),
                fmt::format("{}\n{}", placeText(failure, _run), causeText(failure, "\n")));
     }
 
-    // A measured result: what was found out in one line, and whether it failed.
+    // A measured result: its findings in one line, and whether it failed.
     void _result(std::string_view name, const std::string& finding, bool failed) {
         pugi::xml_node node = _case(name);
         if (failed) {
@@ -140,7 +144,7 @@ class Suite {
                                 limitLine(result.limit, result.unit)),
                     result.judgement == Judgement::Outside);
         }
-        if (!_run.isDiagnostic) {
+        if (!_run.plan.isDiagnostic()) {
             for (const MeasurementRecord& one : _run.measurements) {
                 _property("measurement." + one.name, valueText(one.value, one.unit));
             }
@@ -155,9 +159,8 @@ class Suite {
         _property("run shown", std::to_string(_run.number));
         // A failed step of the run that is shown has a case of its own.
         if (repeat.errors > 0 && _run.failures.empty()) {
-            const std::string message =
-                fmt::format("{} of {} could not be run to their end", repeat.errors,
-                            plural(repeat.runs, "run", "runs"));
+            const std::string message = fmt::format("{} of {} did not complete", repeat.errors,
+                                                    plural(repeat.runs, "run", "runs"));
             _error(_case("repetitions"), "repetitions in error", message, message);
         }
         for (const ResultStatistics& result : repeat.results) {
@@ -202,6 +205,10 @@ std::string junitReport(const SessionRecord& session) {
     std::ostringstream out;
     document.save(out, "  ");
     return out.str();
+}
+
+std::shared_ptr<RunListener> openJunitReport(ReportSink sink, const TextStyle& /*style*/) {
+    return wholeReport(std::move(sink), junitReport);
 }
 
 }  // namespace host

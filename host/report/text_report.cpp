@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <iterator>
 #include <limits>
+#include <utility>
 #include <vector>
 
 #include <fmt/format.h>
@@ -49,7 +50,7 @@ class Writer {
     TextStyle _style;
 };
 
-std::string parametersText(const PartRecord& part) {
+std::string parametersText(const PartPlan& part) {
     std::string text;
     for (const auto& [name, value] : part.parameters) {
         text += fmt::format("{}{} {}", text.empty() ? "" : ", ", name, value.text());
@@ -106,7 +107,7 @@ std::string errorText(const FailureRecord& failure, const RunRecord& run, const 
     return out;
 }
 
-// A small picture of samples: one block a pair of samples, its height the larger of the two between
+// A small picture of samples: one block per pair of samples, its height the larger of the two between
 // the least and the greatest sample of the whole run.
 std::string sparkline(const platform::List& samples, double least, double greatest) {
     static constexpr std::string_view kBlocks[] = {"▁", "▂", "▃", "▄", "▅", "▆", "▇", "█"};
@@ -127,8 +128,8 @@ std::string imageRows(const platform::List& images, const Writer& writer) {
     double least = std::numeric_limits<double>::max();
     double greatest = std::numeric_limits<double>::lowest();
     for (const platform::Value& image : images) {
-        for (const char* scan : {"dScanI", "dScanQ"}) {
-            const platform::List* samples = image[scan].list();
+        const ImageView view(image);
+        for (const platform::List* samples : {view.samplesI, view.samplesQ}) {
             for (std::size_t at = 0; samples != nullptr && at < samples->size(); ++at) {
                 least = std::min(least, (*samples)[at].asNumber().asDouble());
                 greatest = std::max(greatest, (*samples)[at].asNumber().asDouble());
@@ -137,8 +138,8 @@ std::string imageRows(const platform::List& images, const Writer& writer) {
     }
     std::string out = writer.faintLine(
         fmt::format("  {:>10}  {:>10}  {:>8}  {:<24}  {}", "frame", "time ms", "°C", "I", "Q"));
-    const auto picture = [least, greatest](const platform::Value& samples) {
-        return samples.list() != nullptr ? sparkline(*samples.list(), least, greatest) : "";
+    const auto picture = [least, greatest](const platform::List* samples) {
+        return samples != nullptr ? sparkline(*samples, least, greatest) : "";
     };
     for (std::size_t at = 0; at < images.size(); ++at) {
         if (!writer.verbose() && at == kRowsAtEachEnd && images.size() > 2 * kRowsAtEachEnd) {
@@ -147,12 +148,10 @@ std::string imageRows(const platform::List& images, const Writer& writer) {
                                                 plural(folded, "image", "images")));
             at += folded;
         }
-        const platform::Value& image = images[at];
-        out +=
-            fmt::format("  {:>10}  {:>10}  {:>8.2f}  {}  {}\n", image["frameID"].asNumber().text(),
-                        image["timestampInMilliseconds"].asNumber().text(),
-                        image["tmonDataInC"].asNumber().asDouble(), picture(image["dScanI"]),
-                        picture(image["dScanQ"]));
+        const ImageView image(images[at]);
+        out += fmt::format("  {:>10}  {:>10}  {:>8.2f}  {}  {}\n", image.frameId.text(),
+                           image.milliseconds.text(), image.celsius.asDouble(),
+                           picture(image.samplesI), picture(image.samplesQ));
     }
     return out;
 }
@@ -174,13 +173,13 @@ std::string body(const RunRecord& run, const Writer& writer) {
         out += writer.faintLine(fmt::format("    {} within the limits, --verbose lists them",
                                             plural(others.size(), "result", "results")));
     }
-    if (!run.isDiagnostic || writer.verbose()) {
-        if (run.isDiagnostic && !run.measurements.empty()) {
+    if (!run.plan.isDiagnostic() || writer.verbose()) {
+        if (run.plan.isDiagnostic() && !run.measurements.empty()) {
             out += writer.faintLine("  as measured by the experiment");
         }
         out += measurementRows(run.measurements);
     }
-    const platform::List* images = run.auxiliaryData["images"].list();
+    const platform::List* images = imagesOf(run.auxiliaryData);
     if (images != nullptr) {
         out += fmt::format("  {}\n", plural(images->size(), "image", "images"));
         out += images->empty() ? "" : imageRows(*images, writer);
@@ -188,17 +187,40 @@ std::string body(const RunRecord& run, const Writer& writer) {
     return out;
 }
 
+class TextReport final : public RunListener {
+  public:
+    TextReport(ReportSink sink, const TextStyle& style) : _sink(std::move(sink)), _style(style) {}
+
+    void nameEnded(const SessionRecord& session) override {
+        const RunRecord& run = session.runs.back();
+        std::string text = session.runs.size() > 1 ? "\n" : "";
+        if (!session.repeats.empty()) {
+            text += textReport(session.repeats.back(), _style) + "\n";
+            text += fmt::format("run {}:\n", run.number);
+        }
+        _sink(text + textReport(run, _style));
+    }
+
+  private:
+    const ReportSink _sink;
+    const TextStyle _style;
+};
+
 }  // namespace
+
+std::shared_ptr<RunListener> openTextReport(ReportSink sink, const TextStyle& style) {
+    return std::make_shared<TextReport>(std::move(sink), style);
+}
 
 std::string textReport(const RunRecord& run, const TextStyle& style) {
     const Writer writer(style);
     std::string out =
-        fmt::format("{}  {}  {}  {}\n", writer.verdict(run.verdict), writer.strong(run.name),
+        fmt::format("{}  {}  {}  {}\n", writer.verdict(run.verdict), writer.strong(run.plan.name),
                     headline(run), writer.faint(fmt::format("{:.2f} s", run.seconds)));
-    out += writer.faintLine(fmt::format("      {}", run.summary));
-    std::string parameters = parametersText(run.experiment);
-    if (run.analysis.has_value() && !run.analysis->parameters.empty()) {
-        parameters += fmt::format("; analysis: {}", parametersText(*run.analysis));
+    out += writer.faintLine(fmt::format("      {}", run.plan.summary));
+    std::string parameters = parametersText(run.plan.experiment);
+    if (run.analysisSeconds.has_value() && !run.plan.analysis->parameters.empty()) {
+        parameters += fmt::format("; analysis: {}", parametersText(*run.plan.analysis));
     }
     if (!parameters.empty()) {
         out += writer.faintLine(fmt::format("      {}", parameters));
@@ -222,7 +244,7 @@ std::string textLine(const RunRecord& run, const TextStyle& style) {
         }
     }
     return fmt::format("{:>6}  {}  {}  {:.2f} s  {}", run.number, writer.verdict(run.verdict),
-                       run.name, run.seconds, why);
+                       run.plan.name, run.seconds, why);
 }
 
 std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {

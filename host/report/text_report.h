@@ -2,16 +2,16 @@
 #ifndef ZR_HOST_REPORT_TEXT_REPORT_H
 #define ZR_HOST_REPORT_TEXT_REPORT_H
 
+#include <memory>
 #include <string>
 
 #include "host/record/run_record.h"
+#include "host/report/report_form.h"
 
 namespace host {
 
-struct TextStyle {
-    bool colour = false;   // escape sequences of a terminal
-    bool verbose = false;  // show what is folded otherwise
-};
+// Writes each name that was asked for as soon as it is done, with a blank line between two of them.
+std::shared_ptr<RunListener> openTextReport(ReportSink sink, const TextStyle& style);
 
 // One run.
 std::string textReport(const RunRecord& run, const TextStyle& style);

@@ -18,7 +18,7 @@ bool isWithin(double value, const LimitRecord& limit) {
     if (std::isnan(value)) {
         return false;
     }
-    // Written as what admits the value, so that a bound of NaN admits none.
+    // Written as the conditions that admit the value, so that a bound of NaN admits none.
     const bool aboveLower = !limit.lower.has_value() || value > limit.lower->value ||
                             (value == limit.lower->value && !limit.lower->open);
     const bool belowUpper = !limit.upper.has_value() || value < limit.upper->value ||

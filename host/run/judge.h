@@ -8,7 +8,7 @@
 namespace host {
 
 // The result with its limit, judged: Within when the value is inside both bounds that are set (a
-// closed bound's own value is inside, an open one's is not). NaN is inside no limit, also not inside
+// closed bound's own value is inside, an open one's is not). NaN is not inside any limit, not even
 // one without bounds, and a bound of NaN admits nothing. Units are not compared.
 ResultRecord judge(const ZRMeasuredResult& result);
 

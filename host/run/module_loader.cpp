@@ -1,12 +1,11 @@
 #include "host/run/module_loader.h"
 
-#include <filesystem>
+#include <cstddef>
 #include <set>
-#include <system_error>
-
-#include <dlfcn.h>
 
 #include "frame/host_interface.h"
+#include "host/record/problem.h"
+#include "platform/module.h"
 
 namespace host {
 
@@ -20,29 +19,22 @@ std::size_t registeredCount() {
 
 }  // namespace
 
-std::optional<std::string> loadModule(const std::string& path) {
-    std::error_code noStatus;
-    const auto status = std::filesystem::status(path, noStatus);
-    if (!std::filesystem::exists(status)) {
-        return "plug-in module " + path + ": no such file";
-    }
-    if (!std::filesystem::is_regular_file(status)) {
-        return "plug-in module " + path + ": not a file";
-    }
-    // An absolute path keeps the loader from searching its own folders.
-    const std::string absolute = std::filesystem::absolute(path).string();
-    static std::set<void*>& loaded = *new std::set<void*>;  // of modules that registered something
+void loadModule(const std::string& path) {
+    const auto fail = [&path](const std::string& reason) {
+        throw Problem(kExitError, "plug-in module " + path + ": " + reason);
+    };
+    static std::set<const void*>& loaded = *new std::set<const void*>;
     const std::size_t before = registeredCount();
-    void* const module = dlopen(absolute.c_str(), RTLD_NOW | RTLD_LOCAL);
-    if (module == nullptr) {
-        return "plug-in module " + path + ": cannot be loaded: " + dlerror();
+    const void* module = nullptr;
+    try {
+        module = platform::loadModule(path);
+    } catch (const platform::ModuleProblem& problem) {
+        fail(problem.what());
     }
-    if (registeredCount() != before) {
-        loaded.insert(module);
+    if (loaded.insert(module).second && registeredCount() == before) {
+        loaded.erase(module);
+        fail("it registers nothing");
     }
-    return loaded.contains(module)
-               ? std::nullopt
-               : std::optional("plug-in module " + path + ": it registers nothing");
 }
 
 }  // namespace host

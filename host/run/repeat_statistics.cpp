@@ -54,7 +54,7 @@ void RepeatStatistics::add(const RunRecord& run) {
         one.outside = result.judgement == Judgement::Outside ? 1 : 0;
         _count(one, result.value);
     }
-    if (!run.isDiagnostic) {
+    if (!run.plan.isDiagnostic()) {
         for (const MeasurementRecord& measurement : run.measurements) {
             ResultStatistics one;
             one.name = measurement.name;

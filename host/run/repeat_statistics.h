@@ -1,4 +1,4 @@
-// RepeatStatistics: what became of each measured result over the repetitions of a run.
+// RepeatStatistics: figures of each measured result over the repetitions of a run.
 #ifndef ZR_HOST_RUN_REPEAT_STATISTICS_H
 #define ZR_HOST_RUN_REPEAT_STATISTICS_H
 
@@ -11,10 +11,10 @@
 
 namespace host {
 
-// Keeps each distinct value once with how often it came, so that the median is exact and memory
+// Keeps each distinct value once with its number of occurrences, so that the median is exact and memory
 // grows with the number of distinct values, not of runs. An experiment without an analysis is counted
-// by its measurements, which have no limit. A NaN counts as a run outside of its limit and takes no
-// part in minimum, median and maximum.
+// by its measurements, which have no limit. A NaN counts as a run outside its limit and does not
+// enter minimum, median and maximum.
 class RepeatStatistics {
   public:
     explicit RepeatStatistics(std::string name) { _record.name = std::move(name); }

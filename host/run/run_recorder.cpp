@@ -1,27 +1,18 @@
 #include "host/run/run_recorder.h"
 
 #include <algorithm>
-#include <array>
 #include <cstddef>
+#include <iterator>
 #include <utility>
 
-#include "platform/welkin/capture.h"
+#include "host/record/plugin_data.h"
 
 namespace host {
 
 namespace {
 
-// A run with a line a frame must not grow without bound; what is more is counted.
+// The log of a run with a line per frame must not grow without bound; further lines are counted.
 constexpr std::size_t kMostLines = 5000;
-
-constexpr std::array<std::string_view, kTemperatureNames.size()> kTemperatureKeys = {
-    "NTCTemperatureIdle",
-    "NTCTemperatureStandby",
-    "NTCTemperatureActive",
-    "DIETemperatureIdle",
-    "DIETemperatureStandby",
-    "DIETemperatureActive",
-    kRylCaptureStreamMetadata_FloodActiveTemperature};
 
 std::optional<double> numberOf(const platform::Dictionary& metadata, std::string_view key) {
     const platform::Number* number = metadata[key].number();
@@ -76,14 +67,14 @@ void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
     if (!_keepFrames) {
         return;
     }
-    FrameRecord record{
-        .number = frame.number,
-        .presentation = frame.time.seconds(),
-        .delivered = 0,
-        .lightSource = numberOf(frame.metadata, kRylCaptureStreamMetadata_InfraredLightSource),
-        .temperatures = {}};
-    std::transform(kTemperatureKeys.begin(), kTemperatureKeys.end(), record.temperatures.begin(),
-                   [&frame](std::string_view key) { return numberOf(frame.metadata, key); });
+    FrameRecord record{.number = frame.number,
+                       .presentation = frame.time.seconds(),
+                       .delivered = 0,
+                       .lightSource = numberOf(frame.metadata, kLightSource),
+                       .temperatures = {}};
+    std::transform(
+        std::begin(kTemperatures), std::end(kTemperatures), record.temperatures.begin(),
+        [&frame](const TemperatureEntry& entry) { return numberOf(frame.metadata, entry.key); });
     const platform::MutexLock lock(_mutex);
     record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
     _frames.push_back(record);

@@ -1,8 +1,8 @@
-// RunRecorder: writes down what happens around a run while it runs: log lines, frames, images and
-// misuses of the device.
+// RunRecorder: records what happens during a run: log lines, frames, images and broken rules of the
+// device's interfaces.
 //
 // It is the process's log sink and the device's observer for the whole session; begin() and end()
-// frame a run. What happens between two runs (the log line of a time-out that outlived its run, say)
+// enclose a run. What happens between two runs (such as the log line of a time-out that outlived its run)
 // belongs to the next one.
 //
 // Threads  begin() and end() on the session's thread; everything else on any.
@@ -30,7 +30,7 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     RunRecorder(std::function<void(const LogRecord&)> lineLogged, bool keepFrames);
 
     void begin();
-    // Moves what was written down into the record.
+    // Moves what was recorded into the run's record.
     void end(RunRecord& run);
 
     // Frames and images delivered since begin().

@@ -22,23 +22,22 @@ double secondsSince(Clock::time_point start) {
 // One run in the making.
 class Sequence {
   public:
-    Sequence(const ZRLab& lab, const RunPlan& plan, const std::vector<RunListener*>& listeners)
+    Sequence(const ZRLab& lab,
+             const RunPlan& plan,
+             const std::vector<std::shared_ptr<RunListener>>& listeners)
         : _lab(lab), _plan(plan), _listeners(listeners) {}
 
     RunRecord run(std::uint64_t number, RunRecorder& recorder) {
         const Clock::time_point start = Clock::now();
-        _run.name = _plan.name;
-        _run.summary = _plan.summary;
-        _run.isDiagnostic = _plan.isDiagnostic;
+        _run.plan = _plan;
         _run.number = number;
         recorder.begin();
         _tell([](RunListener& listener, const RunRecord& run) { listener.runStarted(run); });
 
         ZRExperimentResultRef result;
-        _part(Part::Experiment, _run.experiment, _plan.experiment, [&] { result = _experiment(); });
-        if (_plan.analysis.has_value() && result != nullptr) {
-            _run.analysis.emplace();
-            _part(Part::Analysis, *_run.analysis, *_plan.analysis, [&] { _analysis(*result); });
+        _part(Part::Experiment, _run.experimentSeconds, [&] { result = _experiment(); });
+        if (_plan.isDiagnostic() && result != nullptr) {
+            _part(Part::Analysis, _run.analysisSeconds.emplace(), [&] { _analysis(*result); });
         }
         recorder.end(_run);
         _run.seconds = secondsSince(start);
@@ -50,22 +49,19 @@ class Sequence {
   private:
     template <class Call>
     void _tell(Call&& call) {
-        for (RunListener* listener : _listeners) {
+        for (const auto& listener : _listeners) {
             call(*listener, _run);
         }
     }
 
     template <class Body>
-    void _part(Part part, PartRecord& record, const PartPlan& plan, Body&& body) {
+    void _part(Part part, double& seconds, Body&& body) {
         const Clock::time_point start = Clock::now();
-        record.name = plan.name;
-        record.summary = plan.summary;
-        record.parameters = plan.parameters;
         _tell([part](RunListener& listener, const RunRecord& run) {
             listener.partStarted(run, part);
         });
         body();
-        record.seconds = secondsSince(start);
+        seconds = secondsSince(start);
         _tell(
             [part](RunListener& listener, const RunRecord& run) { listener.partEnded(run, part); });
     }
@@ -142,7 +138,7 @@ class Sequence {
 
     const ZRLab& _lab;
     const RunPlan& _plan;
-    const std::vector<RunListener*>& _listeners;
+    const std::vector<std::shared_ptr<RunListener>>& _listeners;
     ZRDiagnosticHost _host;
     RunRecord _run;
 };
@@ -153,7 +149,7 @@ RunRecord runOnce(const ZRLab& lab,
                   const RunPlan& plan,
                   std::uint64_t number,
                   RunRecorder& recorder,
-                  const std::vector<RunListener*>& listeners) {
+                  const std::vector<std::shared_ptr<RunListener>>& listeners) {
     return Sequence(lab, plan, listeners).run(number, recorder);
 }
 

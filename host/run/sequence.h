@@ -2,11 +2,13 @@
 #ifndef ZR_HOST_RUN_SEQUENCE_H
 #define ZR_HOST_RUN_SEQUENCE_H
 
+#include <cstdint>
+#include <memory>
 #include <vector>
 
 #include "frame/host_interface.h"
 #include "host/record/run_listener.h"
-#include "host/run/run_plan.h"
+#include "host/record/run_plan.h"
 #include "host/run/run_recorder.h"
 
 namespace host {
@@ -17,12 +19,12 @@ namespace host {
 //   the analysis of the result.
 // A step that fails is recorded with its error, and so is an exception that leaves a step; a failed
 // teardown does not keep the result from being analysed, but there is no verdict then. The listeners
-// are told in order.
+// are called in order.
 RunRecord runOnce(const ZRLab& lab,
                   const RunPlan& plan,
                   std::uint64_t number,
                   RunRecorder& recorder,
-                  const std::vector<RunListener*>& listeners);
+                  const std::vector<std::shared_ptr<RunListener>>& listeners);
 
 }  // namespace host
 

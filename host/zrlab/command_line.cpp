@@ -2,10 +2,14 @@
 
 #include <cctype>
 #include <cstdint>
-#include <filesystem>
 #include <sstream>
-#include <system_error>
+#include <string_view>
 
+#include <fmt/format.h>
+
+#include "host/record/problem.h"
+#include "host/report/report_forms.h"
+#include "host/zrlab/default_plugin.h"
 #include "input/nearest.h"
 
 namespace host {
@@ -18,14 +22,7 @@ CLI::Validator oneOf(std::vector<std::string> words) {
     return validator.description("");
 }
 
-// The module beside the program.
-std::string defaultPlugin() {
-    std::error_code none;
-    const auto program = std::filesystem::read_symlink("/proc/self/exe", none);
-    return (program.parent_path() / "zr_plugin.so").string();
-}
-
-constexpr const char* kRunExamples = R"(Examples:
+constexpr std::string_view kRunExamples = R"(Examples:
   zrlab run VantorMeterixDiagnostic
       Read the sixty event counters once and demand zeros.
   zrlab run VantorFaultDiagnostic --set frameCount=90 --set timeout=10
@@ -38,11 +35,13 @@ constexpr const char* kRunExamples = R"(Examples:
       Run on a faulty device of the gallery; report in a standard form.
   zrlab run VantorFaultDiagnostic --set frameCount=30 --set timeout=5 --speed max --until-fail
       Repeat, faster than real time, until a run does not pass.
+  zrlab run VantorMeterixDiagnostic --device-module ./board.so --device board:rev-b
+      Run on a device of a kind that a device module registers.
 
 Exit status:
   0    every verdict passed, or an experiment ran
   1    a verdict failed
-  2    something could not be run to its end
+  2    something did not complete
   64   the command line is wrong
   130  interrupted)";
 
@@ -53,20 +52,34 @@ constexpr const char* kExamples = R"(Examples:
   zrlab devices
   zrlab help run)";
 
+std::string joined(const std::vector<std::string>& words, std::string_view between) {
+    return fmt::format("{}", fmt::join(words, between));
+}
+
+// The forms of a report as the help shows them.
+std::string formLines() {
+    std::string lines = "Forms of a report:\n";
+    for (const ReportForm& form : reportForms()) {
+        lines += fmt::format("  {:<6}  {:<6}  {}{}\n", form.name, form.ending,
+                             form.streams ? "written as the session goes on" : "written at its end",
+                             form.forOutput ? "" : "; to a file only");
+    }
+    return lines;
+}
+
 }  // namespace
 
 CommandLine::CommandLine()
     : plugin(defaultPlugin())
     , _app(
-          "Runs hardware diagnostics of a plug-in module on a simulated device, judges their "
-          "limits "
-          "and reports.",
+          "Runs hardware diagnostics of a plug-in module on a simulated or a real device, judges "
+          "their limits and reports.",
           "zrlab") {
     _app.require_subcommand(1);
     _app.set_version_flag("--version", "zrlab " ZR_VERSION, "Print the version and exit");
     _app.set_help_flag("-h,--help", "Print this help and exit");
     CLI::App* list = _app.add_subcommand("list", "List experiments, analyses and diagnostics");
-    list->add_flag("--names", namesOnly, "Only the names that can be run, one a line");
+    list->add_flag("--names", namesOnly, "Only the names that can be run, one per line");
     _addPlugin(*list);
 
     CLI::App* describe =
@@ -77,8 +90,11 @@ CommandLine::CommandLine()
 
     _addRun();
 
-    CLI::App* devices = _app.add_subcommand("devices", "List the simulated devices of the gallery");
-    devices->add_flag("--names", namesOnly, "Only the names, one a line");
+    CLI::App* devices = _app.add_subcommand("devices", "List the devices that a run can use");
+    CLI::Option* names = devices->add_flag("--names", namesOnly, "Only the names, one per line");
+    devices->add_flag("--kinds", kindsOnly, "List the kinds of devices and what they can do")
+        ->excludes(names);
+    _addDeviceModule(*devices);
 
     CLI::App* help = _app.add_subcommand("help", "Show the help of a command");
     help->add_option("COMMAND", helpTopic, "The command to explain");
@@ -105,6 +121,15 @@ void CommandLine::_addPlugin(CLI::App& command) {
         ->type_name("PATH");
 }
 
+void CommandLine::_addDeviceModule(CLI::App& command) {
+    command
+        .add_option("--device-module", session.device.modules,
+                    "Load kinds of devices from this module")
+        ->type_name("FILE")
+        ->take_all()
+        ->allow_extra_args(false);
+}
+
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
@@ -115,18 +140,21 @@ void CommandLine::_addRun() {
         ->type_name("PARAM=VALUE")
         ->take_all()
         ->allow_extra_args(false);
-    run.add_option("--device", session.device,
-                   "The simulated device: a name of the gallery or a file")
-        ->type_name("NAME|FILE")
+    run.add_option("--device", session.device.device,
+                   "The device: one that \"zrlab devices\" lists, a file of a simulated one, or\n"
+                   "KIND:WHAT for another kind")
+        ->type_name("NAME|FILE|KIND:WHAT")
         ->capture_default_str();
-    run.add_option(
-           "--speed", session.speed,
-           "Device seconds a second, 0.001 to 100, or max;\ntime-outs stay those of real time")
+    _addDeviceModule(run);
+    run.add_option("--speed", session.device.speed,
+                   "Simulated seconds per real second: 0.001 to 100, or max;\ntime-outs stay those "
+                   "of real time")
         ->type_name("FACTOR|max")
-        ->capture_default_str();
+        ->default_str("1");
+    const std::vector<std::string> formats = outputFormNames();
     run.add_option("--format", session.format, "Form of the report")
-        ->check(oneOf({"text", "json", "jsonl", "junit"}))
-        ->type_name("text|json|jsonl|junit")
+        ->check(oneOf(formats))
+        ->type_name(joined(formats, "|"))
         ->capture_default_str();
     run.add_option("--output", session.output, "Write the report to this file, whole or not at all")
         ->type_name("FILE")
@@ -137,8 +165,7 @@ void CommandLine::_addRun() {
             ""));
     run.add_option(
            "--report", session.reports,
-           "Write a further report; its ending tells the form: .html, .json, .jsonl, .txt or "
-           ".xml (JUnit)")
+           "Write a further report; its ending gives the form:\n" + joined(reportEndings(), ", "))
         ->type_name("FILE")
         ->take_all()
         ->allow_extra_args(false);
@@ -164,7 +191,7 @@ void CommandLine::_addRun() {
         ->type_name("debug|default|error|off")
         ->capture_default_str();
     _addPlugin(run);
-    run.footer(kRunExamples);
+    run.footer(formLines() + "\n" + std::string(kRunExamples));
 }
 
 std::string CommandLine::_explain(const CLI::ParseError& error,
@@ -207,7 +234,7 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
     return given->get_name() + ": " + text;
 }
 
-std::optional<int> CommandLine::read(int count, const char* const* arguments) {
+std::optional<std::string> CommandLine::read(int count, const char* const* arguments) {
     for (int at = 0; at < count; ++at) {
         session.commandLine += (at > 0 ? " " : "") + std::string(at > 0 ? arguments[at] : "zrlab");
     }
@@ -215,12 +242,11 @@ std::optional<int> CommandLine::read(int count, const char* const* arguments) {
     try {
         _app.parse(count, arguments);
     } catch (const CLI::Success& success) {
-        std::ostringstream told;
-        _app.exit(success, told, told);
-        return Terminal::shared().output(told.str()) ? kExitPassed : kExitError;
+        std::ostringstream answer;
+        _app.exit(success, answer, answer);
+        return answer.str();
     } catch (const CLI::ParseError& error) {
-        Terminal::shared().complain(_explain(error, count, arguments));
-        return kExitUsage;
+        throw Problem(kExitUsage, _explain(error, count, arguments));
     }
     return std::nullopt;
 }

@@ -9,7 +9,7 @@
 
 #include <CLI/CLI.hpp>
 
-#include "host/zrlab/session.h"
+#include "host/zrlab/session_options.h"
 
 namespace host {
 
@@ -19,9 +19,9 @@ class CommandLine {
     CommandLine(const CommandLine&) = delete;
     CommandLine& operator=(const CommandLine&) = delete;
 
-    // Reads the arguments. Returns nothing when a command is to be carried out, else the exit status:
-    // what was asked for (help, the version) or what is wrong has been told.
-    std::optional<int> read(int count, const char* const* arguments);
+    // Reads the arguments. Returns nothing when a command is to be carried out, else the text that was
+    // asked for: help, the version. Throws a Problem (kExitUsage) when the line is wrong.
+    std::optional<std::string> read(int count, const char* const* arguments);
 
     // The command that was given.
     std::string command() const;
@@ -35,6 +35,7 @@ class CommandLine {
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe
     bool namesOnly = false;             // of list and devices
+    bool kindsOnly = false;             // of devices
     std::string helpTopic;              // of help
     std::string shell;                  // of completion
     SessionOptions session;             // of run
@@ -42,6 +43,7 @@ class CommandLine {
   private:
     void _addRun();
     void _addPlugin(CLI::App& command);
+    void _addDeviceModule(CLI::App& command);
     std::string _explain(const CLI::ParseError& error, int count, const char* const* arguments);
 
     CLI::App _app;

@@ -54,7 +54,8 @@ std::string wordsFunction(const CLI::App& app) {
            "        --device) words=\"$(\"$4\" devices --names 2>/dev/null) $(compgen -f -- \"$3\" "
            "2>/dev/null)\";;\n"
            "        --set|--speed|--repeat) ;;\n"
-           "        --output|--report|--plugin) words=\"$(compgen -f -- \"$3\" 2>/dev/null)\";;\n"
+           "        --output|--report|--plugin|--device-module) words=\"$(compgen -f -- \"$3\" "
+           "2>/dev/null)\";;\n"
            "        completion) words=\"bash zsh\";;\n"
            "        help|zrlab) words=\"" +
            commands +
@@ -88,7 +89,7 @@ std::string completionScript(const CLI::App& app, const std::string& shell) {
                "_zrlab() {\n"
                "    local last=\"${words[CURRENT-1]}\"\n"
                "    case \"$last\" in\n"
-               "        --output|--report|--plugin) _files; return;;\n"
+               "        --output|--report|--plugin|--device-module) _files; return;;\n"
                "    esac\n"
                "    [ \"$CURRENT\" -eq 2 ] && last=zrlab\n"
                "    compadd -- ${(f)\"$(_zrlab_words \"${words[2]}\" \"$last\" \"\" "

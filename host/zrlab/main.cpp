@@ -1,15 +1,17 @@
-// zrlab: loads a plug-in module, runs its diagnostics on a simulated device, judges and reports.
+// zrlab: loads a plug-in module, runs its diagnostics on a device, judges and reports.
 #include <algorithm>
 #include <exception>
 #include <string>
 
 #include <fmt/format.h>
 
-#include "devices/simulator/profile/reader.h"
 #include "frame/host_interface.h"
+#include "host/record/problem.h"
+#include "host/record/run_text.h"
 #include "host/run/module_loader.h"
-#include "host/run/run_plan.h"
+#include "host/run/planner.h"
 #include "host/zrlab/command_line.h"
+#include "host/zrlab/device_choice.h"
 #include "host/zrlab/session.h"
 #include "host/zrlab/terminal.h"
 #include "input/nearest.h"
@@ -18,14 +20,11 @@ namespace host {
 
 namespace {
 
-int complain(int status, const std::string& problem) {
-    Terminal::shared().complain(problem);
-    return status;
-}
-
 int print(const std::string& text) {
-    return Terminal::shared().output(text) ? kExitPassed
-                                           : complain(kExitError, "cannot write standard output");
+    if (!Terminal::shared().output(text)) {
+        throw Problem(kExitError, "cannot write standard output");
+    }
+    return kExitPassed;
 }
 
 std::string parameterLines(const ZRDescription& description) {
@@ -90,24 +89,34 @@ int describe(const std::vector<std::string>& names) {
             std::vector<std::string> known = runnableNames(lab);
             const auto analyses = lab.analysisNames();
             known.insert(known.end(), analyses.begin(), analyses.end());
-            return complain(kExitUsage, "unknown experiment, analysis or diagnostic \"" + name +
-                                            "\"" + input::didYouMean(name, known));
+            throw Problem(kExitUsage, "unknown experiment, analysis or diagnostic \"" + name +
+                                          "\"" + input::didYouMean(name, known));
         }
         out += (out.empty() ? "" : "\n") + text;
     }
     return print(out);
 }
 
-int devices(bool namesOnly) {
-    const auto entries = simulator::gallery();
+int deviceKinds() {
+    std::string out;
+    for (const devices::Kind& kind : devices::kinds()) {
+        out += fmt::format("{:<12}  {}; {}{}\n", kind.name, kind.summary,
+                           kind.takesSpeed ? "takes --speed" : "runs in real time",
+                           kind.hasFaults ? ", can be made to fail" : "");
+    }
+    return print(out);
+}
+
+int listedDevices(bool namesOnly) {
+    const auto listed = listDevices();
     std::size_t width = 0;
-    for (const auto& entry : entries) {
-        width = std::max(width, entry.name.size());
+    for (const ListedDevice& device : listed) {
+        width = std::max(width, device.name.size());
     }
     std::string out;
-    for (const auto& entry : entries) {
-        out += namesOnly ? entry.name + "\n"
-                         : fmt::format("{:<{}}  {}\n", entry.name, width, entry.summary);
+    for (const ListedDevice& device : listed) {
+        out += namesOnly ? device.name + "\n"
+                         : fmt::format("{:<{}}  {}\n", device.name, width, device.summary);
     }
     return print(out);
 }
@@ -120,16 +129,14 @@ int help(const std::string& topic) {
     }
     const CLI::App* command = commandLine.find(topic);
     if (command == nullptr) {
-        return complain(kExitUsage, "help: unknown command \"" + topic + "\"" +
-                                        input::didYouMean(topic, commandLine.commandNames()));
+        throw Problem(kExitUsage, "help: unknown command \"" + topic + "\"" +
+                                      input::didYouMean(topic, commandLine.commandNames()));
     }
     return print(command->help(commandLine.app().get_name()));
 }
 
 int withPlugin(const CommandLine& commandLine) {
-    if (const auto problem = loadModule(commandLine.plugin)) {
-        return complain(kExitError, *problem);
-    }
+    loadModule(commandLine.plugin);
     for (const auto& refusal : ZRLab::defaultLab().refusals()) {
         Terminal::shared().complain(
             fmt::format("the {} name \"{}\" is taken; the module's second "
@@ -143,18 +150,20 @@ int withPlugin(const CommandLine& commandLine) {
     if (command == "describe") {
         return describe(commandLine.subjects);
     }
+    registerDeviceKinds(commandLine.session.device.modules);
     return runSession(commandLine.session);
 }
 
 int run(int count, const char* const* arguments) {
     Terminal::shared().endOnInterrupt();
     CommandLine commandLine;
-    if (const auto status = commandLine.read(count, arguments)) {
-        return *status;
+    if (const auto answer = commandLine.read(count, arguments)) {
+        return print(*answer);
     }
     const std::string command = commandLine.command();
     if (command == "devices") {
-        return devices(commandLine.namesOnly);
+        registerDeviceKinds(commandLine.session.device.modules);
+        return commandLine.kindsOnly ? deviceKinds() : listedDevices(commandLine.namesOnly);
     }
     if (command == "help") {
         return help(commandLine.helpTopic);
@@ -173,9 +182,15 @@ int run(int count, const char* const* arguments) {
 }  // namespace host
 
 int main(int count, char** arguments) {
+    const auto complain = [](int status, const char* problem) {
+        host::Terminal::shared().complain(problem);
+        return status;
+    };
     try {
         return host::run(count, arguments);
+    } catch (const host::Problem& problem) {
+        return complain(problem.status(), problem.what());
     } catch (const std::exception& exception) {
-        return host::complain(host::kExitError, exception.what());
+        return complain(host::kExitError, exception.what());
     }
 }

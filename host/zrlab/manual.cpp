@@ -7,7 +7,7 @@ namespace host {
 
 namespace {
 
-// Text as man(1) takes it: no escape and no control line by accident.
+// Text for man(1), without an accidental escape or control line.
 std::string escaped(std::string_view text) {
     std::string out;
     for (const char c : text) {
@@ -47,7 +47,7 @@ std::string optionsOf(const CLI::App& app) {
     return out;
 }
 
-// A footer is set as it stands: it holds examples and tables.
+// A footer is set without filling: it holds examples and tables.
 std::string footerOf(const CLI::App& app) {
     return app.get_footer().empty() ? "" : ".PP\n.nf\n" + escaped(app.get_footer()) + "\n.fi\n";
 }

@@ -3,6 +3,8 @@
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
+#include <functional>
+#include <memory>
 #include <system_error>
 
 #include <fcntl.h>
@@ -10,25 +12,19 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "host/record/problem.h"
 #include "host/zrlab/terminal.h"
 
 namespace host {
 
 namespace {
 
-std::string problemWith(const std::string& path, int number) {
-    return "cannot write " + path + ": " + std::generic_category().message(number);
+[[noreturn]] void fail(const std::string& path, const std::string& reason) {
+    throw Problem(kExitError, "cannot write " + path + ": " + reason);
 }
 
-bool writeAll(int file, std::string_view content) {
-    while (!content.empty()) {
-        const ssize_t written = ::write(file, content.data(), content.size());
-        if (written < 0 && errno != EINTR) {
-            return false;
-        }
-        content.remove_prefix(written > 0 ? static_cast<std::size_t>(written) : 0);
-    }
-    return true;
+[[noreturn]] void fail(const std::string& path, int number) {
+    fail(path, std::generic_category().message(number));
 }
 
 // Where a report goes: what stands there now, its links followed.
@@ -44,7 +40,7 @@ struct Target {
     bool isFolder() const { return exists && S_ISDIR(status.st_mode); }
     bool isSpecial() const { return exists && !S_ISREG(status.st_mode); }
 
-    // What a file made in the ordinary way would get, unless there is one already.
+    // The mode that a file made in the ordinary way would get, unless there is one already.
     mode_t mode() const {
         if (exists) {
             return status.st_mode & 07777;
@@ -77,7 +73,7 @@ class Temporary {
     bool isOpen() const { return _file >= 0; }
 
     bool replace(const Target& target, std::string_view content) {
-        if (!isOpen() || !writeAll(_file, content) || fchmod(_file, target.mode()) != 0 ||
+        if (!isOpen() || !writeWhole(_file, content) || fchmod(_file, target.mode()) != 0 ||
             fsync(_file) != 0 || rename(_path.c_str(), target.path.c_str()) != 0) {
             return false;
         }
@@ -96,31 +92,32 @@ bool writeSpecial(const Target& target, std::string_view content) {
     if (file < 0) {
         return false;
     }
-    const bool written = writeAll(file, content);
+    const bool written = writeWhole(file, content);
     return close(file) == 0 && written;
 }
 
 }  // namespace
 
-std::optional<std::string> cannotWrite(const std::string& path) {
+void requireWritable(const std::string& path) {
     const Target target(path);
     if (target.isFolder()) {
-        return problemWith(path, EISDIR);
+        fail(path, EISDIR);
     }
-    if (target.isSpecial()) {
-        return access(target.path.c_str(), W_OK) == 0 ? std::nullopt
-                                                      : std::optional(problemWith(path, errno));
+    const bool isWritable =
+        target.isSpecial() ? access(target.path.c_str(), W_OK) == 0 : Temporary(target).isOpen();
+    if (!isWritable) {
+        fail(path, errno);
     }
-    const Temporary temporary(target);
-    return temporary.isOpen() ? std::nullopt : std::optional(problemWith(path, errno));
 }
 
-std::optional<std::string> writeFile(const std::string& path, std::string_view content) {
+void writeFile(const std::string& path, std::string_view content) {
     const platform::MutexLock lock(Terminal::shared().mutex());
     const Target target(path);
     const bool written = target.isSpecial() ? writeSpecial(target, content)
                                             : Temporary(target).replace(target, content);
-    return written ? std::nullopt : std::optional(problemWith(path, errno));
+    if (!written) {
+        fail(path, errno);
+    }
 }
 
 Spool::Spool() : _file(std::tmpfile()), _lost(_file == nullptr) {}
@@ -135,22 +132,23 @@ void Spool::append(std::string_view text) {
     _lost = _lost || std::fwrite(text.data(), 1, text.size(), _file) != text.size();
 }
 
-std::optional<std::string> Spool::writeTo(const std::string& path) {
+void Spool::writeTo(const std::string& path) {
     if (_lost || std::fflush(_file) != 0) {
-        return "cannot write " + path + ": no room for it in the folder of temporary files";
+        fail(path, "no room for it in the folder of temporary files");
     }
     const long size = std::ftell(_file);
     if (size == 0) {
-        return writeFile(path, "");
+        writeFile(path, "");
+        return;
     }
     const auto length = static_cast<std::size_t>(size);
     void* pages = mmap(nullptr, length, PROT_READ, MAP_PRIVATE, fileno(_file), 0);
     if (pages == MAP_FAILED) {
-        return problemWith(path, errno);
+        fail(path, errno);
     }
-    auto problem = writeFile(path, {static_cast<const char*>(pages), length});
-    munmap(pages, length);
-    return problem;
+    const std::unique_ptr<void, std::function<void(void*)>> unmapped(
+        pages, [length](void* mapped) { munmap(mapped, length); });
+    writeFile(path, {static_cast<const char*>(pages), length});
 }
 
 }  // namespace host

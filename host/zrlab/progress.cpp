@@ -19,17 +19,15 @@ constexpr std::chrono::seconds kPlainPeriod{5};
 
 Progress::Progress(const RunPlan& plan, const RunRecorder& recorder, std::string prefix)
     : _recorder(recorder), _prefix(std::move(prefix)) {
-    const std::pair<const char*, const char*> counted[] = {{"frameCount", "frames"},
-                                                           {"images", "images"}};
-    for (const auto& [parameter, what] : counted) {
-        const platform::Number wanted = plan.experimentParameter(parameter);
+    for (const CountParameter& count : kCountParameters) {
+        const platform::Number wanted = plan.experiment.parameter(count.parameter);
         if (wanted.isPresent()) {
-            _what = what;
+            _count = &count;
             _wanted = wanted.asDouble();
         }
     }
-    _timeout = plan.experimentParameter("timeout").asDouble();
-    if (!_what.empty()) {
+    _timeout = plan.experiment.parameter(kTimeoutParameter).asDouble();
+    if (_count != nullptr) {
         _thread = std::thread([this] { _show(); });
     }
 }
@@ -59,7 +57,7 @@ void Progress::_show() {
             continue;
         }
         next += period;
-        // The lock stays held: it guards nothing but the end, which has to wait for this line.
+        // The lock stays held: it guards only the end, which has to wait for this line.
         if (onTerminal) {
             terminal.status(_text());
         } else {
@@ -71,10 +69,10 @@ void Progress::_show() {
 std::string Progress::_text() const {
     const double elapsed =
         std::chrono::duration<double>(std::chrono::steady_clock::now() - _began).count();
-    const auto count = static_cast<double>(_what == "frames" ? _recorder.frames()  //
-                                                             : _recorder.images());
-    std::string text = fmt::format("{}{:.0f} of {:.6g} {}, {:.1f} a second", _prefix, count,
-                                   _wanted, _what, elapsed > 0 ? count / elapsed : 0.0);
+    const auto count = static_cast<double>(_count->counted == Counted::Frames ? _recorder.frames()
+                                                                              : _recorder.images());
+    std::string text = fmt::format("{}{:.0f} of {:.6g} {}, {:.1f} per second", _prefix, count,
+                                   _wanted, _count->plural, elapsed > 0 ? count / elapsed : 0.0);
     const double left = std::max(std::ceil(_timeout - elapsed), 0.0);
     if (_timeout >= 0 && std::isfinite(left)) {
         text += fmt::format(", {:.6g} s until the time-out", left);

@@ -6,7 +6,8 @@
 #include <string>
 #include <thread>
 
-#include "host/run/run_plan.h"
+#include "host/record/plugin_data.h"
+#include "host/record/run_plan.h"
 #include "host/run/run_recorder.h"
 #include "platform/mutex.h"
 
@@ -14,8 +15,8 @@ namespace host {
 
 // From construction to destruction, shows frames or images of the requested count, their rate and the
 // time left until the time-out: on a terminal as a status line ten times a second, elsewhere as a
-// plain line every five seconds, so that a short run prints none. A plan without a "frameCount" or
-// "images" parameter shows nothing.
+// plain line every five seconds, so that a short run prints none. A plan without a parameter
+// that counts something shows nothing.
 class Progress {
   public:
     // `prefix` stands before the line; "run 3 of 100", say. The recorder must outlive the progress.
@@ -31,7 +32,7 @@ class Progress {
     const RunRecorder& _recorder;
     const std::string _prefix;
     const std::chrono::steady_clock::time_point _began = std::chrono::steady_clock::now();
-    std::string _what;  // "frames" or "images"; empty when there is nothing to show
+    const CountParameter* _count = nullptr;  // null when there is nothing to show
     double _wanted = 0;
     double _timeout = 0;  // seconds
 

@@ -18,26 +18,23 @@ namespace {
 
 constexpr std::string_view kClearLine = "\r\x1b[K";
 
-bool writeWhole(int file, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = ::write(file, text.data(), text.size());
-        if (written < 0 && errno == EINTR) {
-            continue;
-        }
-        if (written < 0) {
-            return false;
-        }
-        text.remove_prefix(static_cast<std::size_t>(written));
-    }
-    return true;
-}
-
 std::string_view environment(const char* name) {
     const char* value = std::getenv(name);
     return value != nullptr ? value : "";
 }
 
 }  // namespace
+
+bool writeWhole(int file, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = ::write(file, text.data(), text.size());
+        if (written < 0 && errno != EINTR) {
+            return false;
+        }
+        text.remove_prefix(written > 0 ? static_cast<std::size_t>(written) : 0);
+    }
+    return true;
+}
 
 Terminal::Terminal()
     : _errorIsTerminal(isatty(STDERR_FILENO) == 1 && environment("TERM") != "dumb") {}
@@ -78,8 +75,8 @@ void Terminal::endOnInterrupt() {
     sigaddset(&signals, SIGINT);
     sigaddset(&signals, SIGTERM);
     pthread_sigmask(SIG_BLOCK, &signals, nullptr);  // inherited by every thread started from now on
-    std::signal(SIGPIPE, SIG_IGN);                  // whoever writes sees it fail
-    std::signal(SIGXFSZ, SIG_IGN);                  // so too beyond a limit of file sizes
+    std::signal(SIGPIPE, SIG_IGN);                  // the write fails instead
+    std::signal(SIGXFSZ, SIG_IGN);                  // the same beyond a limit of file sizes
     std::thread([this, signals] {
         int signal = 0;
         sigwait(&signals, &signal);
@@ -132,7 +129,7 @@ void Terminal::status(std::string_view text) {
     if (!_errorIsTerminal || (text.empty() && !_statusShown)) {
         return;
     }
-    // One column stays free, or some terminals begin another line.
+    // One column stays free, because some terminals begin another line.
     const std::string_view shown = cutTo(text, widthOf(STDERR_FILENO) - 1);
     writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(shown));
     _statusShown = !text.empty();

@@ -13,6 +13,9 @@
 
 namespace host {
 
+// Writes all of the text to an open file; false when that fails, with errno set.
+bool writeWhole(int file, std::string_view text);
+
 enum class Colour { Automatic, Always, Never };
 
 class Terminal {
@@ -20,7 +23,7 @@ class Terminal {
     // The program's terminal; lives until the process ends.
     static Terminal& shared();
 
-    // Tells a problem in one line on standard error: "zrlab: …".
+    // Reports a problem in one line on standard error: "zrlab: …".
     void complain(std::string_view problem);
 
     // From now on an interrupt (Ctrl-C) or a request to terminate ends the program at once with exit

@@ -9,11 +9,12 @@
 //          The last reference to a stream or a device may go inside one of the stream's own handlers.
 // Threads  Any. A client mostly calls one operation at a time, but a bad first frame makes it read
 //          the error counters and stop the stream while start() has not returned yet. Handlers are
-//          called on threads of the service's own, at most one frame handler at a time for a stream.
+//          called on threads of the service's own, at most one frame handler at a time per stream.
 //
 // What an implementation owes its callers:
 //   - stop() may be called inside a lock of the caller's, and may wait until a handler in progress
-//     has returned. So handlers must not take that lock: they hand the work on and return.
+//     has returned. So handlers must not take that lock: they hand the work on and return. They do
+//     not throw.
 //   - Dropping a stream or a device, or stopping it, inside one of its handlers does not wait for that
 //     handler.
 //   - After stop() a few frames that were already on their way may still be delivered.
@@ -34,11 +35,11 @@
 #include "platform/value.h"
 
 // A frame's image and its presentation time. The buffer is lent for the length of the call; copy the
-// reference to keep it.
+// reference to keep it. A null buffer counts as one without attachments. Does not throw.
 using WLRylFrameHandler =
     std::function<void(const platform::ImageBufferRef& buffer, platform::MediaTime time)>;
 
-// An event's code, its time and a value that depends on the code.
+// An event's code, its time and a value that depends on the code. Does not throw.
 using WLRylEventHandler =
     std::function<void(std::int32_t event, platform::MediaTime time, std::int64_t info)>;
 
@@ -50,9 +51,9 @@ inline constexpr std::string_view kRylCaptureStreamProperty_MultipleOutputSuppor
     "ryl.stream.multiple-outputs";
 inline constexpr std::string_view kRylCaptureStreamProperty_FormatIndex = "ryl.stream.format-index";
 inline constexpr std::string_view kRylCaptureStreamProperty_MinimumFrameRate =
-    "ryl.stream.minimum-frame-rate";  // frames a second
+    "ryl.stream.minimum-frame-rate";  // frames per second
 inline constexpr std::string_view kRylCaptureStreamProperty_MaximumFrameRate =
-    "ryl.stream.maximum-frame-rate";  // frames a second
+    "ryl.stream.maximum-frame-rate";  // frames per second
 inline constexpr std::string_view kRylCaptureStreamProperty_VideoOutputConfigurations =
     "ryl.stream.output-configurations";
 inline constexpr std::string_view kRylCaptureStreamProperty_VideoOutputsEnabled =
@@ -127,7 +128,8 @@ class WLRylCaptureDevice {
   public:
     virtual ~WLRylCaptureDevice() = default;
 
-    // Every stream of the device in a fixed order; no list on failure.
+    // Every stream of the device in a fixed order; no list on failure. A null entry counts as a stream
+    // whose properties cannot be read.
     virtual std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot error) = 0;
 
     // Asks for control of the listed streams, which writing a property needs.

@@ -44,7 +44,8 @@ class WLIOHIDDeviceInterface {
                                         platform::ErrorSlot error) = 0;
 
     // Starts and stops the delivery of callbacks on the run loop in the mode. Stopping what was not
-    // started does nothing.
+    // started does nothing. To unscheduleFromRunLoop() a null run loop stands for the one that the
+    // device was scheduled on and that is gone.
     virtual void scheduleWithRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                                      std::string_view mode) = 0;
     virtual void unscheduleFromRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
@@ -71,7 +72,7 @@ class WLHIDManager {
 
 namespace platform {
 
-// The entries of a matching dictionary: a device's primary usage, as its report descriptor tells it.
+// The entries of a matching dictionary: a device's primary usage, as its report descriptor states it.
 inline constexpr std::string_view kHidPrimaryUsagePage = "PrimaryUsagePage";
 inline constexpr std::string_view kHidPrimaryUsage = "PrimaryUsage";
 

@@ -47,7 +47,7 @@ class WLMeterixChannel {
         : _description(std::move(description)), _count(count) {}
 
     const WLMeterixChannelDescription& channelDescription() const { return *_description; }
-    // The same, for a facility that makes another channel of it.
+    // The same, shared: for a facility that makes another channel with it.
     const WLMeterixChannelDescriptionRef& sharedDescription() const { return _description; }
     // The channel's value in the snapshot; absent when the channel has no count.
     const platform::Number& count() const { return _count; }
@@ -81,7 +81,7 @@ class MeterixFacility {
     // Every channel of the system that carries a single count.
     virtual std::shared_ptr<const MeterixChannels> simpleChannels(ErrorSlot error) = 0;
 
-    // The channels' counts now, one sample a channel, in the channels' order.
+    // The channels' counts now, one sample per channel, in the channels' order.
     virtual std::shared_ptr<const MeterixSamples> sample(const MeterixChannels& channels,
                                                          ErrorSlot error) = 0;
 
@@ -102,7 +102,7 @@ class WLMeterixSnapshot {
 
     explicit operator bool() const { return _samples != nullptr; }
 
-    // One sample a channel, in the report's order; none when the snapshot is absent.
+    // One sample per channel, in the report's order; none when the snapshot is absent.
     const platform::MeterixSamples& samples() const;
 
     // The difference of this snapshot and an earlier one of the same report; absent when either is.

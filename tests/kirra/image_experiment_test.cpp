@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <limits>
 #include <optional>
+#include <stdexcept>
 #include <thread>
 
 #include "platform/services.h"
@@ -194,6 +195,31 @@ TEST_F(ImageExperiment, RunsOnlyOnTheThreadOfItsSetup) {
     }).join();
     EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
     EXPECT_THAT(journal(), ElementsAre());
+}
+
+// Whatever throws on the run loop: a source of another user's, or an observer that is notified of the
+// exit before the experiment's own.
+TEST_F(ImageExperiment, ClosesTheSensorAndGoesWhenTheRunThrows) {
+    const auto source =
+        std::make_shared<platform::RunLoopSource>([] { throw std::runtime_error("source"); });
+    const auto observer = std::make_shared<platform::RunLoopObserver>(platform::RunLoopObserver{
+        platform::RunLoopExit, -1, [](std::uint32_t) { throw std::runtime_error("observer"); }});
+    for (const bool atExit : {false, true}) {
+        install();
+        const auto experiment = make(1, kGenerous);
+        if (atExit) {
+            runLoop->addObserver(observer, platform::kRunLoopDefaultMode);
+        } else {
+            runLoop->addSource(source, platform::kRunLoopDefaultMode);
+            source->signal();
+        }
+        EXPECT_THROW(experiment->run(nullptr), std::runtime_error);
+        EXPECT_EQ(journal(), joined(kOpening, kClosing));
+        runLoop->removeSource(source, platform::kRunLoopDefaultMode);
+        runLoop->removeObserver(observer, platform::kRunLoopDefaultMode);
+        EXPECT_EQ(runLoop->run(platform::kRunLoopDefaultMode, kGenerous), RunLoopOutcome::Finished);
+        EXPECT_EQ(journal(), joined(kOpening, kClosing));  // no observer is left
+    }
 }
 
 // Nothing clears the images, nothing is left on the run loop that would act on the next run, and a

@@ -25,7 +25,7 @@ using ::testing::IsEmpty;
 
 constexpr std::string_view kMode = platform::kRunLoopDefaultMode;
 
-// Writes what it is told into the journal of the bench, and does something about it.
+// Writes what it receives into the journal of the bench, and does something about it.
 struct Delegate final : ZRKirraImageStreamDelegate {
     explicit Delegate(Journal& into) : journal(into) {}
 
@@ -191,29 +191,29 @@ TEST_F(ImageStream, ClosesAnyNumberOfTimes) {
     std::thread([&] { orphan->openWithRunLoop(RunLoop::forThisThread(), nullptr); }).join();
     journal().clear();
     orphan->close();
-    EXPECT_THAT(journal(), ElementsAre("no callback", "close"));
+    EXPECT_EQ(journal(), kClosing);
 }
 
 TEST_F(ImageStream, LateReportsGoNowhere) {
     open();
     const std::vector<std::byte> data(792);
     const auto report = callback();
-    const auto tell = [&] {
+    const auto deliver = [&] {
         report(118, data, nullptr);
         report(118, data, test::sensorError("late"));
     };
     EXPECT_EQ(stream->delegate(), delegate);
     delegate = nullptr;
     EXPECT_EQ(stream->delegate(), nullptr);
-    tell();  // the delegate is gone
+    deliver();  // the delegate is gone
     EXPECT_EQ(journal(), kClosing);
     journal().clear();
     stream = nullptr;
-    tell();  // the stream is gone
+    deliver();  // the stream is gone
     EXPECT_THAT(journal(), IsEmpty());
 }
 
-// A delegate that drops the stream and itself in the middle of being told.
+// A delegate that drops the stream and itself in the middle of a call.
 TEST_F(ImageStream, MayDieInsideItsOwnCallback) {
     for (const ErrorRef& reported : {ErrorRef(), test::sensorError("fatal")}) {
         stream = std::make_shared<ZRKirraImageStream>();

@@ -11,7 +11,7 @@ thread_local bool nextAllocationFails = false;
 
 }  // namespace
 
-// Not inlined: g++ takes the pair for a mismatch otherwise.
+// Not inlined: otherwise g++ reports the pair as a mismatch.
 [[gnu::noinline]] void* operator new(std::size_t size) {
     void* memory = std::exchange(nextAllocationFails, false) ? nullptr : std::malloc(size);
     return memory != nullptr ? memory : throw std::bad_alloc();

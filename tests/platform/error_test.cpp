@@ -11,7 +11,7 @@ using platform::ErrorSlot;
 using test::IsError;
 using test::IsPlainError;
 
-// An object that tells how often its text was asked for.
+// An object that counts how often its text was asked for.
 struct Counted {
     int& texts;
     std::string text() const { return "text " + std::to_string(++texts); }

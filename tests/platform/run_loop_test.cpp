@@ -13,6 +13,8 @@
 #include <thread>
 #include <vector>
 
+#include <unistd.h>
+
 #include <gtest/gtest.h>
 
 namespace {
@@ -223,20 +225,121 @@ INSTANTIATE_TEST_SUITE_P(, ScriptedRunLoop, ::testing::ValuesIn(kRows), [](const
     return info.param.name;
 });
 
-TEST(RunLoop, TellsTheExitWhenACallbackOrAnObserverThrows) {
-    onNewThread([] {
+// 'e' and 'l' are exit observers, before and after the one that writes '>'.
+TEST(RunLoop, NotifiesEveryExitObserverAndThrowsTheFirstException) {
+    const auto throwing = [](const char* what) {
+        return [what] { throw std::runtime_error(what); };
+    };
+    const struct {
+        bool entryThrows, callbackThrows, exitThrows;
+        const char* thrown;
+        const char* events;
+    } kCases[] = {
+        {false, true, false, "callback", "<.ae>l"}, {true, true, false, "entry", "<e>l"},
+        {false, false, true, "early", "<.ae>l"},    {false, true, true, "callback", "<.ae>l"},
+        {true, false, true, "entry", "<e>l"},
+    };
+    for (const auto& [entryThrows, callbackThrows, exitThrows, thrown, events] : kCases) {
+        onNewThread([&, entryThrows = entryThrows, callbackThrows = callbackThrows,
+                     exitThrows = exitThrows, thrown = thrown, events = events] {
+            Script script;
+            const auto exitObserver = [&](char letter, const char* what, int order) {
+                return script.observe(
+                    platform::RunLoopExit,
+                    [&script, letter, what, exitThrows](std::uint32_t) {
+                        script.events += letter;
+                        if (exitThrows) {
+                            throw std::runtime_error(what);
+                        }
+                    },
+                    order);
+            };
+            const auto early = exitObserver('e', "early", -11);
+            const auto late = exitObserver('l', "late", 11);
+            script.writeDownActivities(kRunLoopDefaultMode);
+            const auto entry = script.observe(platform::RunLoopEntry, [&](std::uint32_t) {
+                if (entryThrows) {
+                    throwing("entry")();
+                }
+            });
+            script.ready('a',
+                         callbackThrows ? std::function<void()>(throwing("callback")) : nullptr);
+            try {
+                script.loop->run(kRunLoopDefaultMode, 0);
+                ADD_FAILURE() << "nothing was thrown";
+            } catch (const std::runtime_error& caught) {
+                EXPECT_STREQ(caught.what(), thrown);
+            }
+            EXPECT_EQ(script.events, events);
+            for (const auto& observer : {early, late, entry}) {
+                script.loop->removeObserver(observer, kRunLoopDefaultMode);
+            }
+            script.remove('a'), script.source('b');
+            script.events.clear();
+            script.loop->stop();  // no run is left in progress that it could reach
+            EXPECT_EQ(script.loop->run(kRunLoopDefaultMode, 0), TimedOut);
+            EXPECT_EQ(script.events, "<.>");
+        });
+    }
+}
+
+TEST(RunLoop, RunsOnItsOwnThreadOnly) {
+    std::shared_ptr<RunLoop> kept;
+    const auto runElsewhere = [&kept] {
+        onNewThread([&] { EXPECT_THROW(kept->run(kRunLoopDefaultMode, 0), std::logic_error); });
+    };
+    onNewThread([&] {
         Script script;
-        script.writeDownActivities(kRunLoopDefaultMode);
-        script.ready('a', [] { throw std::runtime_error("callback"); });
-        EXPECT_THROW(script.loop->run(kRunLoopDefaultMode, 0), std::runtime_error);
-        const auto observer = script.observe(
-            platform::RunLoopEntry, [](std::uint32_t) { throw std::logic_error("observer"); });
-        EXPECT_THROW(script.loop->run(kRunLoopDefaultMode, 0), std::logic_error);
-        script.loop->removeObserver(observer, kRunLoopDefaultMode);
-        script.loop->stop();  // no run is left in progress that it could reach
+        script.writeDownActivities(kRunLoopCommonModes);
+        script.ready('a');
+        kept = script.loop;
+        runElsewhere();
+        EXPECT_EQ(script.events, "");
         EXPECT_EQ(script.loop->run(kRunLoopDefaultMode, 0), TimedOut);
-        EXPECT_EQ(script.events, "<.a><><.>");
+        EXPECT_EQ(script.events, "<.a>");
     });
+    runElsewhere();  // its thread is gone
+}
+
+// Asks for the thread's loop when it is destroyed, and says whether it found what it must.
+struct AsksAtItsEnd {
+    std::function<void(bool)> answer;
+    ~AsksAtItsEnd() {
+        const bool none = RunLoop::current() == nullptr;
+        const auto made = RunLoop::forThisThread();
+        bool refused = false;
+        try {
+            made->run(kRunLoopDefaultMode, 0);
+        } catch (const std::logic_error&) {
+            refused = true;
+        }
+        answer(none && made != RunLoop::forThisThread() && refused);
+    }
+};
+
+TEST(RunLoop, IsGoneForWhatTheEndOfItsThreadDestroys) {
+    int answers = 0;
+    const auto count = [&answers](bool right) { answers += right ? 1 : 100; };
+    onNewThread([&] {
+        static thread_local AsksAtItsEnd before;  // and so destroyed after the loop
+        before.answer = count;
+        const auto owned = std::make_shared<AsksAtItsEnd>();
+        owned->answer = count;
+        const auto loop = RunLoop::forThisThread();
+        loop->addSource(std::make_shared<RunLoopSource>([owned] {}), kRunLoopDefaultMode);
+    });
+    EXPECT_EQ(answers, 2);
+}
+
+TEST(RunLoopDeathTest, IsGoneForAStaticObject) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_EXIT(
+        {
+            RunLoop::forThisThread();
+            static const AsksAtItsEnd asks{[](bool right) { _exit(right ? 42 : 1); }};
+            std::exit(2);
+        },
+        ::testing::ExitedWithCode(42), "");
 }
 
 TEST(RunLoop, WaitsForItsTimeLimitWithoutWork) {
@@ -330,7 +433,7 @@ TEST(RunLoop, MayEndWhileItsSourcesAreSignalled) {
             source->signal();
         }
     });
-    for (int i = 0; i < 100; ++i) {
+    for (int i = 0; i < 100 || served == 0; ++i) {
         onNewThread([&] {
             const auto loop = RunLoop::forThisThread();
             loop->addSource(source, kRunLoopDefaultMode);
@@ -339,7 +442,6 @@ TEST(RunLoop, MayEndWhileItsSourcesAreSignalled) {
     }
     over = true;
     signaller.join();
-    EXPECT_GT(served, 0);
 }
 
 }  // namespace

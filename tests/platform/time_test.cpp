@@ -66,11 +66,21 @@ TEST(Date, TextsAreInUtc) {
 TEST(Deadline, BeyondTheClocksEndIsTheClocksLastTimePoint) {
     using std::chrono::nanoseconds;
     using Clock = std::chrono::steady_clock;
+    using Seconds = std::chrono::duration<double>;
+    constexpr auto kNever = Clock::time_point::max();
     const auto before = Clock::now();
-    EXPECT_EQ(platform::deadlineAfter(nanoseconds::max()), Clock::time_point::max());
-    EXPECT_EQ(platform::deadlineAfter(Clock::time_point::max() - before), Clock::time_point::max());
+    EXPECT_EQ(platform::deadlineAfter(nanoseconds::max()), kNever);
+    // Beyond by more than a double of so many seconds can resolve.
+    EXPECT_EQ(platform::deadlineAfter(kNever - before + std::chrono::milliseconds(1)), kNever);
+    EXPECT_EQ(platform::deadlineAfter(Seconds(1e300)), kNever);
+    EXPECT_EQ(platform::deadlineAfter(Seconds(HUGE_VAL)), kNever);
     EXPECT_LT(platform::deadlineAfter(nanoseconds::min()), before);
-    EXPECT_GE(platform::deadlineAfter(nanoseconds(5)), before + nanoseconds(5));
+    EXPECT_LT(platform::deadlineAfter(Seconds(-HUGE_VAL)), before);
+    EXPECT_GE(platform::deadlineAfter(Seconds(3600.5)),
+              before + std::chrono::milliseconds(3600500));
+    const auto now = platform::deadlineAfter(Seconds(std::nan("")));
+    EXPECT_GE(now, before);
+    EXPECT_LE(now, Clock::now());
 }
 
 }  // namespace

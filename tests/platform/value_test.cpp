@@ -1,5 +1,6 @@
 #include "platform/value.h"
 
+#include <bit>
 #include <cmath>
 #include <limits>
 
@@ -58,6 +59,13 @@ TEST(Number, KeepsItsKindAndConvertsTotally) {
          "18446744073709551616"},
         {kInfinity, Kind::Double, 65535, kMax32, kMaxU32, kMax64, kMaxU64, kInfinity, "inf"},
         {-kInfinity, Kind::Double, 0, kMin32, 0, kMin64, 0, -kInfinity, "-inf"},
+        {1e5, Kind::Double, 65535, 100000, 100000, 100000, 100000, 1e5, "100000"},
+        {-1e5F, Kind::Float, 0, -100000, 0, -100000, 0, -1e5, "-100000"},
+        {-0x1p53, Kind::Double, 0, kMin32, 0, -(1LL << 53), 0, -0x1p53, "-9007199254740992"},
+        {1e16, Kind::Double, 65535, kMax32, kMaxU32, 10000000000000000, 10000000000000000, 1e16,
+         "1e+16"},
+        {1e16F, Kind::Float, 65535, kMax32, kMaxU32, 10000000272564224, 10000000272564224, 1e16F,
+         "1e+16"},
         {1e300, Kind::Double, 65535, kMax32, kMaxU32, kMax64, kMaxU64, 1e300, "1e+300"},
     };
     for (const auto& row : rows) {
@@ -83,6 +91,18 @@ TEST(Number, NanIsZeroAsAnIntegerTrueAndEqualToNothing) {
     EXPECT_TRUE(nan.isTrue());
     EXPECT_FALSE(nan == nan);
     EXPECT_EQ(nan.text(), "nan");
+    EXPECT_EQ(Number(-kNan).text(), "nan");
+}
+
+// A signalling NaN would become a quiet one on its way through a double.
+TEST(Number, KeepsTheBitsOfAFloat) {
+    for (const std::uint32_t bits : {0x7F800001U, 0xFFC00002U, 0x80000000U, 0x3DCCCCCDU}) {
+        const Number number(std::bit_cast<float>(bits));
+        EXPECT_EQ(std::bit_cast<std::uint32_t>(Number(number).asFloat()), bits);
+        EXPECT_EQ(number.isTrue(), bits != 0x80000000U);
+    }
+    EXPECT_EQ(Number(7).asFloat(), 7.0F);
+    EXPECT_EQ(Number(0.1).asFloat(), 0.1F);
 }
 
 TEST(Number, EqualityIsByKindToo) {
@@ -148,7 +168,7 @@ TEST(Dictionary, IsSortedByKeyAndTheLastValueOfAKeyHolds) {
     const Dictionary dictionary(growing);
     growing.set("later", 1);  // a copy was taken
     std::string keys;
-    for (const auto& [key, value] : dictionary.entries()) {
+    for (const auto& [key, value] : dictionary) {
         keys += key + ',';
     }
     EXPECT_EQ(keys, ",B,a,ab,b,\xC3\xA9,");

@@ -35,6 +35,13 @@ std::vector<std::string> with(std::vector<std::string> arguments,
     return arguments;
 }
 
+const std::string kBoardModule = std::string(ZR_TEST_MODULES) + "/board.so";
+
+// A run with the device module of the tests.
+std::vector<std::string> board(const std::vector<std::string>& more) {
+    return with({"run", "VantorMeterixDiagnostic", "--device-module", kBoardModule}, more);
+}
+
 TEST(Program, RunsEveryDiagnosticAndExperiment) {
     const test::Outcome counters = zrlab({"run", "VantorMeterixDiagnostic"});
     EXPECT_EQ(counters.status, 0) << counters.errors;
@@ -122,6 +129,19 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
         {{"describe", "Nothing"},
          64,
          "zrlab: unknown experiment, analysis or diagnostic \"Nothing\"\n"},
+        {{"run", "VantorMeterixDiagnostic", "--device", "simulatr:healthy"},
+         64,
+         "zrlab: --device simulatr:healthy: unknown kind of device \"simulatr\"; did you mean "
+         "simulator?\n"},
+        {{"run", "VantorMeterixDiagnostic", "--device", "helthy"},
+         2,
+         "zrlab: unknown device \"helthy\"; did you mean healthy?\n"},
+        {{"run", "VantorMeterixDiagnostic", "--device-module", "/no/such.so"},
+         64,
+         "zrlab: device module /no/such.so: no such file\n"},
+        {board({"--device", "board:rev-b", "--speed", "2"}), 64,
+         "zrlab: --speed 2: a device of the kind \"board\" has no speed to choose\n"},
+        {board({"--device", "board:rev-z"}), 2, "zrlab: board rev-z: not connected\n"},
         {{"help", "runn"}, 64, "zrlab: help: unknown command \"runn\"; did you mean run?\n"},
     };
     for (const Row& row : rows) {
@@ -130,7 +150,23 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
         EXPECT_EQ(outcome.errors, row.problem);
         EXPECT_THAT(outcome.output, IsEmpty());
     }
-    EXPECT_NE(zrlab({"run", "VantorMeterixDiagnostic", "--device", "helthy"}).status, 0);
+}
+
+// The kinds of a device module stand beside those that are built in.
+TEST(Program, RunsOnADeviceOfAModule) {
+    EXPECT_THAT(zrlab({"devices", "--names", "--device-module", kBoardModule}).output,
+                AllOf(StartsWith("healthy\n"), HasSubstr("\nboard:rev-a\n")));
+    EXPECT_EQ(zrlab({"devices", "--kinds", "--device-module", kBoardModule}).output,
+              "simulator     Simulated devices: a gallery of profiles, or a profile's file; takes "
+              "--speed, can be made to fail\n"
+              "board         Boards without services; runs in real time\n");
+    const test::Outcome outcome = zrlab(board({"--device", "board:rev-b", "--format", "json"}));
+    EXPECT_EQ(outcome.status, 2) << outcome.errors;  // the board has no counters
+    const Json document = Json::parse(outcome.output);
+    EXPECT_EQ(document["device"]["name"], "board rev-b");
+    EXPECT_EQ(document["device"]["facts"]["serial number"], "B-7");
+    EXPECT_EQ(document["runs"][0]["failures"][0]["message"], "Could not get simple channels.");
+    EXPECT_EQ(zrlab(board({"--device", "simulator:healthy"})).status, 0);
 }
 
 TEST(Program, ExplainsItself) {

@@ -6,6 +6,41 @@
 
 namespace test {
 
+namespace {
+
+// A device of hand-fed streams, and the plug-in that has it.
+struct HandFedCapture final : WLISPCapturePlugIn, WLRylCaptureDevice {
+    explicit HandFedCapture(WLRylCaptureStreamList all) : list(std::move(all)) {}
+
+    std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot /*error*/) override {
+        return std::make_shared<HandFedCapture>(list);
+    }
+    std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot /*error*/) override {
+        return list;
+    }
+    bool requestControlOfStreams(const WLRylCaptureStreamList& /*streams*/,
+                                 platform::ErrorSlot /*error*/) override {
+        return true;
+    }
+    bool invalidate(platform::ErrorSlot /*error*/) override { return true; }
+
+    const WLRylCaptureStreamList list;
+};
+
+template <class Handler>
+Handler handlerOf(const ZRVantorFaultExperiment& experiment, std::string_view key) {
+    const platform::Value handlers = experiment.stream()->valueForProperty(
+        kRylCaptureStreamProperty_VideoOutputHandlers, nullptr);
+    return *handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler][key].object<Handler>();
+}
+
+}  // namespace
+
+HandFedStream::HandFedStream() {
+    values.set(kRylCaptureStreamProperty_PortType, kRylCapturePortType_FrontFacingInfraredCamera);
+    values.set(kRylCaptureStreamProperty_ErrorCounters, platform::Dictionary());
+}
+
 bool eventually(const std::function<bool()>& condition) {
     const auto deadline = platform::deadlineAfter(kGenerous);
     while (!condition()) {
@@ -63,6 +98,12 @@ void FaultTest::install() {
                                .registry = nullptr});
 }
 
+void FaultTest::install(WLRylCaptureStreamList streams) {
+    platform::installServices({.capture = std::make_shared<HandFedCapture>(std::move(streams)),
+                               .meterix = simulator::makeMeterixFacility(
+                                   meterix, std::make_shared<simulator::StreamProgress>())});
+}
+
 std::shared_ptr<ZRVantorFaultExperiment> FaultTest::make(double frameCount,
                                                          double timeout,
                                                          std::string_view port) {
@@ -82,11 +123,13 @@ ZRExperimentResultRef FaultTest::run(double frameCount, double timeout) {
 }
 
 WLRylFrameHandler FaultTest::frameHandler(const Experiment& experiment) {
-    const platform::Value handlers = experiment.stream()->valueForProperty(
-        kRylCaptureStreamProperty_VideoOutputHandlers, nullptr);
-    return *handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                    [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                        .object<WLRylFrameHandler>();
+    return handlerOf<WLRylFrameHandler>(experiment,
+                                        kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler);
+}
+
+WLRylEventHandler FaultTest::eventHandler(const Experiment& experiment) {
+    return handlerOf<WLRylEventHandler>(experiment,
+                                        kRylCaptureStreamVideoOutputHandlerKey_EventHandler);
 }
 
 platform::ImageBufferRef FaultTest::buffer() {

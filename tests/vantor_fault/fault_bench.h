@@ -101,6 +101,32 @@ bool eventually(const std::function<bool()>& condition);
 // An error as a device service would report it.
 platform::ErrorRef serviceError(std::string_view text);
 
+// The infrared camera's stream without a device behind it: it accepts everything, and delivers what
+// `onStart` delivers.
+struct HandFedStream final : WLRylCaptureStream {
+    HandFedStream();
+
+    platform::Value valueForProperty(std::string_view property,
+                                     platform::ErrorSlot /*error*/) override {
+        const platform::Value* value = values.find(property);
+        return value != nullptr ? *value : platform::Value();
+    }
+    bool setValue(const platform::Value& value,
+                  std::string_view forProperty,
+                  platform::ErrorSlot /*error*/) override {
+        values.set(forProperty, value);
+        return true;
+    }
+    bool start(platform::ErrorSlot /*error*/) override {
+        onStart();
+        return true;
+    }
+    bool stop(platform::ErrorSlot /*error*/) override { return true; }
+
+    std::function<void()> onStart = [] {};
+    platform::MutableDictionary values;  // the properties
+};
+
 class FaultTest : public ::testing::Test {
   protected:
     using Experiment = ZRVantorFaultExperiment;
@@ -116,6 +142,8 @@ class FaultTest : public ::testing::Test {
 
     // Makes the profiles the installed device. The one before must have all its buffers back.
     void install();
+    // Makes a device of these streams the installed one.
+    void install(WLRylCaptureStreamList streams);
     // An experiment that was set up.
     std::shared_ptr<Experiment> make(
         double frameCount,
@@ -124,8 +152,9 @@ class FaultTest : public ::testing::Test {
     // Installs, runs an experiment and tears it down; the run's error ends up in `error`.
     ZRExperimentResultRef run(double frameCount, double timeout);
 
-    // The handlers that a run installed: whoever calls them is the capture service.
+    // The handlers that a run installed: their caller plays the capture service.
     static WLRylFrameHandler frameHandler(const Experiment& experiment);
+    static WLRylEventHandler eventHandler(const Experiment& experiment);
     static platform::ImageBufferRef buffer();  // of a lit frame
 
     std::size_t liveBuffers() const;

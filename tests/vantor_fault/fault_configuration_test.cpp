@@ -211,12 +211,26 @@ TEST_F(FaultSetup, ReportsAStreamWithoutPortTypeAndGoesOn) {
                                reported));
 }
 
+TEST_F(FaultSetup, TakesANullStreamForOneWithoutPortType) {
+    const auto stream = std::make_shared<test::HandFedStream>();
+    install({nullptr, stream});
+    EXPECT_NE(make(1, 0)->run(&error), nullptr);
+    EXPECT_THAT(error,
+                IsPlainError(ZRCapturePlugInErrorDomain, 202, "Failed to get stream port type!"));
+    install({nullptr});
+    EXPECT_EQ(make(1, 0)->run(&error), nullptr);
+    EXPECT_THAT(error, IsPlainError(ZRCapturePlugInErrorDomain, 202, "Failed to find stream!"));
+}
+
 TEST_F(FaultSetup, UsesTheFirstStreamOfItsPort) {
     capture.streams.insert(capture.streams.begin(), 3, camera());
     capture.streams[0].portType = "ryl.port.other";
     camera().start = Fault::failing(nullptr);
     install();
     EXPECT_EQ(Experiment().port(), kRylCapturePortType_FrontFacingInfraredCamera);
+    const std::string temporary = "a port type that is made of ";
+    const Experiment owning(temporary + "pieces");
+    EXPECT_EQ(owning.port(), "a port type that is made of pieces");
     for (const std::string_view port :
          {kRylCapturePortType_FrontFacingInfraredCamera, std::string_view("ryl.port.other")}) {
         const auto experiment = make(0, 0, port);

@@ -1,8 +1,10 @@
 // Who keeps the experiment alive, where it dies, and what is left behind.
 #include <cstdlib>
-#include <filesystem>
+#include <optional>
+#include <system_error>
 #include <thread>
 
+#include "tests/platform/threads.h"
 #include "tests/vantor_fault/fault_bench.h"
 
 namespace {
@@ -11,8 +13,11 @@ using platform::LogLevel;
 using test::FaultTest;
 
 std::size_t threads() {
-    const std::filesystem::directory_iterator tasks("/proc/self/task");
-    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
+    std::size_t count = 0;
+    for (const auto& [name, number] : test::threadNames()) {
+        count += number;
+    }
+    return count;
 }
 
 class FaultLifetime : public FaultTest {
@@ -78,7 +83,7 @@ TEST_F(FaultLifetime, DiesWhileFramesArrive) {
 }
 
 // The same with a thread of the test's as the capture service, which goes on until the handler
-// finds nobody any more.
+// finds no experiment any more.
 TEST_F(FaultLifetime, DiesInsideAHandler) {
     camera().stallAfterFrame = 0;
     install();
@@ -113,6 +118,53 @@ TEST_F(FaultLifetime, LeavesNothingBehindOnceTimeOutsHavePassed) {
     }));
     EXPECT_TRUE(test::eventually([&] { return threads() <= threadsBefore; })) << threads();
     EXPECT_GE(log->count(LogLevel::Error, "Timeout has been reached."), runs.size());
+}
+
+// The experiment lives until its time-out; its threads do not.
+TEST_F(FaultLifetime, HasThreadsOnlyWhileItStreams) {
+    const auto stream = std::make_shared<test::HandFedStream>();
+    install({stream});
+    for (int round = 0; round < 200; ++round) {
+        const auto experiment = make(1, 3600);
+        stream->onStart = [&] {
+            EXPECT_TRUE(test::eventually([] {  // each names itself
+                return test::threadsNamed("t.primaryScalar") == 1 &&
+                       test::threadsNamed("FaultExperiment") == 1;
+            }));
+            frameHandler (*experiment)(buffer(), {});
+        };
+        EXPECT_NE(experiment->run(nullptr), nullptr);
+        EXPECT_LT(threads(), 10U);
+    }
+}
+
+// The stream never starts without them.
+TEST_F(FaultLifetime, NeedsItsThreadsBeforeTheStreamStarts) {
+    const auto stream = std::make_shared<test::HandFedStream>();
+    install({stream});
+    stream->onStart = [] { ADD_FAILURE() << "started"; };
+    const test::NoThreads noThreads;
+    EXPECT_THROW(make(1, 0)->run(nullptr), std::system_error);
+}
+
+TEST_F(FaultLifetime, NeedsNoFurtherThreadOnceTheStreamHasStarted) {
+    const auto stream = std::make_shared<test::HandFedStream>();
+    install({stream});
+    for (const double timeout : {3600.0, 0.01}) {
+        std::optional<test::NoThreads> noThreads;
+        const auto experiment = make(3, timeout);
+        stream->onStart = [&] {
+            noThreads.emplace();
+            for (int frame = 0; timeout > 1 && frame < 3; ++frame) {
+                frameHandler (*experiment)(buffer(), {});
+            }
+        };
+        EXPECT_NE(experiment->run(nullptr), nullptr);
+        // Handlers do not throw; what comes too late finds no thread and is dropped.
+        EXPECT_TRUE(test::eventually([] { return test::threadsNamed("t.primaryScalar") == 0; }));
+        frameHandler (*experiment)(buffer(), {});
+        eventHandler (*experiment)(1, {}, 2);
+    }
 }
 
 TEST_F(FaultLifetime, APendingTimeOutDoesNotKeepTheProcess) {

@@ -42,9 +42,9 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
          [&] { from(1).set.set(kLight, (std::int64_t{1} << 32) + 2); }, 2, 0, ""},
         {"unlit", [&] { at(2).set.set(kLight, 0); }, 3, 206,
          "Frame 2 is not illuminated for unknown reason!"},
-        {"lit by what there is not", [&] { at(1).set.set(kLight, 3); }, 1, 206,
+        {"an unknown light source", [&] { at(1).set.set(kLight, 3); }, 1, 206,
          "Frame 1 is not illuminated for unknown reason!"},
-        {"lit by less than nothing",
+        {"a negative light source",
          [&] {
              at(1).set.set(kLight, -1);
              at(1).set.set("HardwareEvents", 0x1FFF);
@@ -193,7 +193,7 @@ TEST_F(FaultStreaming, ALateTimeOutChangesNothing) {
     EXPECT_EQ(error, nullptr);
 }
 
-// What is received after the stop is told with its time, in seconds, and not counted.
+// What is received after the stop is logged with its time, in seconds, and not counted.
 TEST_F(FaultStreaming, CountsNoFrameAfterTheStop) {
     camera().stallAfterFrame = 0;
     install();
@@ -210,6 +210,16 @@ TEST_F(FaultStreaming, CountsNoFrameAfterTheStop) {
     camera().stallAfterFrame.reset();
     camera().framesAfterStop = 5;
     EXPECT_NE(run(1, kLate), nullptr);  // and their buffers come back: checked at the end
+}
+
+TEST_F(FaultStreaming, TakesANullBufferForOneWithoutMetadata) {
+    const auto stream = std::make_shared<test::HandFedStream>();
+    install({stream});
+    const auto experiment = make(9, kLate);
+    stream->onStart = [&] { frameHandler (*experiment)(nullptr, {}); };
+    EXPECT_EQ(experiment->run(&error), nullptr);
+    EXPECT_THAT(error, IsPlainError(ZRCapturePlugInErrorDomain, 206, "Frame metadata is missing!"));
+    EXPECT_EQ(log->count(LogLevel::Debug, "Received frame 1."), 1U);
 }
 
 // While a description waits for its validation its buffer is back with the stream already.

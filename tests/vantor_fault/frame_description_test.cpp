@@ -23,7 +23,7 @@ constexpr std::string_view kKeys[] = {
 };
 constexpr std::string_view kOptional = "RylFloodActiveTemperature";
 
-// Key number i holds i + 1, but for a boolean, a float and a wide one.
+// Key number i holds i + 1, except for a boolean, a double and a wide one.
 MutableDictionary metadata(std::string_view without = "") {
     MutableDictionary entries;
     int next = 0;

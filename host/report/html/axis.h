@@ -8,12 +8,12 @@
 
 namespace host {
 
-// Whether a value can be drawn: finite, and far enough from the limits of a double to reckon with.
+// Whether a value can be drawn: finite, and far enough from the limits of a double to calculate with.
 bool isDrawable(double value);
 
 class Axis {
   public:
-    // From `least` to `greatest`, both drawable. An axis of whole numbers has no marks between them.
+    // From `least` to `greatest`, both drawable. An axis of whole numbers has marks at whole numbers only.
     Axis(double least, double greatest, bool whole);
 
     // Around the values with some air above and below, so that a line that hardly moves looks flat.

@@ -76,9 +76,9 @@ std::string timingFigure(const std::vector<FrameRecord>& frames,
 }
 
 std::string temperatureFigure(const std::vector<FrameRecord>& frames, const std::string& id) {
-    // In the order of kTemperatureNames: the hue tells the sensor, the dashes its state.
-    static constexpr const char* kStyles[kTemperatureNames.size()] = {
-        "hue-a dotted", "hue-a dashed", "hue-a", "hue-b dotted", "hue-b dashed", "hue-b", "hue-c"};
+    // The hue shows the sensor, the dashes its state.
+    static constexpr const char* kHues[] = {"hue-a", "hue-b", "hue-c"};
+    static constexpr const char* kDashes[] = {" dotted", " dashed", ""};
     LinePlot plot{.figure = {.id = id,
                              .title = "Temperatures",
                              .caption = "As the frames' metadata states them, in the device's own "
@@ -87,14 +87,17 @@ std::string temperatureFigure(const std::vector<FrameRecord>& frames, const std:
                              .yLabel = "device's own unit"},
                   .series = {},
                   .bands = {}};
-    for (std::size_t at = 0; at < kTemperatureNames.size(); ++at) {
+    for (std::size_t at = 0; at < kTemperatureCount; ++at) {
         std::vector<Point> points =
             overFrames(frames, [at](const FrameRecord& frame) { return frame.temperatures[at]; });
         const bool drawn = std::any_of(points.begin(), points.end(),
                                        [](const Point& point) { return isDrawable(point.y); });
         if (drawn) {
-            plot.series.push_back(
-                {std::string(kTemperatureNames[at]), kStyles[at], std::move(points)});
+            const TemperatureEntry& entry = kTemperatures[at];
+            plot.series.push_back({std::string(entry.name),
+                                   std::string(kHues[static_cast<std::size_t>(entry.sensor)]) +
+                                       kDashes[static_cast<std::size_t>(entry.state)],
+                                   std::move(points)});
         }
     }
     return linePlot(plot);
@@ -114,16 +117,17 @@ std::string lightFigure(const std::vector<FrameRecord>& frames, const std::strin
                      .bands = {}});
 }
 
-// One list of samples of every image; NaN where a sample is no number.
-std::vector<std::vector<double>> samplesOf(const platform::List& images, std::string_view key) {
+// One list of samples of every image; NaN where a sample is not a number.
+std::vector<std::vector<double>> samplesOf(const platform::List& images,
+                                           const platform::List* ImageView::*list) {
     std::vector<std::vector<double>> all;
     all.reserve(images.size());
     for (const platform::Value& image : images) {
         std::vector<double>& samples = all.emplace_back();
-        const platform::List list =
-            image[key].list() != nullptr ? *image[key].list() : platform::List();
-        for (const platform::Value& sample : list) {
-            samples.push_back(sample.number() != nullptr ? sample.number()->asDouble() : kNone);
+        const platform::List* held = ImageView(image).*list;
+        for (std::size_t at = 0; held != nullptr && at < held->size(); ++at) {
+            const platform::Number* sample = (*held)[at].number();
+            samples.push_back(sample != nullptr ? sample->asDouble() : kNone);
         }
     }
     return all;
@@ -148,7 +152,7 @@ Band envelope(const std::string& name,
         double greatest = kNone;
         for (const auto& samples : images) {
             if (at < samples.size()) {
-                least = std::fmin(least, samples[at]);  // takes no notice of NaN
+                least = std::fmin(least, samples[at]);  // ignores NaN
                 greatest = std::fmax(greatest, samples[at]);
             }
         }
@@ -159,14 +163,14 @@ Band envelope(const std::string& name,
 }
 
 std::string sampleFigures(const platform::List& images, const std::string& id) {
-    const auto samplesI = samplesOf(images, "dScanI");
-    const auto samplesQ = samplesOf(images, "dScanQ");
+    const auto samplesI = samplesOf(images, &ImageView::samplesI);
+    const auto samplesQ = samplesOf(images, &ImageView::samplesQ);
     std::string figures =
         linePlot({.figure = {.id = id + "-curve",
                              .title = "Samples of the last image",
                              .caption = fmt::format(
                                  "Lines: the last image, frame ID {}. Areas: the range of all {}.",
-                                 images[images.size() - 1]["frameID"].asNumber().text(),
+                                 ImageView(images[images.size() - 1]).frameId.text(),
                                  plural(images.size(), "image", "images")),
                              .xLabel = "sample",
                              .yLabel = "sample value"},
@@ -186,14 +190,13 @@ std::string sampleFigures(const platform::List& images, const std::string& id) {
 
 std::string imageTemperatureFigure(const platform::List& images, const std::string& id) {
     std::vector<Point> points;
-    const double start = images[0]["timestampInMilliseconds"].asNumber().asDouble();
+    const double start = ImageView(images[0]).milliseconds.asDouble();
     double latest = 0;
-    for (const platform::Value& image : images) {
-        // A clock that falls back must not draw the line backwards.
-        latest = std::max(latest,
-                          (image["timestampInMilliseconds"].asNumber().asDouble() - start) / 1000);
-        const platform::Number* celsius = image["tmonDataInC"].number();
-        points.push_back({latest, celsius != nullptr ? celsius->asDouble() : kNone});
+    for (const platform::Value& value : images) {
+        const ImageView image(value);
+        // If the clock goes back, the line must not.
+        latest = std::max(latest, (image.milliseconds.asDouble() - start) / 1000);
+        points.push_back({latest, image.celsius.isPresent() ? image.celsius.asDouble() : kNone});
     }
     return linePlot({.figure = {.id = id,
                                 .title = "Temperature",
@@ -218,7 +221,7 @@ std::string frameFigures(const RunRecord& run, const std::string& id) {
 }
 
 std::string imageFigures(const RunRecord& run, const std::string& id) {
-    const platform::List* images = run.auxiliaryData["images"].list();
+    const platform::List* images = imagesOf(run.auxiliaryData);
     if (images == nullptr || images->empty()) {
         return "";
     }

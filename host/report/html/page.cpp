@@ -23,9 +23,9 @@ const RepeatRecord* repeatOf(const SessionRecord& session, std::size_t at) {
     return at < session.repeats.size() ? &session.repeats[at] : nullptr;
 }
 
-// What was run, and what came of it, in one line each.
+// What was run, and its outcome, in one line each.
 std::string subjectOf(const SessionRecord& session) {
-    return session.runs.size() == 1 ? session.runs.front().name
+    return session.runs.size() == 1 ? session.runs.front().plan.name
                                     : plural(session.runs.size(), "run", "runs");
 }
 
@@ -71,7 +71,7 @@ std::string headHtml(const SessionRecord& session) {
                            factHtml("Bench", "zrlab " + session.version));
 }
 
-// With several runs: where to find each, and what came of it.
+// With several runs: a link to each, and its outcome.
 std::string contentsHtml(const SessionRecord& session) {
     if (session.runs.size() < 2) {
         return "";
@@ -81,21 +81,25 @@ std::string contentsHtml(const SessionRecord& session) {
         const RunRecord& run = session.runs[at];
         entries += fmt::format(
             "<li><a href=\"#{}\">{} {}</a> <span class=\"faint\">{}</span></li>\n", sectionId(at),
-            verdictHtml(run.verdict), htmlText(run.name), htmlText(headline(run)));
+            verdictHtml(run.verdict), htmlText(run.plan.name), htmlText(headline(run)));
     }
     return "<nav class=\"sheet\" aria-label=\"Runs\">\n<ol>\n" + entries + "</ol>\n</nav>\n";
 }
 
 std::string footHtml(const SessionRecord& session) {
+    std::string facts;
+    for (const auto& [name, text] : session.deviceFacts) {
+        facts += factHtml("Device's " + htmlText(name), text);
+    }
     return fmt::format(R"(<footer class="sheet">
 <h2>How this was made</h2>
 <dl>
 <div><dt>Device</dt><dd>{}: {}</dd></div>
-<div><dt>Command line</dt><dd><code>{}</code></dd></div>
+{}<div><dt>Command line</dt><dd><code>{}</code></dd></div>
 </dl>
 </footer>
 )",
-                       htmlText(session.deviceName), htmlText(session.deviceSummary),
+                       htmlText(session.deviceName), htmlText(session.deviceSummary), facts,
                        htmlText(session.commandLine));
 }
 
@@ -124,6 +128,10 @@ std::string htmlReport(const SessionRecord& session) {
         page += runHtml(session.runs[at], repeatOf(session, at), sectionId(at), manyRuns);
     }
     return page + "</main>\n" + footHtml(session) + "</body>\n</html>\n";
+}
+
+std::shared_ptr<RunListener> openHtmlReport(ReportSink sink, const TextStyle& /*style*/) {
+    return wholeReport(std::move(sink), htmlReport);
 }
 
 }  // namespace host

@@ -80,7 +80,7 @@ std::string dotsOf(const std::vector<Point>& points, const Scale& scale) {
 std::string seriesSvg(const Series& series, const Scale& scale, const LinePlot& plot) {
     const std::vector<Point> points = decimated(series.points, kMostPoints);
     const bool isState = plot.wholeY;
-    // Marks on many lines would hide their dashes.
+    // Marks on many lines would hide the dashes.
     const bool isMarked = points.size() <= kFewPoints && plot.series.size() <= 2;
     std::string svg;
     // Nothing lies between two states, so no line joins them.

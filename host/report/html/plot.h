@@ -1,8 +1,8 @@
 // Line drawings and heat maps as SVG in a figure of an HTML page.
 //
-// No scripts and no fixed width: the data are stretched to the room that there is, texts and strokes
-// keep their size. However long a run was, a drawing has a bounded number of points or cells. Lines
-// differ by colour and dashes; each drawing has a title and a description for those who cannot see it.
+// No scripts and no fixed width: the data are stretched to the available space, texts and strokes keep
+// their size. However long a run was, a drawing has a bounded number of points or cells. Lines differ by
+// colour and dashes; each drawing has a title and a description for readers who cannot see it.
 #ifndef ZR_HOST_REPORT_HTML_PLOT_H
 #define ZR_HOST_REPORT_HTML_PLOT_H
 
@@ -44,7 +44,7 @@ struct Figure {
 struct LinePlot {
     Figure figure;
     bool wholeX = true;   // x counts something
-    bool wholeY = false;  // y is a state, told by a whole number
+    bool wholeY = false;  // y is a state, a whole number
     std::vector<Series> series;
     std::vector<Band> bands;
 };
@@ -54,7 +54,7 @@ std::string linePlot(const LinePlot& plot);
 
 struct HeatMap {
     Figure figure;
-    // A column an x, from 1; in it the cells from the bottom. NaN where there is none.
+    // One column per x, starting at 1; cells from bottom to top; NaN for a missing cell.
     std::vector<std::vector<double>> columns;
 };
 

@@ -26,7 +26,7 @@ struct Column {
     std::string_view style{};  // class of its cells: "number" lines them up at the right
 };
 
-// A table: a caption, a head cell a column, and rows whose first cell names the row.
+// A table: a caption, one head cell per column, and rows whose first cell names the row.
 class Table {
   public:
     Table(std::string caption, std::vector<Column> columns)
@@ -70,7 +70,7 @@ class Table {
     std::string _rows;
 };
 
-// The sections of a run, and the links to them. A section without content does not come about.
+// The sections of a run, and the links to them. A section without content is left out.
 class Sections {
   public:
     explicit Sections(const std::string& id) : _id(id) {}
@@ -261,7 +261,7 @@ std::string measurementsHtml(const RunRecord& run) {
         table.row({htmlText(one.name), numberText(one.value), htmlText(one.unit)});
     }
     const std::string html = table.html();
-    // Of a diagnostic the results say the same again.
+    // For a diagnostic the results repeat them.
     return run.results.empty()
                ? html
                : folded(plural(run.measurements.size(), "measurement", "measurements"), html);
@@ -270,15 +270,16 @@ std::string measurementsHtml(const RunRecord& run) {
 std::string parametersHtml(const RunRecord& run) {
     Table table("Parameters as they were given to each part",
                 {{"Parameter"}, {"Value", "number"}, {"Part"}});
-    const auto add = [&table](const PartRecord& record, Part part) {
-        for (const auto& [name, value] : record.parameters) {
+    const auto add = [&](Part part) {
+        const PartPlan& plan = partOf(run, part);
+        for (const auto& [name, value] : plan.parameters) {
             table.row({htmlText(name), htmlText(value.text()),
-                       fmt::format("{} {}", partText(part), htmlText(record.name))});
+                       fmt::format("{} {}", partText(part), htmlText(plan.name))});
         }
     };
-    add(run.experiment, Part::Experiment);
-    if (run.analysis.has_value()) {
-        add(*run.analysis, Part::Analysis);
+    add(Part::Experiment);
+    if (run.analysisSeconds.has_value()) {
+        add(Part::Analysis);
     }
     return table.html();
 }
@@ -354,8 +355,8 @@ std::string runHtml(const RunRecord& run,
         "<section class=\"run\" id=\"{0}\" aria-labelledby=\"{0}-name\">\n"
         "<header>\n<h2 id=\"{0}-name\">{1}</h2>\n{2}<p class=\"summary\">{3}</p>\n{4}</header>\n"
         "{5}</section>\n",
-        id, htmlText(run.name), withOutcome ? outcome : "", htmlText(run.summary), resultStrip(run),
-        sections.html(run.name));
+        id, htmlText(run.plan.name), withOutcome ? outcome : "", htmlText(run.plan.summary),
+        resultStrip(run), sections.html(run.plan.name));
 }
 
 }  // namespace host

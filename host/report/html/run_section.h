@@ -8,14 +8,14 @@
 
 namespace host {
 
-// The verdict as a mark and a word, so that its colour is not all that tells it.
+// The verdict as a mark and a word, so that it does not depend on colour alone.
 std::string verdictHtml(Verdict verdict);
 
 // "pass", "fail", "error": the class that gives an element the verdict's colour.
 std::string_view verdictClass(Verdict verdict);
 
 // The section; its id, and the beginning of every id in it, is `id`. `repeat` is null when the run was
-// not repeated. `withOutcome`: the head tells the run's own verdict, where the page's may be another.
+// not repeated. `withOutcome`: the head shows the run's own verdict, when the page's may differ.
 std::string runHtml(const RunRecord& run,
                     const RepeatRecord* repeat,
                     const std::string& id,

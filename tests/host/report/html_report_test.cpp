@@ -50,11 +50,11 @@ TEST(HtmlReport, TellsTheVerdictFirstThenWhatFailed) {
                                                             "Log",
                                                             "late",
                                                             "zrlab run Diagnostic"});
-    expectInOrder(host::htmlReport(test::brokenSession()),
-                  {"ERROR", "could not be run to its end", "experiment Experiment, run",
-                   "Failed to start streaming.", "PlugInErrorDomain 204", "caused by",
-                   "Start was refused", "Capture 7", "caused by", "Stream is busy", "Service -3",
-                   "No manager available?!", "property written too early"});
+    expectInOrder(
+        host::htmlReport(test::brokenSession()),
+        {"ERROR", "did not complete", "experiment Experiment, run", "Failed to start streaming.",
+         "PlugInErrorDomain 204", "caused by", "Start was refused", "Capture 7", "caused by",
+         "Stream is busy", "Service -3", "No manager available?!", "property written too early"});
     expectInOrder(host::htmlReport(test::repeatedSession()),
                   {"17 of 20 runs passed", "Number of Channel 17", "Repetitions",
                    "20 runs: 17 passed, 2 failed, 1 in error", "show run 7", "Number of Channel 17",
@@ -86,8 +86,8 @@ TEST(HtmlReport, EscapesEveryText) {
     host::SessionRecord session = test::judgedSession(test::kHostile);
     session.commandLine = session.deviceName = session.deviceSummary = test::kHostile;
     host::RunRecord& run = session.runs.front();
-    run.experiment.name = run.summary = test::kHostile;
-    run.experiment.parameters.front().first = test::kHostile;
+    run.plan.experiment.name = run.plan.summary = test::kHostile;
+    run.plan.experiment.parameters.front().first = test::kHostile;
     run.failures = test::brokenSession().runs.front().failures;
     run.failures.front().error =
         std::make_shared<const platform::Error>(test::kHostile, 1, test::kHostile);

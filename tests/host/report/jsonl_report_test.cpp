@@ -105,7 +105,7 @@ TEST(JsonlReport, WritesErrorsWhereTheyBelong) {
          step(e, R"("error": {"symptom": "experiment-teardown", "softwareInfoIds": ["zrlab"],
              "message": "experiment Experiment, teardown: No manager available?!"})"),
          step(e, R"("diagnosis": {"verdict": "Broken-error", "type": "UNKNOWN",
-             "message": "could not be run to its end", "hardwareInfoId": "device"})"),
+             "message": "did not complete", "hardwareInfoId": "device"})"),
          step(e, R"("testStepEnd": {"status": "ERROR"})"),
          R"({"testRunArtifact": {"error": {"symptom": "experiment-device",
              "softwareInfoIds": ["zrlab"],

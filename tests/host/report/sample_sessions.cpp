@@ -33,12 +33,13 @@ platform::Date timeOf(int milliseconds) {
 SessionRecord sessionOf(RunRecord run) {
     SessionRecord session;
     session.version = "1.0.0";
-    session.commandLine = "zrlab run " + run.name + " --set frameCount=90";
+    session.commandLine = "zrlab run " + run.plan.name + " --set frameCount=90";
     session.deviceName = "healthy";
     session.deviceSummary = "A device without faults";
     session.started = timeOf(0);
     session.seconds = run.seconds + 0.01;
-    session.planned = {{run.name, run.experiment, run.analysis}};
+    session.deviceFacts = {{"platform", "simulated device"}};
+    session.planned = {run.plan};
     session.verdict = run.verdict;
     session.runs.push_back(std::move(run));
     return session;
@@ -46,19 +47,20 @@ SessionRecord sessionOf(RunRecord run) {
 
 RunRecord runOf(const std::string& name, Verdict verdict) {
     RunRecord run;
-    run.name = name;
-    run.summary = "Streams the camera and judges what it counted.";
+    run.plan.name = name;
+    run.plan.summary = "Streams the camera and judges what it counted.";
     run.started = timeOf(1);
     run.seconds = 3.25;
-    run.experiment = {"Experiment", "Streams.", {{"frameCount", std::int64_t{90}}}, 3.0};
+    run.plan.experiment = {"Experiment", "Streams.", {{"frameCount", std::int64_t{90}}}};
+    run.experimentSeconds = 3.0;
     run.verdict = verdict;
     return run;
 }
 
 RunRecord diagnosticOf(const std::string& name, Verdict verdict) {
     RunRecord run = runOf(name, verdict);
-    run.isDiagnostic = true;
-    run.analysis = {"Analysis", "Judges.", {{"frameCount", 80.5}}, 0.25};
+    run.plan.analysis = {"Analysis", "Judges.", {{"frameCount", 80.5}}};
+    run.analysisSeconds = 0.25;
     return run;
 }
 
@@ -137,7 +139,7 @@ SessionRecord judgedSession(const std::string& name) {
 
 SessionRecord brokenSession() {
     RunRecord run = diagnosticOf("Broken", Verdict::Error);
-    run.analysis.reset();  // never reached
+    run.analysisSeconds.reset();  // never reached
     const auto busy = std::make_shared<const platform::Error>("Service", -3, "Stream is busy");
     const auto refused =
         std::make_shared<const platform::Error>("Capture", 7, "Start was refused", busy);
@@ -177,7 +179,7 @@ SessionRecord repeatedSession() {
     RunRecord run = diagnosticOf("FaultDiagnostic", Verdict::Failed);
     addResults(run, true);
     run.number = 7;
-    host::RepeatRecord repeat{run.name, 20, 17, 2, 1, 61.5, {}};
+    host::RepeatRecord repeat{run.plan.name, 20, 17, 2, 1, 61.5, {}};
     for (const host::ResultRecord& result : run.results) {
         const bool outside = result.judgement == Judgement::Outside;
         repeat.results.push_back({result.name, result.unit, result.limit, 19, outside ? 2U : 0U,
@@ -220,7 +222,7 @@ void play(const SessionRecord& session, host::RunListener& listener) {
         }
         tell(host::Part::Experiment, false);
         listener.partEnded(run, host::Part::Experiment);
-        if (run.analysis.has_value()) {
+        if (run.analysisSeconds.has_value()) {
             listener.partStarted(run, host::Part::Analysis);
             tell(host::Part::Analysis, false);
             listener.partEnded(run, host::Part::Analysis);

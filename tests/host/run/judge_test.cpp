@@ -7,6 +7,8 @@
 
 #include <gtest/gtest.h>
 
+#include "host/record/run_text.h"
+
 namespace {
 
 using host::Judgement;

@@ -14,7 +14,7 @@ using host::Verdict;
 
 RunRecord run(Verdict verdict, double value, Judgement judgement) {
     RunRecord record;
-    record.isDiagnostic = true;
+    record.plan.analysis.emplace();
     record.verdict = verdict;
     if (verdict != Verdict::Error) {
         record.results.push_back({"noise", value, "events", std::nullopt, judgement});

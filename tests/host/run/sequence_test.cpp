@@ -9,6 +9,9 @@
 
 #include <gmock/gmock.h>
 
+#include "host/record/run_text.h"
+#include "host/run/planner.h"
+
 namespace {
 
 using host::RunRecord;
@@ -73,10 +76,9 @@ RunRecord runScript(Script given) {
     lab.addAnalysisWithName("ScriptA", [] { return std::make_shared<Scripted>("analysis"); });
     lab.addDiagnosticWithName("ScriptD", "d", "ScriptE", "ScriptA");
     script = std::move(given);
-    std::string problem;
-    const auto plans = host::planRuns(lab, {"ScriptD"}, {}, problem);
+    const auto plans = host::planRuns(lab, {"ScriptD"}, {});
     host::RunRecorder recorder([](const host::LogRecord&) {}, false);
-    return host::runOnce(lab, plans->front(), 1, recorder, {});
+    return host::runOnce(lab, plans.front(), 1, recorder, {});
 }
 
 TEST(Sequence, CallsEveryStepInOrder) {
@@ -124,11 +126,10 @@ TEST(Sequence, AFailedStepEndsWhatDependsOnIt) {
 TEST(Sequence, AMisuseOfTheDeviceIsAnError) {
     ZRLab& lab = ZRLab::defaultLab();
     runScript({});
-    std::string problem;
-    const auto plans = host::planRuns(lab, {"ScriptE"}, {}, problem);
+    const auto plans = host::planRuns(lab, {"ScriptE"}, {});
     host::RunRecorder recorder([](const host::LogRecord&) {}, false);
     recorder.misused("property written before control was requested");
-    const RunRecord run = host::runOnce(lab, plans->front(), 1, recorder, {});
+    const RunRecord run = host::runOnce(lab, plans.front(), 1, recorder, {});
     EXPECT_EQ(run.verdict, Verdict::Error);
     ASSERT_EQ(run.failures.size(), 1U);
     EXPECT_EQ(host::failureText(run.failures[0]), "property written before control was requested");

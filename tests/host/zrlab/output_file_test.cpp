@@ -10,10 +10,12 @@
 
 #include <gmock/gmock.h>
 
+#include "host/record/problem.h"
+
 namespace {
 
 namespace fs = std::filesystem;
-using testing::HasSubstr;
+using testing::ThrowsMessage;
 
 class OutputFile : public testing::Test {
   protected:
@@ -37,10 +39,10 @@ class OutputFile : public testing::Test {
 TEST_F(OutputFile, ReplacesWholeAndLeavesNothingElse) {
     const fs::path file = _folder / "report";
     std::ofstream(file) << "what was there before, and longer than what comes";
-    EXPECT_EQ(host::cannotWrite(file), std::nullopt);
+    host::requireWritable(file);
     EXPECT_EQ(read(file), "what was there before, and longer than what comes");
     const std::string content("new\0content\n", 12);
-    EXPECT_EQ(host::writeFile(file, content), std::nullopt);
+    host::writeFile(file, content);
     EXPECT_EQ(read(file), content);
     EXPECT_EQ(entries(), 1U);
 }
@@ -50,27 +52,27 @@ TEST_F(OutputFile, KeepsModesLinksAndWhatIsNoFile) {
     std::ofstream(file) << "old";
     fs::permissions(file, fs::perms::owner_read | fs::perms::owner_write);
     fs::create_symlink(file, _folder / "link");
-    EXPECT_EQ(host::writeFile(_folder / "link", "new"), std::nullopt);
+    host::writeFile(_folder / "link", "new");
     EXPECT_TRUE(fs::is_symlink(_folder / "link"));
     EXPECT_EQ(read(file), "new");
     EXPECT_EQ(fs::status(file).permissions(), fs::perms::owner_read | fs::perms::owner_write);
 
     fs::create_symlink("/dev/null", _folder / "nothing");
-    EXPECT_EQ(host::cannotWrite(_folder / "nothing"), std::nullopt);
-    EXPECT_EQ(host::writeFile(_folder / "nothing", "gone"), std::nullopt);
+    host::requireWritable(_folder / "nothing");
+    host::writeFile(_folder / "nothing", "gone");
     EXPECT_TRUE(fs::is_character_file("/dev/null"));
     fs::create_symlink("/dev/full", _folder / "full");
-    EXPECT_NE(host::writeFile(_folder / "full", "too much"), std::nullopt);
+    EXPECT_THROW(host::writeFile(_folder / "full", "too much"), host::Problem);
 }
 
 TEST_F(OutputFile, SaysWhatCannotBeWrittenAndTouchesNothing) {
     const fs::path absent = _folder / "no" / "such" / "report";
-    for (const auto& problem : {host::cannotWrite(absent), host::writeFile(absent, "x")}) {
-        ASSERT_TRUE(problem.has_value());
-        EXPECT_THAT(*problem, HasSubstr("cannot write " + absent.string()));
-        EXPECT_THAT(*problem, HasSubstr("No such file or directory"));
-    }
-    EXPECT_THAT(host::cannotWrite(_folder).value_or(""), HasSubstr("Is a directory"));
+    const auto isRefused = [](const std::string& why) { return ThrowsMessage<host::Problem>(why); };
+    const std::string why = "cannot write " + absent.string() + ": No such file or directory";
+    EXPECT_THAT([&] { host::requireWritable(absent); }, isRefused(why));
+    EXPECT_THAT([&] { host::writeFile(absent, "x"); }, isRefused(why));
+    EXPECT_THAT([&] { host::requireWritable(_folder); },
+                isRefused("cannot write " + _folder.string() + ": Is a directory"));
     EXPECT_EQ(entries(), 0U);
 }
 

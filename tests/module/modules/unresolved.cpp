@@ -1,4 +1,4 @@
-// A module that needs a function that nobody has.
+// A module that needs a function that is defined nowhere.
 extern "C" int nobodyHasThisFunction();
 extern "C" int unresolvedModule() {
     return nobodyHasThisFunction();

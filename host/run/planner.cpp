@@ -1,4 +1,4 @@
-#include "host/run/run_plan.h"
+#include "host/run/planner.h"
 
 #include <algorithm>
 #include <charconv>
@@ -7,6 +7,8 @@
 
 #include <fmt/format.h>
 
+#include "host/record/problem.h"
+#include "host/record/run_text.h"
 #include "input/nearest.h"
 
 namespace host {
@@ -33,24 +35,24 @@ std::optional<platform::Number> readNumber(std::string_view text) {
     if (auto number = readAs<std::uint64_t>(text)) {
         return number;
     }
-    // Digits alone are an integer; one that fits neither kind is no number rather than a near one.
+    // Digits alone are an integer; one that fits neither kind is refused rather than rounded.
     const bool isInteger = text.find_first_not_of("+-0123456789") == std::string_view::npos;
     return isInteger ? std::nullopt : readAs<double>(text);
 }
 
-std::optional<RunPlan> planOf(const ZRLab& lab, const std::string& name) {
+RunPlan planOf(const ZRLab& lab, const std::string& name) {
     RunPlan plan;
     plan.name = name;
     if (const auto diagnostic = lab.diagnosticNamed(name)) {
-        plan.isDiagnostic = true;
         plan.summary = diagnostic->summary;
         plan.experiment.name = diagnostic->experimentName;
-        plan.analysis = PartPlan{.name = diagnostic->analysisName, .summary = {}, .parameters = {}};
+        plan.analysis.emplace().name = diagnostic->analysisName;
         return plan;
     }
     const auto experiments = lab.experimentNames();
     if (std::find(experiments.begin(), experiments.end(), name) == experiments.end()) {
-        return std::nullopt;
+        throw Problem(kExitUsage, "unknown diagnostic or experiment \"" + name + "\"" +
+                                      input::didYouMean(name, runnableNames(lab)));
     }
     plan.experiment.name = name;
     return plan;
@@ -86,11 +88,13 @@ std::optional<ZRDescription> describePart(const ZRLab& lab, Part part, std::stri
     return analysis != nullptr ? std::optional(analysis->analysisDescription()) : std::nullopt;
 }
 
-std::optional<ParameterSetting> readSetting(std::string_view text, std::string& problem) {
+ParameterSetting readSetting(std::string_view text) {
+    const auto fail = [text](const std::string& reason) {
+        throw Problem(kExitUsage, "--set " + std::string(text) + ": " + reason);
+    };
     const std::size_t equals = text.find('=');
     if (equals == std::string_view::npos || equals == 0) {
-        problem = "--set " + std::string(text) + ": not of the form PARAM=VALUE";
-        return std::nullopt;
+        fail("not of the form PARAM=VALUE");
     }
     ParameterSetting setting;
     std::string_view name = text.substr(0, equals);
@@ -105,64 +109,34 @@ std::optional<ParameterSetting> readSetting(std::string_view text, std::string& 
     const std::string_view value = text.substr(equals + 1);
     const auto number = readNumber(value);
     if (!number.has_value()) {
-        problem = "--set " + std::string(text) + ": \"" + std::string(value) +
-                  "\" is no number that fits a parameter";
-        return std::nullopt;
+        fail("\"" + std::string(value) + "\" is not a valid number");
     }
     setting.value = *number;
     return setting;
 }
 
-platform::Dictionary PartPlan::asDictionary() const {
-    platform::MutableDictionary entries;
-    for (const auto& [parameter, value] : parameters) {
-        entries.set(parameter, value);
-    }
-    return entries;
-}
-
-platform::Number RunPlan::experimentParameter(std::string_view parameter) const {
-    for (const auto& [given, value] : experiment.parameters) {
-        if (given == parameter) {
-            return value;
-        }
-    }
-    return {};
-}
-
-std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
-                                             const std::vector<std::string>& names,
-                                             const std::vector<ParameterSetting>& settings,
-                                             std::string& problem) {
+std::vector<RunPlan> planRuns(const ZRLab& lab,
+                              const std::vector<std::string>& names,
+                              const std::vector<ParameterSetting>& settings) {
     std::vector<RunPlan> plans;
     std::vector<bool> used(settings.size(), false);
     std::vector<std::string> declared;
     std::string missing;
 
     for (const std::string& name : names) {
-        std::optional<RunPlan> plan = planOf(lab, name);
-        if (!plan.has_value()) {
-            problem = "unknown diagnostic or experiment \"" + name + "\"" +
-                      input::didYouMean(name, runnableNames(lab));
-            return std::nullopt;
-        }
-        std::vector<std::pair<Part, PartPlan*>> parts{{Part::Experiment, &plan->experiment}};
-        if (plan->analysis.has_value()) {
-            parts.emplace_back(Part::Analysis, &*plan->analysis);
-        }
-        for (const auto& [kind, partPlan] : parts) {
-            const auto description = describePart(lab, kind, partPlan->name);
+        RunPlan& plan = plans.emplace_back(planOf(lab, name));
+        const auto fill = [&](Part kind, PartPlan& part) {
+            const auto description = describePart(lab, kind, part.name);
             if (!description.has_value()) {
-                problem = name + ": its " + std::string(partText(kind)) + " " + partPlan->name +
-                          " is not registered";
-                return std::nullopt;
+                throw Problem(kExitUsage, name + ": its " + std::string(partText(kind)) + " " +
+                                              part.name + " is not registered");
             }
-            partPlan->summary = description->summary();
+            part.summary = description->summary();
             for (const auto& [parameter, declaration] : description->parameters()) {
                 declared.push_back(parameter);
                 const auto value = valueFor(parameter, kind, settings, used);
                 if (value.has_value()) {
-                    partPlan->parameters.emplace_back(parameter, *value);
+                    part.parameters.emplace_back(parameter, *value);
                 } else if (declaration.required() && missing.empty()) {
                     missing = fmt::format(
                         "{}: parameter \"{}\" of its {} has no value; give one with --set "
@@ -170,13 +144,15 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
                         name, parameter, partText(kind), parameter);
                 }
             }
+        };
+        fill(Part::Experiment, plan.experiment);
+        if (plan.analysis.has_value()) {
+            fill(Part::Analysis, *plan.analysis);
+        } else {
+            plan.summary = plan.experiment.summary;
         }
-        if (!plan->isDiagnostic) {
-            plan->summary = plan->experiment.summary;
-        }
-        plans.push_back(std::move(*plan));
     }
-    // An unknown parameter first: a misspelt one is also what leaves another without a value.
+    // An unknown parameter first: if it is a misspelled one, the right one is without a value.
     for (std::size_t i = 0; i < settings.size(); ++i) {
         if (!used[i]) {
             const std::string whose =
@@ -184,14 +160,13 @@ std::optional<std::vector<RunPlan>> planRuns(const ZRLab& lab,
                     ? "no " + std::string(partText(*settings[i].part)) + " that is"
                     : "no part of what is";
             std::erase(declared, settings[i].name);  // of another part
-            problem = whose + " to be run declares a parameter \"" + settings[i].name + "\"" +
-                      input::didYouMean(settings[i].name, declared);
-            return std::nullopt;
+            throw Problem(kExitUsage, whose + " to be run declares a parameter \"" +
+                                          settings[i].name + "\"" +
+                                          input::didYouMean(settings[i].name, declared));
         }
     }
     if (!missing.empty()) {
-        problem = missing;
-        return std::nullopt;
+        throw Problem(kExitUsage, missing);
     }
     return plans;
 }

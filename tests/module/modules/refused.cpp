@@ -1,5 +1,9 @@
-// A module that registers names that another module has taken.
+// A module that registers names that another module has taken, and that exports a weak symbol.
 #include "frame/host_interface.h"
+
+extern "C" [[gnu::weak]] int takenModule() {
+    return 0;
+}
 
 namespace {
 

@@ -1,10 +1,12 @@
-#include "host/run/run_plan.h"
+#include "host/run/planner.h"
 
 #include <memory>
 #include <string>
 #include <vector>
 
 #include <gmock/gmock.h>
+
+#include "host/record/problem.h"
 
 namespace {
 
@@ -48,23 +50,20 @@ const ZRLab& lab() {
 std::string plan(const std::vector<std::string>& names,
                  const std::vector<std::string>& texts,
                  std::vector<host::RunPlan>* plans = nullptr) {
-    std::string problem;
-    std::vector<host::ParameterSetting> settings;
-    for (const std::string& text : texts) {
-        const auto setting = host::readSetting(text, problem);
-        if (!setting.has_value()) {
-            return problem;
+    try {
+        std::vector<host::ParameterSetting> settings;
+        for (const std::string& text : texts) {
+            settings.push_back(host::readSetting(text));
         }
-        settings.push_back(*setting);
+        auto made = host::planRuns(lab(), names, settings);
+        if (plans != nullptr) {
+            *plans = std::move(made);
+        }
+        return "planned";
+    } catch (const host::Problem& problem) {
+        EXPECT_EQ(problem.status(), host::kExitUsage);
+        return problem.what();
     }
-    auto made = host::planRuns(lab(), names, settings, problem);
-    if (!made.has_value()) {
-        return problem;
-    }
-    if (plans != nullptr) {
-        *plans = std::move(*made);
-    }
-    return "planned";
 }
 
 TEST(Setting, ReadsNumbersOfTheFittingKind) {
@@ -79,12 +78,10 @@ TEST(Setting, ReadsNumbersOfTheFittingKind) {
         {"a=false", Number(false)},
     };
     for (const auto& [text, expected] : rows) {
-        std::string problem;
-        const auto setting = host::readSetting(text, problem);
-        ASSERT_TRUE(setting.has_value()) << text << ": " << problem;
-        EXPECT_EQ(setting->value, expected) << text;
-        EXPECT_EQ(setting->name, "a");
-        EXPECT_FALSE(setting->part.has_value());
+        const host::ParameterSetting setting = host::readSetting(text);
+        EXPECT_EQ(setting.value, expected) << text;
+        EXPECT_EQ(setting.name, "a");
+        EXPECT_FALSE(setting.part.has_value());
     }
 }
 
@@ -92,11 +89,10 @@ TEST(Setting, NamesWhatIsWrong) {
     const std::pair<const char*, const char*> rows[] = {
         {"a", "--set a: not of the form PARAM=VALUE"},
         {"=1", "--set =1: not of the form PARAM=VALUE"},
-        {"a=", "--set a=: \"\" is no number that fits a parameter"},
-        {"a=9x", "--set a=9x: \"9x\" is no number that fits a parameter"},
+        {"a=", "--set a=: \"\" is not a valid number"},
+        {"a=9x", "--set a=9x: \"9x\" is not a valid number"},
         {"a=18446744073709551616",
-         "--set a=18446744073709551616: \"18446744073709551616\" is no number that fits a "
-         "parameter"},
+         "--set a=18446744073709551616: \"18446744073709551616\" is not a valid number"},
     };
     for (const auto& [text, expected] : rows) {
         EXPECT_EQ(plan({"PlanExperiment"}, {text}), expected);
@@ -114,7 +110,7 @@ TEST(RunPlan, GivesEachPartWhatItDeclares) {
               (platform::Dictionary{{"count", std::int64_t{3}}, {"seconds", 1.5}}));
     EXPECT_EQ(plans[0].analysis->asDictionary(),
               (platform::Dictionary{{"count", std::int64_t{2}}}));
-    EXPECT_FALSE(plans[1].isDiagnostic);
+    EXPECT_FALSE(plans[1].isDiagnostic());
     EXPECT_EQ(plans[1].summary, "Takes two.");
     EXPECT_FALSE(plans[1].analysis.has_value());
 }

@@ -1,0 +1,94 @@
+// What a device is to the bench, and the registry of the kinds of devices.
+//
+// A kind makes devices that stand behind the interfaces of platform/: the simulator makes one from a
+// profile, a port's kind opens the hardware. The program registers the kinds that are built in; a device
+// module, a shared object of a port's, registers its own from an initializer:
+//
+//     [[gnu::constructor]] void registerKind() {
+//         devices::registerKind({.name = "bench-board", .summary = "...", .open = openBoard});
+//     }
+//
+// A module is built with the compiler and the standard library of the program.
+#ifndef ZR_DEVICES_DEVICE_H
+#define ZR_DEVICES_DEVICE_H
+
+#include <functional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "platform/services.h"
+
+namespace devices {
+
+// The version of this header. It rises with every change after which a module must be built again.
+inline constexpr int kInterfaceVersion = 1;
+
+// A device, ready to run on. It lives as long as one of its services, streams or sensors is held.
+struct Device {
+    std::string name;     // under which reports know it
+    std::string summary;  // one line
+
+    // What the device says of itself, each fact a name and a text of one line: its platform, a serial
+    // number, a firmware version. Reports show them in this order. "platform" is the one name with a
+    // meaning: what kind of system stands behind the services.
+    std::vector<std::pair<std::string, std::string>> facts = {};
+
+    // What the bench installs; a service that is null counts as not available.
+    platform::Services services = {};
+};
+
+// Which device is asked for.
+struct Request {
+    std::string what;  // what was given after "KIND:"; may be empty
+    double speed = 1;  // simulated seconds per real second; 1 for a kind that takes no speed
+};
+
+// A device that can be asked for by name.
+struct Entry {
+    std::string name;
+    std::string summary;  // one line
+};
+
+struct Kind {
+    std::string name;     // lower-case letters, digits and hyphens, from a letter
+    std::string summary;  // one line
+
+    bool takesSpeed = false;  // its devices can run faster or slower than real time
+    bool hasFaults = false;   // its devices can be made to fail, so a fault can be asked for
+
+    // The devices that can be named; empty when none are known before they are asked for.
+    std::function<std::vector<Entry>()> list = {};
+
+    // The device that is asked for. Throws an exception derived from std::exception, whose text is one
+    // line that names the culprit, when there is no such device or it cannot be opened.
+    std::function<Device(const Request&)> open = {};
+};
+
+namespace detail {
+void registerKind(int interfaceVersion, const Kind& kind);
+}  // namespace detail
+
+// Adds a kind to the registry, for good. A name that is taken or not well formed, a kind that cannot
+// open anything and a caller built for another version of this header are refused; the refusal is
+// remembered. Any thread.
+inline void registerKind(const Kind& kind) {
+    // The version is the caller's, and it is compared before `kind` is looked at.
+    detail::registerKind(kInterfaceVersion, kind);
+}
+
+// The registered kinds in the order of registration. Any thread.
+std::vector<Kind> kinds();
+
+// Why registrations were refused, one line each, in their order. Any thread.
+std::vector<std::string> refusals();
+
+// Loads a device module. Throws a std::runtime_error, whose text is one line that names the file, when
+// it cannot be loaded (platform/module.h says why), when a kind of its was refused and when it registers
+// none. A file that was loaded before does nothing. One thread at a time.
+void loadDeviceModule(const std::string& path);
+
+}  // namespace devices
+
+#endif

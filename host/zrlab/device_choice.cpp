@@ -1,0 +1,113 @@
+#include "host/zrlab/device_choice.h"
+
+#include <algorithm>
+#include <charconv>
+#include <exception>
+#include <string_view>
+
+#include "devices/simulator/kind.h"
+#include "host/record/problem.h"
+#include "input/nearest.h"
+
+namespace host {
+
+namespace {
+
+// The built-in kinds. They are listed here, and not registered by initializers of their own, because the
+// linker drops an object file of a library that only an initializer would need. The first one is meant by a
+// name without a kind.
+constexpr devices::Kind (*kBuiltIn[])() = {simulator::kind};
+
+// Any faster, frames could outrun their validation and results would depend on the machine's load.
+constexpr double kLeastSpeed = 0.001;
+constexpr double kMaxSpeed = 100;
+
+double readSpeed(const std::string& text) {
+    if (text == "max") {
+        return kMaxSpeed;
+    }
+    double speed = 0;
+    const auto [end, problem] = std::from_chars(text.data(), text.data() + text.size(), speed);
+    const bool isWhole = problem == std::errc() && end == text.data() + text.size();
+    if (!isWhole || !(speed >= kLeastSpeed && speed <= kMaxSpeed)) {
+        throw Problem(kExitUsage,
+                      "--speed " + text + ": neither \"max\" nor a factor from 0.001 to 100");
+    }
+    return speed;
+}
+
+// The length of the kind's name that `device` begins with; 0 when there is none. A file's name can have a
+// colon too; it is unlikely to have one after such a word.
+std::size_t kindLength(std::string_view device) {
+    const std::size_t length = device.find_first_not_of("abcdefghijklmnopqrstuvwxyz0123456789-");
+    return length != std::string_view::npos && device[length] == ':' ? length : 0;
+}
+
+devices::Kind kindOf(const DeviceChoice& choice) {
+    const std::vector<devices::Kind> kinds = devices::kinds();
+    const std::size_t length = kindLength(choice.device);
+    if (length == 0) {
+        return kinds.front();
+    }
+    const std::string name = choice.device.substr(0, length);
+    std::vector<std::string> names;
+    for (const devices::Kind& kind : kinds) {
+        if (kind.name == name) {
+            return kind;
+        }
+        names.push_back(kind.name);
+    }
+    throw Problem(kExitUsage, "--device " + choice.device + ": unknown kind of device \"" + name +
+                                  "\"" + input::didYouMean(name, names));
+}
+
+}  // namespace
+
+void registerDeviceKinds(const std::vector<std::string>& modules) {
+    for (const auto& kind : kBuiltIn) {
+        devices::registerKind(kind());
+    }
+    for (const std::string& module : modules) {
+        try {
+            devices::loadDeviceModule(module);
+        } catch (const std::exception& problem) {
+            throw Problem(kExitUsage, problem.what());
+        }
+    }
+}
+
+std::string deviceArgument(const DeviceChoice& choice) {
+    const std::size_t length = kindLength(choice.device);
+    return length == 0 ? choice.device : choice.device.substr(length + 1);
+}
+
+devices::Device openDevice(const DeviceChoice& choice) {
+    const devices::Kind kind = kindOf(choice);
+    if (choice.speed.has_value() && !kind.takesSpeed) {
+        throw Problem(kExitUsage, "--speed " + *choice.speed + ": a device of the kind \"" +
+                                      kind.name + "\" has no speed to choose");
+    }
+    const double speed = choice.speed.has_value() ? readSpeed(*choice.speed) : 1;
+    try {
+        return kind.open({.what = deviceArgument(choice), .speed = speed});
+    } catch (const std::exception& problem) {
+        throw Problem(kExitError, problem.what());
+    }
+}
+
+std::vector<ListedDevice> listDevices() {
+    std::vector<ListedDevice> listed;
+    bool isFirst = true;
+    for (const devices::Kind& kind : devices::kinds()) {
+        const std::string prefix = isFirst ? "" : kind.name + ":";
+        isFirst = false;
+        if (kind.list) {
+            for (const devices::Entry& entry : kind.list()) {
+                listed.push_back({prefix + entry.name, entry.summary});
+            }
+        }
+    }
+    return listed;
+}
+
+}  // namespace host

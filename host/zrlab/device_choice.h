@@ -1,0 +1,45 @@
+// Choosing the device that a session runs on, among the kinds that are built in and those that device
+// modules register.
+#ifndef ZR_HOST_ZRLAB_DEVICE_CHOICE_H
+#define ZR_HOST_ZRLAB_DEVICE_CHOICE_H
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "devices/device.h"
+
+namespace host {
+
+// What the command line says about the device.
+struct DeviceChoice {
+    // KIND:WHAT. Without a kind it is the simulator's: a name of its gallery or a file.
+    std::string device = "healthy";
+    std::optional<std::string> speed;  // a factor from 0.001 to 100, or "max"; 1 when not given
+    std::vector<std::string> modules;  // files of device modules, loaded in this order
+};
+
+// Registers the kinds that are built in, then those of the modules. Throws a Problem (kExitUsage) about a
+// module that cannot be used. Call it once.
+void registerDeviceKinds(const std::vector<std::string>& modules);
+
+// What the device is opened with: the part of `device` behind its kind. It may be the name of a file.
+std::string deviceArgument(const DeviceChoice& choice);
+
+// Opens the device. Throws a Problem: kExitUsage about an unknown kind, or a speed that is wrong or that
+// the kind does not take; kExitError about a device that the kind cannot open.
+devices::Device openDevice(const DeviceChoice& choice);
+
+// A device that --device takes.
+struct ListedDevice {
+    std::string name;
+    std::string summary;
+};
+
+// The devices that the registered kinds list, by kind. The simulator's, which come first, go without
+// their kind.
+std::vector<ListedDevice> listDevices();
+
+}  // namespace host
+
+#endif

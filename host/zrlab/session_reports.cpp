@@ -1,0 +1,101 @@
+#include "host/zrlab/session_reports.h"
+
+#include <filesystem>
+#include <set>
+#include <system_error>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "host/record/problem.h"
+#include "host/report/report_forms.h"
+#include "host/zrlab/terminal.h"
+
+namespace host {
+
+SessionReports::SessionReports(const SessionOptions& options) {
+    const ReportForm& format = *reportFormNamed(options.format);
+    if (options.output.empty()) {
+        const TextStyle style{.colour = Terminal::outputTakesColour(options.colour),
+                              .verbose = options.verbose};
+        _listeners.push_back(format.open(
+            [this](std::string_view text) {
+                if (!Terminal::shared().output(text)) {
+                    _outputFailed = true;
+                }
+            },
+            style));
+        _drawFrames = format.drawsFrames;
+    } else {
+        const ReportForm* meant = reportFormOf(options.output);
+        if (meant != nullptr && meant != &format) {
+            throw Problem(kExitUsage, "--output " + options.output + ": its ending says " +
+                                          std::string(meant->name) + ", the format is " +
+                                          options.format +
+                                          "; a further report is asked for with --report");
+        }
+        _addFile(options.output, format);
+    }
+    for (const std::string& path : options.reports) {
+        const ReportForm* form = reportFormOf(path);
+        if (form == nullptr) {
+            throw Problem(kExitUsage, "--report " + path + ": its ending is none of " +
+                                          fmt::format("{}", fmt::join(reportEndings(), ", ")));
+        }
+        _addFile(path, *form);
+    }
+    _refuseClashes(deviceArgument(options.device));
+    for (const File& file : _files) {
+        requireWritable(file.path);
+    }
+    for (File& file : _files) {
+        file.content = std::make_shared<Spool>();
+        _listeners.push_back(file.form->open(
+            [content = file.content](std::string_view text) { content->append(text); },
+            {.colour = false, .verbose = options.verbose}));
+    }
+}
+
+void SessionReports::_addFile(const std::string& path, const ReportForm& form) {
+    _files.push_back({path, &form, nullptr});
+    _drawFrames = _drawFrames || form.drawsFrames;
+}
+
+// Two reports in one file, or a report over the file that describes the device.
+void SessionReports::_refuseClashes(const std::string& device) const {
+    std::set<std::filesystem::path> seen;
+    const auto add = [&seen](const std::string& file) {
+        std::error_code none;
+        const auto path = std::filesystem::weakly_canonical(file, none);
+        const bool special =
+            std::filesystem::exists(path, none) && !std::filesystem::is_regular_file(path, none);
+        return special || seen.insert(path).second;
+    };
+    add(device);
+    for (const File& file : _files) {
+        if (!add(file.path)) {
+            throw Problem(kExitUsage, file.path +
+                                          ": it cannot take this report, it is used for something "
+                                          "else already");
+        }
+    }
+}
+
+bool SessionReports::finish() {
+    bool isWhole = true;
+    for (const File& file : _files) {
+        try {
+            file.content->writeTo(file.path);
+        } catch (const Problem& problem) {
+            Terminal::shared().complain(problem.what());
+            isWhole = false;
+        }
+    }
+    if (_outputFailed) {
+        Terminal::shared().complain("cannot write standard output");
+        isWhole = false;
+    }
+    return isWhole;
+}
+
+}  // namespace host

@@ -1,0 +1,66 @@
+// SessionReports: every report that a session was asked for, and where each goes.
+#ifndef ZR_HOST_ZRLAB_SESSION_REPORTS_H
+#define ZR_HOST_ZRLAB_SESSION_REPORTS_H
+
+#include <atomic>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/record/run_listener.h"
+#include "host/report/report_form.h"
+#include "host/zrlab/output_file.h"
+#include "host/zrlab/session_options.h"
+
+namespace host {
+
+// One report goes to standard output, or to the file that --output names; a further one to each file that
+// --report names.
+//
+// Owner    The session, and the log's sink: a time-out that outlives its run may log when the session is
+//          gone.
+// Threads  The session's, but for the listeners' logged().
+class SessionReports {
+  public:
+    // Checks that every report can be written. Throws a Problem: kExitUsage about a file's ending, or a
+    // file that is used twice or for the device; kExitError about a file that cannot be written.
+    explicit SessionReports(const SessionOptions& options);
+
+    SessionReports(const SessionReports&) = delete;
+    SessionReports& operator=(const SessionReports&) = delete;
+
+    // The reports, in the order in which they were asked for.
+    const std::vector<std::shared_ptr<RunListener>>& listeners() const { return _listeners; }
+
+    // Whether one of them draws frames.
+    bool drawFrames() const { return _drawFrames; }
+
+    // Whether standard output takes no more: its reader has gone.
+    bool outputFailed() const { return _outputFailed; }
+
+    // Once the session has ended: puts the files in their places. Whatever cannot be written is reported
+    // in one line on standard error, and the others are written all the same. False when anything failed,
+    // standard output included.
+    bool finish();
+
+  private:
+    struct File {
+        std::string path;
+        const ReportForm* form;
+        std::shared_ptr<Spool> content;
+    };
+
+    void _addFile(const std::string& path, const ReportForm& form);
+    void _refuseClashes(const std::string& device) const;
+
+    std::vector<File> _files;
+    std::vector<std::shared_ptr<RunListener>> _listeners;
+    bool _drawFrames = false;
+    // Set by the thread that makes a line, read by the session's.
+    std::atomic<bool> _outputFailed{false};
+};
+
+}  // namespace host
+
+#endif

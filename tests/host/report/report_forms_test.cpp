@@ -1,0 +1,60 @@
+// Every row of the table of forms makes a report, and is found by its name and its files' ending.
+#include "host/report/report_forms.h"
+
+#include <set>
+#include <string>
+
+#include <gmock/gmock.h>
+
+#include "tests/host/report/sample_sessions.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+TEST(ReportForms, EachWritesASessionAndIsFound) {
+    std::set<std::string_view> names;
+    for (const host::ReportForm& form : host::reportForms()) {
+        EXPECT_TRUE(names.insert(form.name).second) << form.name;
+        EXPECT_EQ(host::reportFormNamed(form.name), &form);
+        EXPECT_EQ(host::reportFormOf("some.folder/a.b" + std::string(form.ending)), &form);
+
+        std::string text;
+        bool isEarly = false;
+        host::SessionRecord session = test::judgedSession();
+        const auto report = form.open([&text](std::string_view piece) { text += piece; }, {});
+        report->sessionStarted(session);
+        report->runStarted(session.runs.front());
+        report->partStarted(session.runs.front(), host::Part::Experiment);
+        report->partEnded(session.runs.front(), host::Part::Experiment);
+        report->runEnded(session.runs.front());
+        report->nameEnded(session);
+        isEarly = !text.empty();
+        report->sessionEnded(session);
+        EXPECT_EQ(isEarly, form.streams) << form.name;
+        EXPECT_THAT(text, HasSubstr(session.runs.front().plan.name)) << form.name;
+        EXPECT_EQ(text.back(), '\n') << form.name;
+    }
+    EXPECT_EQ(host::reportFormOf("REPORT.HTML"), host::reportFormNamed("html"));
+    EXPECT_EQ(host::reportFormOf("html"), nullptr);
+    EXPECT_EQ(host::reportFormNamed("pdf"), nullptr);
+    EXPECT_THAT(host::outputFormNames(), ElementsAre("text", "json", "jsonl", "junit"));
+}
+
+// Names that were asked for are set apart, and a repeated one begins with its figures.
+TEST(ReportForms, TextIsWrittenNameByName) {
+    host::SessionRecord session = test::repeatedSession();
+    std::string text;
+    const auto report =
+        host::reportFormNamed("text")->open([&text](std::string_view piece) { text += piece; }, {});
+    report->nameEnded(session);
+    EXPECT_THAT(text, HasSubstr("17 passed, 2 failed, 1 in error"));
+    EXPECT_THAT(text, HasSubstr("\nrun 7:\nFAIL"));
+    session.runs.push_back(session.runs.front());
+    text.clear();
+    report->nameEnded(session);
+    EXPECT_EQ(text.front(), '\n');
+}
+
+}  // namespace

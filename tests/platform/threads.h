@@ -1,0 +1,56 @@
+// The threads of the process, as tests look at them.
+#ifndef ZR_TESTS_PLATFORM_THREADS_H
+#define ZR_TESTS_PLATFORM_THREADS_H
+
+#include <cstddef>
+#include <filesystem>
+#include <fstream>
+#include <map>
+#include <string>
+#include <system_error>
+
+#include <pthread.h>
+
+namespace test {
+
+// How many threads the process has, by name.
+inline std::map<std::string, std::size_t> threadNames() {
+    std::map<std::string, std::size_t> names;
+    std::error_code threadEnded;
+    for (const auto& task : std::filesystem::directory_iterator("/proc/self/task", threadEnded)) {
+        std::string name;
+        std::getline(std::ifstream(task.path() / "comm"), name);
+        ++names[name];
+    }
+    return names;
+}
+
+inline std::size_t threadsNamed(const std::string& name) {
+    return threadNames()[name];
+}
+
+// As long as it lives, no thread can be started: each would need a stack beyond the address space.
+class NoThreads {
+  public:
+    NoThreads() {
+        pthread_getattr_default_np(&_before);
+        pthread_attr_t huge;
+        pthread_attr_init(&huge);
+        pthread_attr_setstacksize(&huge, std::size_t{1} << 62);
+        pthread_setattr_default_np(&huge);
+        pthread_attr_destroy(&huge);
+    }
+    ~NoThreads() {
+        pthread_setattr_default_np(&_before);
+        pthread_attr_destroy(&_before);
+    }
+    NoThreads(const NoThreads&) = delete;
+    NoThreads& operator=(const NoThreads&) = delete;
+
+  private:
+    pthread_attr_t _before;
+};
+
+}  // namespace test
+
+#endif

@@ -37,11 +37,16 @@ function(zr_hide_symbols name)
     VISIBILITY_INLINES_HIDDEN ON)
 endfunction()
 
-# zr_component(NAME SHARED|STATIC SOURCES file... [USES target...] [PRIVATE_USES target...])
-# A library of this folder. USES are the folders that its headers show; PRIVATE_USES stay inside.
+# zr_component(NAME SHARED|STATIC [SOURCES file...] [USES target...] [PRIVATE_USES target...])
+# A library of this folder, made of SOURCES or else of every source file in it but main.cpp. USES are the
+# folders that its headers show; PRIVATE_USES stay inside.
 # A shared one is what plug-ins and device modules link: zrlab::NAME, here and in the package.
 function(zr_component name type)
   cmake_parse_arguments(PARSE_ARGV 2 arg "" "" "SOURCES;USES;PRIVATE_USES")
+  if(NOT arg_SOURCES)
+    file(GLOB arg_SOURCES CONFIGURE_DEPENDS "${CMAKE_CURRENT_SOURCE_DIR}/*.cpp")
+    list(FILTER arg_SOURCES EXCLUDE REGEX "/main\\.cpp$")
+  endif()
   add_library(${name} ${type} ${arg_SOURCES})
   target_link_libraries(${name} PUBLIC ${arg_USES} PRIVATE zr_build_flags ${arg_PRIVATE_USES})
   target_include_directories(${name} PUBLIC "$<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}>")

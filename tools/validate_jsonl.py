@@ -40,7 +40,7 @@ def reason_of(errors):
 
 
 def refuse_constant(name):
-    raise ValueError(f"{name} is no JSON")
+    raise ValueError(f"{name} is not JSON")
 
 
 def is_met(measurement):
@@ -48,7 +48,7 @@ def is_met(measurement):
     value = float(measurement["value"])
     for validator in measurement["validators"]:
         if validator["type"] not in HOLDS:
-            raise ValueError(f"a validator of type {validator['type']} is no bound of a limit")
+            raise ValueError(f"a validator of type {validator['type']} is not a bound of a limit")
         if not HOLDS[validator["type"]](value, float(validator["value"])):
             return False
     return not math.isnan(value)

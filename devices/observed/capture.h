@@ -30,9 +30,9 @@ class ObservedCapture : public WLISPCapturePlugIn {
 // Waiting: invalidate() waits for buffers that are still out, at most a second, so that work that is
 // queued already can give its own back. Inside a handler it neither waits nor reports them.
 //
-// Lifetime: each device() is a new wrapper. A device's stream has one wrapper as long as somebody holds
-// it. Wrappers may go on any thread, in any order, inside a handler as well. No lock is held while the
-// device, a handler or the observer is called.
+// Lifetime: each device() is a new wrapper. A device's stream has one wrapper while that is held, and
+// what is known of it lasts as long as the stream. Wrappers may go on any thread, in any order, inside a
+// handler as well. No lock is held while the device, a handler or the observer is called.
 //
 // Cost: a frame takes one allocation, the count of its buffer; an event none.
 //

@@ -63,7 +63,7 @@ class HidWatch {
         const MutexLock lock(_mutex);
         std::erase_if(_schedules, [&](const Schedule& schedule) {
             return schedule.mode == mode &&
-                   (runLoop == nullptr ? schedule.runLoop.expired() : isOf(schedule, runLoop));
+                   (runLoop == nullptr ? schedule.runLoop.expired() : _isOf(schedule, runLoop));
         });
     }
 
@@ -73,7 +73,7 @@ class HidWatch {
         const MutexLock lock(_mutex);
         bool bound = false;
         for (const Schedule& schedule : _schedules) {
-            if (current != nullptr && isOf(schedule, current)) {
+            if (current != nullptr && _isOf(schedule, current)) {
                 return true;
             }
             bound = bound || !schedule.runLoop.expired();
@@ -110,7 +110,7 @@ class HidWatch {
     };
 
     // Without a reference to the scheduled one, which could become the last.
-    static bool isOf(const Schedule& schedule, const std::shared_ptr<RunLoop>& runLoop) {
+    static bool _isOf(const Schedule& schedule, const std::shared_ptr<RunLoop>& runLoop) {
         return !schedule.runLoop.owner_before(runLoop) && !runLoop.owner_before(schedule.runLoop);
     }
 

@@ -18,8 +18,9 @@ namespace observed {
 //   The device   the report callback called on another thread than the run loop's (once per device)
 //
 // A device is not taken for open or closed once a close() has failed. A run loop that is gone binds a
-// device to no thread. A matched device has one wrapper as long as somebody holds it. No lock is held
-// while the device, a callback or the observer is called.
+// device to no thread. A matched device has one wrapper while that is held, and what is known
+// of it lasts as long as the device. No lock is held while the device, a callback or the observer is
+// called.
 //
 // Null for a null facility.
 std::shared_ptr<platform::HidFacility> observeHid(std::shared_ptr<platform::HidFacility> facility,

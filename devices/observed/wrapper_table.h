@@ -9,9 +9,9 @@
 
 namespace observed {
 
-// One wrapper per object as long as somebody holds it, and one State per object as long as the object
-// lives: what is known of it outlives its wrapper. A Wrapper is made from the object and its state. The
-// table keeps neither objects nor wrappers alive. Any thread.
+// An object has one wrapper while that is held, and one State as long as the object lives: what is
+// known of it outlives its wrapper. A Wrapper is made from the object and its state. The table keeps
+// neither objects nor wrappers alive. Any thread.
 template <class Object, class State, class Wrapper>
 class WrapperTable {
   public:

@@ -29,7 +29,7 @@ std::string failureText(const FailureRecord& failure) {
     if (failure.error != nullptr) {
         return failure.error->localizedDescription();
     }
-    return failure.message.empty() ? "it failed without saying why" : failure.message;
+    return failure.message.empty() ? "failed without an error" : failure.message;
 }
 
 std::string numberText(double value) {
@@ -85,6 +85,9 @@ std::string headline(const RunRecord& run) {
     };
     const auto outside = countOf(Judgement::Outside);
     const auto limited = outside + countOf(Judgement::Within);
+    if (limited == 1) {
+        return outside > 0 ? "the limit is not met" : "the limit is met";
+    }
     return outside > 0 ? fmt::format("{} of {} limits not met", outside, limited)
                        : fmt::format("all {} limits met", limited);
 }

@@ -129,7 +129,7 @@ class Suite {
         if (failed) {
             ++_counts.failures;
             pugi::xml_node failure = node.append_child("failure");
-            setAttribute(failure, "type", "outside of its limit");
+            setAttribute(failure, "type", "outside its limit");
             setAttribute(failure, "message", finding);
             failure.text().set(cleanText(finding).c_str());
         } else {

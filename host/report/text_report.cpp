@@ -220,7 +220,8 @@ std::string textReport(const RunRecord& run, const TextStyle& style) {
     out += writer.faintLine(fmt::format("      {}", run.plan.summary));
     std::string parameters = parametersText(run.plan.experiment);
     if (run.analysisSeconds.has_value() && !run.plan.analysis->parameters.empty()) {
-        parameters += fmt::format("; analysis: {}", parametersText(*run.plan.analysis));
+        parameters += fmt::format("{}analysis: {}", parameters.empty() ? "" : "; ",
+                                  parametersText(*run.plan.analysis));
     }
     if (!parameters.empty()) {
         out += writer.faintLine(fmt::format("      {}", parameters));

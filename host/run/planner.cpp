@@ -155,10 +155,9 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
     // An unknown parameter first: if it is a misspelled one, the right one is without a value.
     for (std::size_t i = 0; i < settings.size(); ++i) {
         if (!used[i]) {
-            const std::string whose =
-                settings[i].part.has_value()
-                    ? "no " + std::string(partText(*settings[i].part)) + " that is"
-                    : "no part of what is";
+            const std::string whose = settings[i].part.has_value()
+                                          ? "no " + std::string(partText(*settings[i].part))
+                                          : "none of the parts";
             std::erase(declared, settings[i].name);  // of another part
             throw Problem(kExitUsage, whose + " to be run declares a parameter \"" +
                                           settings[i].name + "\"" +

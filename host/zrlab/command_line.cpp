@@ -28,7 +28,7 @@ constexpr std::string_view kRunExamples = R"(Examples:
   zrlab run VantorFaultDiagnostic --set frameCount=90 --set timeout=10
       Stream 90 frames and judge counters, frame count and errors.
   zrlab run VantorFaultDiagnostic --set frameCount=90 --set analysis:frameCount=80 --set timeout=10
-      Stream 90 frames, be content with 80.
+      Stream 90 frames, require 80.
   zrlab run KirraImageExperiment --set images=25 --set timeout=5 --report images.html
       Collect 25 images and draw them.
   zrlab run VantorMeterixDiagnostic --device counter-stuck --format jsonl
@@ -186,7 +186,7 @@ void CommandLine::_addRun() {
                                                 : Colour::Automatic;
         })
         ->check(oneOf({"auto", "always", "never"}));
-    run.add_option("--log", session.logLevel, "The least level of log lines on standard error")
+    run.add_option("--log", session.logLevel, "Lowest level of log lines on standard error")
         ->check(oneOf({"debug", "default", "error", "off"}))
         ->type_name("debug|default|error|off")
         ->capture_default_str();

@@ -84,8 +84,8 @@ std::string deviceArgument(const DeviceChoice& choice) {
 devices::Device openDevice(const DeviceChoice& choice) {
     const devices::Kind kind = kindOf(choice);
     if (choice.speed.has_value() && !kind.takesSpeed) {
-        throw Problem(kExitUsage, "--speed " + *choice.speed + ": a device of the kind \"" +
-                                      kind.name + "\" has no speed to choose");
+        throw Problem(kExitUsage, "--speed " + *choice.speed + ": devices of the kind \"" +
+                                      kind.name + "\" do not take a speed");
     }
     const double speed = choice.speed.has_value() ? readSpeed(*choice.speed) : 1;
     try {

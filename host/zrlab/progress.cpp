@@ -73,7 +73,7 @@ std::string Progress::_text() const {
                                                                               : _recorder.images());
     std::string text = fmt::format("{}{:.0f} of {:.6g} {}, {:.1f} per second", _prefix, count,
                                    _wanted, _count->plural, elapsed > 0 ? count / elapsed : 0.0);
-    const double left = std::max(std::ceil(_timeout - elapsed), 0.0);
+    const double left = std::max(0.0, std::ceil(_timeout - elapsed));
     if (_timeout >= 0 && std::isfinite(left)) {
         text += fmt::format(", {:.6g} s until the time-out", left);
     }

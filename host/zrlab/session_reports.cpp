@@ -39,7 +39,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
     for (const std::string& path : options.reports) {
         const ReportForm* form = reportFormOf(path);
         if (form == nullptr) {
-            throw Problem(kExitUsage, "--report " + path + ": its ending is none of " +
+            throw Problem(kExitUsage, "--report " + path + ": its ending is not one of " +
                                           fmt::format("{}", fmt::join(reportEndings(), ", ")));
         }
         _addFile(path, *form);
@@ -74,9 +74,8 @@ void SessionReports::_refuseClashes(const std::string& device) const {
     add(device);
     for (const File& file : _files) {
         if (!add(file.path)) {
-            throw Problem(kExitUsage, file.path +
-                                          ": it cannot take this report, it is used for something "
-                                          "else already");
+            throw Problem(kExitUsage,
+                          file.path + ": already used for the device or another report");
         }
     }
 }

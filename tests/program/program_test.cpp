@@ -116,7 +116,7 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "one with --set timeout=NUMBER\n"},
         {{"run", "VantorMeterixDiagnostic", "--report", "a.pdf"},
          64,
-         "zrlab: --report a.pdf: its ending is none of .html, .json, .jsonl, .txt, .xml\n"},
+         "zrlab: --report a.pdf: its ending is not one of .html, .json, .jsonl, .txt, .xml\n"},
         {{"run", "VantorMeterixDiagnostic", "--speed", "-1"},
          64,
          "zrlab: --speed -1: neither \"max\" nor a factor from 0.001 to 100\n"},
@@ -140,7 +140,7 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          64,
          "zrlab: device module /no/such.so: no such file\n"},
         {board({"--device", "board:rev-b", "--speed", "2"}), 64,
-         "zrlab: --speed 2: a device of the kind \"board\" has no speed to choose\n"},
+         "zrlab: --speed 2: devices of the kind \"board\" do not take a speed\n"},
         {board({"--device", "board:rev-z"}), 2, "zrlab: board rev-z: not connected\n"},
         {{"help", "runn"}, 64, "zrlab: help: unknown command \"runn\"; did you mean run?\n"},
     };

@@ -101,7 +101,7 @@ class ValidatorTest(unittest.TestCase):
             (good[:40], "the last line has no end"),
             (good.replace(":07.125Z", ":07.125"), "no time zone"),
             (good.replace('"sequenceNumber": 3', '"sequenceNumber": 4'), "sequence number 4"),
-            (good.replace('"value": 3', '"value": NaN', 1), "NaN is no JSON"),
+            (good.replace('"value": 3', '"value": NaN', 1), "NaN is not JSON"),
             ("", "the last line has no end"),
         ]:
             self.assertIn(reason, self.problem_with(text) or "no problem")

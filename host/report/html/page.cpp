@@ -89,7 +89,7 @@ std::string contentsHtml(const SessionRecord& session) {
 std::string footHtml(const SessionRecord& session) {
     std::string facts;
     for (const auto& [name, text] : session.deviceFacts) {
-        facts += factHtml("Device's " + htmlText(name), text);
+        facts += factHtml("Device: " + htmlText(name), text);
     }
     return fmt::format(R"(<footer class="sheet">
 <h2>How this was made</h2>

@@ -183,7 +183,7 @@ std::string failuresHtml(const RunRecord& run) {
     for (const FailureRecord& failure : run.failures) {
         errors += errorHtml(failure, run);
     }
-    Table table("Results outside of their limits",
+    Table table("Results outside their limits",
                 {{"Result"}, {"Measured", "number"}, {"Limit"}, {"Range"}, {"Deviation"}});
     for (const ResultRecord& result : run.results) {
         if (result.judgement == Judgement::Outside) {
@@ -227,7 +227,7 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
     const std::vector<Column> columns = {
         {"Result"}, {"Least", "number"}, {"Median", "number"}, {"Greatest", "number"}, {"Unit"},
         {"Limit"},  {"Range"},           {"Outside", "number"}};
-    Table table("Results that differed from run to run, or were outside of their limits", columns);
+    Table table("Results that differed from run to run, or were outside their limits", columns);
     Table alike("Results within their limits and alike in every run", columns);
     std::uint64_t alikeCount = 0;
     for (const ResultStatistics& result : repeat->results) {

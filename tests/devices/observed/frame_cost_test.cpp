@@ -43,7 +43,8 @@ TEST(FrameCost, IsOneAllocation) {
         stream->setValue(test::captureHandlers([](const auto&, auto) {}, [](auto, auto, auto) {}),
                          kRylCaptureStreamProperty_VideoOutputHandlers, nullptr));
     const auto buffer = test::imageBuffer();
-    fake->stream->deliverFrame(buffer);  // the first use of a dictionary makes what all of them share
+    fake->stream->deliverFrame(
+        buffer);  // the first use of a dictionary makes what all of them share
     fake->stream->deliverEvent(1, {}, 2);
     const int before = allocations;
     for (int frame = 0; frame < 100; ++frame) {

@@ -137,10 +137,10 @@ TEST(RunPlan, RefusesBeforeAnythingRuns) {
          "count=NUMBER"},
         {{"PlanExperiment"},
          {"coumt=1"},
-         "no part of what is to be run declares a parameter \"coumt\"; did you mean count?"},
+         "none of the parts to be run declares a parameter \"coumt\"; did you mean count?"},
         {{"PlanExperiment"},
          {"count=1", "analysis:count=1"},
-         "no analysis that is to be run declares a parameter \"count\""},
+         "no analysis to be run declares a parameter \"count\""},
         {{"HalfDiagnostic"}, {"count=1"}, "HalfDiagnostic: its analysis Nowhere is not registered"},
     };
     for (const Row& row : rows) {

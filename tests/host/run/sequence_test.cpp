@@ -116,7 +116,7 @@ TEST(Sequence, AFailedStepEndsWhatDependsOnIt) {
             ASSERT_EQ(run.failures.size(), 1U) << row.failing;
             EXPECT_EQ(run.failures[0].step, row.recordedStep);
             const std::string expected[] = {std::string(row.failing) + " failed",
-                                            "it failed without saying why",
+                                            "failed without an error",
                                             "No HID Manager available?!"};
             EXPECT_EQ(host::failureText(run.failures[0]), expected[way]);
         }

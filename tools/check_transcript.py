@@ -1,17 +1,18 @@
 #!/usr/bin/python3
 """Runs the commands on a page and compares what they print with what the page shows.
 
-check_transcript.py PAGE SOURCES            exit status 1 and a difference for each that is not so
-check_transcript.py PAGE SOURCES --update   writes what the commands print into the page
+Exit status 1 and a difference for each that is not so. With --update, what the commands print is written
+into the page.
 
 All commands of the page run in one shell, in the folder HOME, for which ~ stands in what they print.
 Run times, as in "0.02 s", are not compared. A block is
   sh          run; it must succeed, and the page does not show what it prints
   console     "$ COMMAND", then what the command prints on both streams; the next "$ COMMAND", and so on
-  cpp, cmake  an excerpt of a file in the folder SOURCES, at any indentation
+  cpp, cmake  with --excerpts-of FOLDER: an excerpt of a file of that folder, at any indentation
 Other blocks are not looked at.
 """
 
+import argparse
 import difflib
 import os
 import pathlib
@@ -65,9 +66,15 @@ def console(shell, body):
 
 
 def main():
-    page = pathlib.Path(sys.argv[1])
-    sources = indented_alike(" ".join(
-        file.read_text() for file in sorted(pathlib.Path(sys.argv[2]).iterdir()) if file.is_file()))
+    parser = argparse.ArgumentParser(description=__doc__,
+                                     formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("page", type=pathlib.Path)
+    parser.add_argument("--excerpts-of", type=pathlib.Path, metavar="FOLDER")
+    parser.add_argument("--update", action="store_true")
+    arguments = parser.parse_args()
+    page, folder = arguments.page, arguments.excerpts_of
+    sources = folder and indented_alike(" ".join(
+        file.read_text() for file in sorted(folder.iterdir()) if file.is_file()))
     problems = []
     ran = 0
 
@@ -85,17 +92,17 @@ def main():
                 problems.append("\n".join(difflib.unified_diff(
                     body.splitlines(), new.splitlines(), "the page", "a run", lineterm="")))
                 return f"```{language}\n{new}```"
-        elif language in ("cpp", "cmake") and indented_alike(body) not in sources:
-            problems.append(f"not in {sys.argv[2]}:\n{textwrap.indent(body, '  ')}")
+        elif language in ("cpp", "cmake") and folder and indented_alike(body) not in sources:
+            problems.append(f"not in {folder}:\n{textwrap.indent(body, '  ')}")
         return match.group(0)
 
     shell = Shell()
     new = BLOCK.sub(check, page.read_text())
     shell.process.communicate()
-    if "--update" in sys.argv:
+    if arguments.update:
         page.write_text(new)
     print("\n".join(problems) if problems else f"{page.name}: {ran} commands print what it shows")
-    return 1 if ran == 0 or (problems and "--update" not in sys.argv) else 0
+    return 1 if ran == 0 or (problems and not arguments.update) else 0
 
 
 sys.exit(main())

@@ -61,7 +61,7 @@ install(FILES "${zsh_completion}" DESTINATION "${data}/zsh/vendor-completions")
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/profiles" DESTINATION "${data}/zrlab"
   FILES_MATCHING PATTERN "*.json" PATTERN "expected-outcomes.json" EXCLUDE)
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/docs/" DESTINATION "${documents}"
-  FILES_MATCHING PATTERN "*.md")
+  FILES_MATCHING PATTERN "*.md" PATTERN "images" EXCLUDE)
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/examples" DESTINATION "${documents}"
   PATTERN "build" EXCLUDE)
 install(FILES "${PROJECT_SOURCE_DIR}/cmake/package/copyright" DESTINATION "${documents}")

@@ -34,7 +34,7 @@ bool isWellFormed(std::string_view name) {
 // Why the kind cannot be registered; empty when it can.
 std::string problemWith(const Kind& kind, const std::vector<Kind>& known) {
     if (!isWellFormed(kind.name)) {
-        return "the kind name \"" + kind.name + "\" is not made of a-z, 0-9 and -";
+        return "the kind name \"" + kind.name + "\" is not a letter followed by a-z, 0-9 and -";
     }
     if (!kind.open) {
         return "the kind \"" + kind.name + "\" cannot open a device";
@@ -86,7 +86,7 @@ void loadDeviceModule(const std::string& path) {
     } catch (const platform::ModuleProblem& problem) {
         fail(problem.what());
     }
-    if (!loaded.insert(module).second) {
+    if (loaded.contains(module)) {
         return;
     }
     const std::vector<std::string> refused = refusals();
@@ -96,6 +96,7 @@ void loadDeviceModule(const std::string& path) {
     if (kinds().size() == kindsBefore) {
         fail("it registers no kind of device");
     }
+    loaded.insert(module);
 }
 
 }  // namespace devices

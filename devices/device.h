@@ -2,7 +2,7 @@
 //
 // A kind makes devices that stand behind the interfaces of platform/: the simulator makes one from a
 // profile, a port's kind opens the hardware. The program registers the kinds that are built in; a device
-// module, a shared object of a port's, registers its own from an initializer:
+// module, a port's shared object, registers its own from an initializer:
 //
 //     [[gnu::constructor]] void registerKind() {
 //         devices::registerKind({.name = "bench-board", .summary = "...", .open = openBoard});
@@ -42,7 +42,7 @@ struct Device {
 // Which device is asked for.
 struct Request {
     std::string what;  // what was given after "KIND:"; may be empty
-    double speed = 1;  // simulated seconds per real second; 1 for a kind that takes no speed
+    double speed = 1;  // simulated seconds per real second, 0.001 to 100; 1 for a kind without
 };
 
 // A device that can be asked for by name.
@@ -56,9 +56,10 @@ struct Kind {
     std::string summary;  // one line
 
     bool takesSpeed = false;  // its devices can run faster or slower than real time
-    bool hasFaults = false;   // its devices can be made to fail, so a fault can be asked for
+    bool hasFaults = false;   // its devices can be configured to fail
 
-    // The devices that can be named; empty when none are known before they are asked for.
+    // The devices that can be named; empty when none are known before they are opened. Called, like
+    // open(), on the program's main thread.
     std::function<std::vector<Entry>()> list = {};
 
     // The device that is asked for. Throws an exception derived from std::exception, whose text is one
@@ -85,7 +86,7 @@ std::vector<Kind> kinds();
 std::vector<std::string> refusals();
 
 // Loads a device module. Throws a std::runtime_error, whose text is one line that names the file, when
-// it cannot be loaded (platform/module.h says why), when a kind of its was refused and when it registers
+// it cannot be loaded (platform/module.h says why), when one of its kinds was refused and when it registers
 // none. A file that was loaded before does nothing. One thread at a time.
 void loadDeviceModule(const std::string& path);
 

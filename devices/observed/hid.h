@@ -17,7 +17,7 @@ namespace observed {
 //                a scheduled device used on another thread than its run loop's; dropping it is free
 //   The device   the report callback called on another thread than the run loop's (once per device)
 //
-// A device is not taken for open or closed once a close() has failed. A run loop that is gone binds a
+// After a failed close() its state counts as unknown, and the rules about being open are not checked. A run loop that is gone binds a
 // device to no thread. A matched device has one wrapper while that is held, and what is known
 // of it lasts as long as the device. No lock is held while the device, a callback or the observer is
 // called.

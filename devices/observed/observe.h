@@ -1,4 +1,4 @@
-// The decorator around a device: everything passes through it unchanged, and an observer learns what the
+// The decorator around a device: every call and delivery passes through it, and an observer learns what the
 // device delivers and which rules of its interfaces the device or its client breaks.
 #ifndef ZR_DEVICES_OBSERVED_OBSERVE_H
 #define ZR_DEVICES_OBSERVED_OBSERVE_H

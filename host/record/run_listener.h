@@ -6,8 +6,8 @@
 
 namespace host {
 
-// Called on the session's thread, except logged(), which any thread may call, several at once.
-// A record is complete up to the moment of the call.
+// Called on the session's thread, except logged(), which any thread may call, several at once, also after
+// sessionEnded(): a time-out may outlive its run. A record holds everything known so far.
 class RunListener {
   public:
     virtual ~RunListener() = default;

@@ -67,7 +67,7 @@ struct MeasurementRecord {
 
 // A failure of one step of a part.
 struct FailureRecord {
-    Part part;
+    Part part;  // of a misused device the experiment
     std::string_view
         step;  // "create", "setup", "run", "teardown", "analyze" or "device": see kStep…
     // What the part reported; null when it failed without an error object.
@@ -125,7 +125,7 @@ struct ResultStatistics {
     std::optional<LimitRecord> limit;
     std::uint64_t runs = 0;
     std::uint64_t outside = 0;  // how often it was outside its limit
-    double minimum = 0;
+    double minimum = 0;         // these three: NaN when no value was a number
     double median = 0;
     double maximum = 0;
 };

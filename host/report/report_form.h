@@ -12,7 +12,8 @@
 namespace host {
 
 // Takes the report's text, piece by piece. It is called on the thread that makes the piece, one call at a
-// time, possibly with the report's lock held: it must not log.
+// time, possibly with the report's lock held: it must neither log nor throw. What it cannot write it
+// remembers itself.
 using ReportSink = std::function<void(std::string_view text)>;
 
 // How the text form looks.

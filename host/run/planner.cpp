@@ -103,7 +103,11 @@ ParameterSetting readSetting(std::string_view text) {
         if (name.starts_with(prefix)) {
             setting.part = part;
             name.remove_prefix(prefix.size());
+            break;
         }
+    }
+    if (name.empty()) {
+        fail("not of the form PARAM=VALUE");
     }
     setting.name = name;
     const std::string_view value = text.substr(equals + 1);

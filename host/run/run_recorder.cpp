@@ -14,6 +14,9 @@ namespace {
 // The log of a run with a line per frame must not grow without bound; further lines are counted.
 constexpr std::size_t kMostLines = 5000;
 
+// A rule that is broken at every frame is known well enough after these.
+constexpr std::size_t kMostMisuses = 50;
+
 std::optional<double> numberOf(const platform::Dictionary& metadata, std::string_view key) {
     const platform::Number* number = metadata[key].number();
     return number != nullptr ? std::optional(number->asDouble()) : std::nullopt;
@@ -29,6 +32,7 @@ void RunRecorder::begin() {
     _imageCount = 0;
     const platform::MutexLock lock(_mutex);
     _began = std::chrono::steady_clock::now();
+    _frames.clear();
 }
 
 void RunRecorder::end(RunRecord& run) {
@@ -86,7 +90,9 @@ void RunRecorder::imageDelivered(std::uint64_t /*number*/) {
 
 void RunRecorder::misused(std::string_view what) {
     const platform::MutexLock lock(_mutex);
-    _misuses.emplace_back(what);
+    if (_misuses.size() < kMostMisuses) {
+        _misuses.emplace_back(what);
+    }
 }
 
 }  // namespace host

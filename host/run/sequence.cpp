@@ -86,12 +86,25 @@ class Sequence {
         return {};
     }
 
+    // Records a failure that the part did not report itself.
+    void _fail(Part part, std::string_view step, std::string message) {
+        _run.failures.push_back({part, step, nullptr, std::move(message)});
+    }
+
     template <class Instance>
     bool _setUp(Part part, const std::shared_ptr<Instance>& instance, const PartPlan& plan) {
         auto* setup = dynamic_cast<ZRSetup*>(instance.get());
         return setup == nullptr || _step(part, kStepSetup, [&](platform::ErrorSlot error) {
                    return setup->setupWithParameters(plan.asDictionary(), &_host, error);
                });
+    }
+
+    template <class Instance>
+    void _tearDown(Part part, Instance& instance) {
+        if (auto* teardown = dynamic_cast<ZRTeardown*>(&instance)) {
+            _step(part, kStepTeardown,
+                  [&](platform::ErrorSlot error) { return teardown->teardown(error); });
+        }
     }
 
     ZRExperimentResultRef _experiment() {
@@ -104,12 +117,13 @@ class Sequence {
         }
         auto result = _step(kPart, kStepRun,
                             [&](platform::ErrorSlot error) { return experiment->run(error); });
-        if (auto* teardown = dynamic_cast<ZRTeardown*>(experiment.get())) {
-            _step(kPart, kStepTeardown,
-                  [&](platform::ErrorSlot error) { return teardown->teardown(error); });
-        }
+        _tearDown(kPart, *experiment);
         if (result != nullptr) {
             for (const auto& [name, measurement] : result->measurements()) {
+                if (measurement == nullptr) {
+                    _fail(kPart, kStepRun, "the measurement \"" + name + "\" is null");
+                    return nullptr;
+                }
                 _run.measurements.push_back(
                     {name, measurement->doubleValue(), measurement->unit().symbol()});
             }
@@ -129,10 +143,19 @@ class Sequence {
         const auto analysed = _step(kPart, kStepAnalyze, [&](platform::ErrorSlot error) {
             return analysis->analyzeExperimentResult(result, error);
         });
-        if (analysed != nullptr) {
-            std::transform(analysed->measuredResults().begin(), analysed->measuredResults().end(),
-                           std::back_inserter(_run.results),
-                           [](const ZRMeasuredResultRef& one) { return judge(*one); });
+        _tearDown(kPart, *analysis);
+        if (analysed == nullptr) {
+            return;
+        }
+        for (const ZRMeasuredResultRef& one : analysed->measuredResults()) {
+            if (one == nullptr || one->measurement() == nullptr) {
+                _fail(kPart, kStepAnalyze,
+                      one == nullptr
+                          ? "a measured result is null"
+                          : "the measured result \"" + one->name() + "\" has no measurement");
+                return;
+            }
+            _run.results.push_back(judge(*one));
         }
     }
 

@@ -63,13 +63,16 @@ devices::Kind kindOf(const DeviceChoice& choice) {
 
 }  // namespace
 
-void registerDeviceKinds(const std::vector<std::string>& modules) {
+void registerBuiltInKinds() {
     for (const auto& kind : kBuiltIn) {
         devices::registerKind(kind());
     }
-    for (const std::string& module : modules) {
+}
+
+void loadDeviceModules(const std::vector<std::string>& files) {
+    for (const std::string& file : files) {
         try {
-            devices::loadDeviceModule(module);
+            devices::loadDeviceModule(file);
         } catch (const std::exception& problem) {
             throw Problem(kExitUsage, problem.what());
         }

@@ -19,9 +19,12 @@ struct DeviceChoice {
     std::vector<std::string> modules;  // files of device modules, loaded in this order
 };
 
-// Registers the kinds that are built in, then those of the modules. Throws a Problem (kExitUsage) about a
-// module that cannot be used. Call it once.
-void registerDeviceKinds(const std::vector<std::string>& modules);
+// Registers the kinds that are built in. Call it once, before any module is loaded: the first kind is the
+// one that needs no name.
+void registerBuiltInKinds();
+
+// Loads device modules, in this order. Throws a Problem (kExitUsage) about one that cannot be used.
+void loadDeviceModules(const std::vector<std::string>& files);
 
 // What the device is opened with: the part of `device` behind its kind. It may be the name of a file.
 std::string deviceArgument(const DeviceChoice& choice);

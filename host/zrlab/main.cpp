@@ -150,7 +150,7 @@ int withPlugin(const CommandLine& commandLine) {
     if (command == "describe") {
         return describe(commandLine.subjects);
     }
-    registerDeviceKinds(commandLine.session.device.modules);
+    loadDeviceModules(commandLine.session.device.modules);
     return runSession(commandLine.session);
 }
 
@@ -160,9 +160,10 @@ int run(int count, const char* const* arguments) {
     if (const auto answer = commandLine.read(count, arguments)) {
         return print(*answer);
     }
+    registerBuiltInKinds();
     const std::string command = commandLine.command();
     if (command == "devices") {
-        registerDeviceKinds(commandLine.session.device.modules);
+        loadDeviceModules(commandLine.session.device.modules);
         return commandLine.kindsOnly ? deviceKinds() : listedDevices(commandLine.namesOnly);
     }
     if (command == "help") {

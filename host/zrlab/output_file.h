@@ -12,8 +12,8 @@ namespace host {
 // a long run, so that its report is not lost at the end.
 void requireWritable(const std::string& path);
 
-// Replaces the file at `path` by one with this content: a temporary file beside it, then a rename, so
-// that the file keeps its mode. A link is followed; what is not a file (a device, a pipe) is written to.
+// Replaces the file at `path` by one with this content: a temporary file beside it, then a rename. The
+// new file gets the old one's mode; its owner and hard links are not kept. A link is followed; what is not a file (a device, a pipe) is written to.
 // An interrupt waits until it is done. Throws a Problem (kExitError) when it fails; the file is then as
 // it was before.
 void writeFile(const std::string& path, std::string_view content);

@@ -66,12 +66,15 @@ void SessionReports::_refuseClashes(const std::string& device) const {
     std::set<std::filesystem::path> seen;
     const auto add = [&seen](const std::string& file) {
         std::error_code none;
-        const auto path = std::filesystem::weakly_canonical(file, none);
+        const auto path = std::filesystem::weakly_canonical(std::filesystem::absolute(file), none);
         const bool special =
             std::filesystem::exists(path, none) && !std::filesystem::is_regular_file(path, none);
         return special || seen.insert(path).second;
     };
-    add(device);
+    std::error_code none;
+    if (std::filesystem::exists(device, none)) {
+        add(device);
+    }
     for (const File& file : _files) {
         if (!add(file.path)) {
             throw Problem(kExitUsage,

@@ -64,10 +64,10 @@ TEST(DeviceModule, ABadOneIsNamedWithTheReason) {
 
 TEST(DeviceKind, IsRefusedUnlessWellFormed) {
     const std::pair<devices::Kind, const char*> rows[] = {
-        {kindNamed(""), "the kind name \"\" is not made of a-z, 0-9 and -"},
-        {kindNamed("Board"), "the kind name \"Board\" is not made of a-z, 0-9 and -"},
-        {kindNamed("2nd"), "the kind name \"2nd\" is not made of a-z, 0-9 and -"},
-        {kindNamed("a:b"), "the kind name \"a:b\" is not made of a-z, 0-9 and -"},
+        {kindNamed(""), "the kind name \"\" is not a letter followed by a-z, 0-9 and -"},
+        {kindNamed("Board"), "the kind name \"Board\" is not a letter followed by a-z, 0-9 and -"},
+        {kindNamed("2nd"), "the kind name \"2nd\" is not a letter followed by a-z, 0-9 and -"},
+        {kindNamed("a:b"), "the kind name \"a:b\" is not a letter followed by a-z, 0-9 and -"},
         {{.name = "idle", .summary = "Opens nothing"}, "the kind \"idle\" cannot open a device"},
     };
     for (const auto& [kind, reason] : rows) {

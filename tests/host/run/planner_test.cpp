@@ -89,6 +89,7 @@ TEST(Setting, NamesWhatIsWrong) {
     const std::pair<const char*, const char*> rows[] = {
         {"a", "--set a: not of the form PARAM=VALUE"},
         {"=1", "--set =1: not of the form PARAM=VALUE"},
+        {"experiment:=1", "--set experiment:=1: not of the form PARAM=VALUE"},
         {"a=", "--set a=: \"\" is not a valid number"},
         {"a=9x", "--set a=9x: \"9x\" is not a valid number"},
         {"a=18446744073709551616",

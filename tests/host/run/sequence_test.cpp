@@ -23,6 +23,7 @@ struct Script {
     std::string failing;    // the step that fails
     bool silently = false;  // without an error object
     bool throwing = false;
+    std::string null;  // the step whose result lacks a measurement
     std::vector<std::string> calls;
 
     bool step(const std::string& name, platform::ErrorSlot error) {
@@ -54,15 +55,19 @@ class Scripted final : public ZRExperiment, public ZRAnalysis, public ZRSetup, p
     ZRExperimentResultRef run(platform::ErrorSlot error) override {
         auto result = std::make_shared<ZRExperimentResult>();
         result->measurements().set(
-            "n", std::make_shared<const Measurement>(1.0, ZRDimensionlessUnit::frames()));
+            "n", script.null == "run"
+                     ? nullptr
+                     : std::make_shared<const Measurement>(1.0, ZRDimensionlessUnit::frames()));
         return script.step("run", error) ? result : nullptr;
     }
-    bool teardown(platform::ErrorSlot error) override { return script.step("teardown", error); }
+    bool teardown(platform::ErrorSlot error) override {
+        return script.step(_part + " teardown", error);
+    }
     ZRAnalysisResultRef analyzeExperimentResult(const ZRExperimentResult& result,
                                                 platform::ErrorSlot error) override {
         auto analysed = std::make_shared<ZRAnalysisResult>();
-        analysed->measuredResults().push_back(
-            std::make_shared<ZRMeasuredResult>("n", *result.measurements().find("n")));
+        analysed->measuredResults().push_back(std::make_shared<ZRMeasuredResult>(
+            "n", script.null == "analyze" ? nullptr : *result.measurements().find("n")));
         return script.step("analyze", error) ? analysed : nullptr;
     }
 
@@ -83,8 +88,8 @@ RunRecord runScript(Script given) {
 
 TEST(Sequence, CallsEveryStepInOrder) {
     const RunRecord run = runScript({});
-    EXPECT_THAT(script.calls,
-                ElementsAre("experiment setup", "run", "teardown", "analysis setup", "analyze"));
+    EXPECT_THAT(script.calls, ElementsAre("experiment setup", "run", "experiment teardown",
+                                          "analysis setup", "analyze", "analysis teardown"));
     EXPECT_EQ(run.verdict, Verdict::Passed);
     EXPECT_EQ(run.measurements.size(), 1U);
     EXPECT_EQ(run.results.size(), 1U);
@@ -98,19 +103,30 @@ TEST(Sequence, AFailedStepEndsWhatDependsOnIt) {
     };
     const Row rows[] = {
         {"experiment setup", "setup", {"experiment setup"}},
-        {"run", "run", {"experiment setup", "run", "teardown"}},
-        {"teardown",
+        {"run", "run", {"experiment setup", "run", "experiment teardown"}},
+        {"experiment teardown",
          "teardown",
-         {"experiment setup", "run", "teardown", "analysis setup", "analyze"}},
-        {"analysis setup", "setup", {"experiment setup", "run", "teardown", "analysis setup"}},
+         {"experiment setup", "run", "experiment teardown", "analysis setup", "analyze",
+          "analysis teardown"}},
+        {"analysis setup",
+         "setup",
+         {"experiment setup", "run", "experiment teardown", "analysis setup"}},
+        {"analysis teardown",
+         "teardown",
+         {"experiment setup", "run", "experiment teardown", "analysis setup", "analyze",
+          "analysis teardown"}},
         {"analyze",
          "analyze",
-         {"experiment setup", "run", "teardown", "analysis setup", "analyze"}},
+         {"experiment setup", "run", "experiment teardown", "analysis setup", "analyze",
+          "analysis teardown"}},
     };
     for (const Row& row : rows) {
         for (const int way : {0, 1, 2}) {
-            const RunRecord run = runScript(
-                {.failing = row.failing, .silently = way == 1, .throwing = way == 2, .calls = {}});
+            const RunRecord run = runScript({.failing = row.failing,
+                                             .silently = way == 1,
+                                             .throwing = way == 2,
+                                             .null = {},
+                                             .calls = {}});
             EXPECT_EQ(script.calls, row.calls) << row.failing;
             EXPECT_EQ(run.verdict, Verdict::Error);
             ASSERT_EQ(run.failures.size(), 1U) << row.failing;
@@ -120,6 +136,19 @@ TEST(Sequence, AFailedStepEndsWhatDependsOnIt) {
                                             "No HID Manager available?!"};
             EXPECT_EQ(host::failureText(run.failures[0]), expected[way]);
         }
+    }
+}
+
+TEST(Sequence, AResultWithoutAMeasurementIsAnError) {
+    const std::pair<const char*, const char*> rows[] = {
+        {"run", "the measurement \"n\" is null"},
+        {"analyze", "the measured result \"n\" has no measurement"}};
+    for (const auto& [step, message] : rows) {
+        const RunRecord run = runScript({.failing = {}, .null = step, .calls = {}});
+        EXPECT_EQ(run.verdict, Verdict::Error);
+        ASSERT_EQ(run.failures.size(), 1U);
+        EXPECT_EQ(run.failures[0].step, step);
+        EXPECT_EQ(host::failureText(run.failures[0]), message);
     }
 }
 

@@ -37,27 +37,44 @@ function(zr_hide_symbols name)
     VISIBILITY_INLINES_HIDDEN ON)
 endfunction()
 
-# zr_component(NAME SHARED|STATIC [SOURCES file...] [USES target...] [PRIVATE_USES target...])
-# A library of this folder, made of SOURCES or else of every source file in it but main.cpp. USES are the
-# folders that its headers show; PRIVATE_USES stay inside.
-# A shared one is what plug-ins and device modules link: zrlab::NAME, here and in the package.
+# zr_targets(OUT name...)
+# The names with those of our folders as their targets: zr_NAME, so that a project which this one is a part
+# of keeps its own short names.
+function(zr_targets out)
+  set(targets "")
+  foreach(name IN LISTS ARGN)
+    if(TARGET zr_${name})
+      set(name zr_${name})
+    endif()
+    list(APPEND targets ${name})
+  endforeach()
+  set(${out} ${targets} PARENT_SCOPE)
+endfunction()
+
+# zr_component(NAME SHARED|STATIC [SOURCES file...] [USES name...] [PRIVATE_USES name...])
+# The library zr_NAME of this folder, made of SOURCES or else of every source file in it but main.cpp. USES
+# are the folders and libraries that its headers show; PRIVATE_USES stay inside. A shared one is what
+# plug-ins and device modules link: zrlab::NAME, here and in the package.
 function(zr_component name type)
   cmake_parse_arguments(PARSE_ARGV 2 arg "" "" "SOURCES;USES;PRIVATE_USES")
   if(NOT arg_SOURCES)
     file(GLOB arg_SOURCES CONFIGURE_DEPENDS "${CMAKE_CURRENT_SOURCE_DIR}/*.cpp")
     list(FILTER arg_SOURCES EXCLUDE REGEX "/main\\.cpp$")
   endif()
-  add_library(${name} ${type} ${arg_SOURCES})
-  target_link_libraries(${name} PUBLIC ${arg_USES} PRIVATE zr_build_flags ${arg_PRIVATE_USES})
-  target_include_directories(${name} PUBLIC "$<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}>")
-  target_compile_features(${name} PUBLIC cxx_std_20)
+  set(target zr_${name})
+  zr_targets(uses ${arg_USES})
+  zr_targets(private_uses ${arg_PRIVATE_USES})
+  add_library(${target} ${type} ${arg_SOURCES})
+  target_link_libraries(${target} PUBLIC ${uses} PRIVATE zr_build_flags ${private_uses})
+  target_include_directories(${target} PUBLIC "$<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}>")
+  target_compile_features(${target} PUBLIC cxx_std_20)
   if(type STREQUAL "SHARED")
-    set_target_properties(${name} PROPERTIES
-      OUTPUT_NAME "zr_${name}"
+    set_target_properties(${target} PROPERTIES
+      EXPORT_NAME ${name}
       VERSION "${PROJECT_VERSION}"
       SOVERSION "${PROJECT_VERSION_MAJOR}")
-    add_library(zrlab::${name} ALIAS ${name})
+    add_library(zrlab::${name} ALIAS ${target})
   else()
-    zr_hide_symbols(${name})
+    zr_hide_symbols(${target})
   endif()
 endfunction()

@@ -11,11 +11,11 @@ set(package "${CMAKE_INSTALL_LIBDIR}/cmake/zrlab")
 file(RELATIVE_PATH libraries_from_program
   "${CMAKE_INSTALL_FULL_BINDIR}" "${CMAKE_INSTALL_FULL_LIBDIR}")
 set_target_properties(zrlab PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_program}")
-set_target_properties(platform host_interface devices PROPERTIES INSTALL_RPATH "$ORIGIN")
-set_target_properties(plugin PROPERTIES INSTALL_RPATH "$ORIGIN/..")
+set_target_properties(zr_platform zr_host_interface zr_devices PROPERTIES INSTALL_RPATH "$ORIGIN")
+set_target_properties(zr_plugin PROPERTIES INSTALL_RPATH "$ORIGIN/..")
 install(TARGETS zrlab)
-install(TARGETS platform host_interface devices EXPORT zrlab-targets INCLUDES DESTINATION "${headers}")
-install(TARGETS plugin LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
+install(TARGETS zr_platform zr_host_interface zr_devices EXPORT zrlab-targets INCLUDES DESTINATION "${headers}")
+install(TARGETS zr_plugin LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
 
 # What plug-ins and device modules are built against.
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/platform" DESTINATION "${headers}"
@@ -51,7 +51,7 @@ add_custom_command(
   COMMAND zrlab completion zsh > "${zsh_completion}"
   DEPENDS zrlab
   VERBATIM)
-add_custom_target(printed_documents ALL
+add_custom_target(zr_printed_documents ALL
   DEPENDS "${manual}.gz" "${bash_completion}" "${zsh_completion}")
 install(FILES "${manual}.gz" DESTINATION "${CMAKE_INSTALL_MANDIR}/man1")
 install(FILES "${bash_completion}" DESTINATION "${data}/bash-completion/completions")

@@ -62,8 +62,10 @@ struct Kind {
     // open(), on the program's main thread.
     std::function<std::vector<Entry>()> list = {};
 
-    // The device that is asked for. Throws an exception derived from std::exception, whose text is one
-    // line that names the culprit, when there is no such device or it cannot be opened.
+    // The device that is asked for. When it cannot be opened, throws an exception derived from
+    // std::exception, whose text is one line that names the culprit: std::invalid_argument when it was
+    // asked for wrongly (no such device, a description that cannot be read), another one when the device
+    // itself fails.
     std::function<Device(const Request&)> open = {};
 };
 

@@ -25,7 +25,7 @@ devices::Device openProfile(const devices::Request& request) {
     const std::optional<DeviceProfile> profile =
         loadProfile(request.what.empty() ? "healthy" : request.what, problem);
     if (!profile.has_value()) {
-        throw std::runtime_error(problem);
+        throw std::invalid_argument(problem);
     }
     return {.name = profile->name,
             .summary = profile->summary,

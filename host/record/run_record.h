@@ -130,6 +130,13 @@ struct ResultStatistics {
     double maximum = 0;
 };
 
+// A repetition that did not pass, and why in one line.
+struct Repetition {
+    std::uint64_t number;
+    Verdict verdict;
+    std::string why;
+};
+
 // The repetitions of one diagnostic or experiment.
 struct RepeatRecord {
     std::string name;
@@ -139,7 +146,9 @@ struct RepeatRecord {
     std::uint64_t errors = 0;
     double seconds = 0;  // of all runs
     std::vector<ResultStatistics> results;
+    std::vector<Repetition> notPassed;  // the first kMostRepetitions of them
 };
+inline constexpr std::size_t kMostRepetitions = 100;
 
 // Everything that one call of the program did.
 struct SessionRecord {

@@ -5,6 +5,7 @@
 
 #include <fmt/format.h>
 
+#include "host/record/clean_text.h"
 #include "platform/number.h"
 
 namespace host {
@@ -64,6 +65,10 @@ std::string plural(std::uint64_t count, std::string_view one, std::string_view m
 }
 
 std::string valueText(double value, std::string_view unit) {
+    // The host's units are plural nouns: events, frames, errors.
+    if (value == 1 && unit.size() > 2 && unit.ends_with('s')) {
+        unit.remove_suffix(1);
+    }
     return unit.empty() ? numberText(value) : fmt::format("{} {}", numberText(value), unit);
 }
 
@@ -77,7 +82,7 @@ std::string headline(const RunRecord& run) {
         return "did not complete";
     }
     if (!run.plan.isDiagnostic()) {
-        return "completed";
+        return "completed, not judged";
     }
     const auto countOf = [&run](Judgement judgement) {
         return std::count_if(run.results.begin(), run.results.end(),
@@ -90,6 +95,20 @@ std::string headline(const RunRecord& run) {
     }
     return outside > 0 ? fmt::format("{} of {} limits not met", outside, limited)
                        : fmt::format("all {} limits met", limited);
+}
+
+std::string whyText(const RunRecord& run) {
+    if (!run.failures.empty()) {
+        return plainLine(failureText(run.failures.front()));
+    }
+    for (const ResultRecord& result : run.results) {
+        if (result.judgement == Judgement::Outside) {
+            return plainLine(fmt::format("{} is {}, {}", result.name,
+                                         valueText(result.value, result.unit),
+                                         limitLine(result.limit, result.unit)));
+        }
+    }
+    return "";
 }
 
 const PartPlan& partOf(const RunRecord& run, Part part) {

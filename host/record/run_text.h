@@ -31,7 +31,7 @@ std::string limitText(const LimitRecord& limit, std::string_view unit);
 // "1 frame", "2 frames".
 std::string plural(std::uint64_t count, std::string_view one, std::string_view many);
 
-// "3 events"; the number alone when there is no unit.
+// "3 events", "1 event"; the number alone when there is no unit.
 std::string valueText(double value, std::string_view unit);
 
 // "Max Reports: 0 … 0 events", "no limit".
@@ -39,6 +39,10 @@ std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view 
 
 // The outcome of the run in a few words: "2 of 64 limits not met".
 std::string headline(const RunRecord& run);
+
+// Why the run did not pass, in one line that cannot control a terminal: its first failure, or its first
+// result outside its limit. Empty when it passed.
+std::string whyText(const RunRecord& run);
 
 // The part of the run's plan; an experiment on its own has no analysis.
 const PartPlan& partOf(const RunRecord& run, Part part);

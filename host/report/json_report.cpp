@@ -128,6 +128,20 @@ Json jsonOf(const RunRecord& run) {
     const platform::Value auxiliary(run.auxiliaryData);
     object["auxiliaryData"] = jsonOf(auxiliary);
     object["auxiliaryDataKinds"] = kindsOf(auxiliary);
+    object["frames"] = arrayOf(run.frames, [](const FrameRecord& frame) {
+        Json temperatures = Json::object();
+        for (std::size_t at = 0; at < kTemperatureCount; ++at) {
+            if (frame.temperatures[at].has_value()) {
+                temperatures[std::string(kTemperatures[at].key)] = jsonOf(*frame.temperatures[at]);
+            }
+        }
+        return Json{
+            {"number", frame.number},
+            {"presentation", jsonOf(frame.presentation)},
+            {"delivered", jsonOf(frame.delivered)},
+            {"lightSource", frame.lightSource.has_value() ? jsonOf(*frame.lightSource) : Json()},
+            {"temperatures", std::move(temperatures)}};
+    });
     object["log"] = arrayOf(run.log, [](const LogRecord& line) {
         return Json{{"time", line.time.timestamp()},
                     {"level", levelText(line.level)},
@@ -151,6 +165,9 @@ Json jsonOf(const RepeatRecord& repeat) {
                     {"median", jsonOf(result.median)},
                     {"maximum", jsonOf(result.maximum)},
                     {"limit", jsonOf(result.limit)}};
+    });
+    object["notPassed"] = arrayOf(repeat.notPassed, [](const Repetition& one) {
+        return Json{{"run", one.number}, {"verdict", verdictText(one.verdict)}, {"why", one.why}};
     });
     return object;
 }

@@ -30,22 +30,19 @@ struct ReportForm {
     // Without defaults: a form is not complete, and does not compile, without all of them.
     constexpr ReportForm(std::string_view formName,
                          std::string_view fileEnding,
-                         bool isForOutput,
                          bool writesAsItGoes,
                          bool needsFrames,
                          OpenReport opens)
         : name(formName)
         , ending(fileEnding)
-        , forOutput(isForOutput)
         , streams(writesAsItGoes)
-        , drawsFrames(needsFrames)
+        , showsFrames(needsFrames)
         , open(opens) {}
 
     std::string_view name;
     std::string_view ending;  // of a file in this form, with its dot
-    bool forOutput;           // makes sense on standard output
     bool streams;             // writes as the session goes on, else once at its end
-    bool drawsFrames;         // needs RunRecord::frames
+    bool showsFrames;         // needs RunRecord::frames
     OpenReport open;
 };
 

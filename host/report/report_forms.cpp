@@ -24,13 +24,13 @@ const ReportForm* findForm(Matches matches) {
 }  // namespace
 
 std::span<const ReportForm> reportForms() {
-    // name, file ending, on standard output, streams, draws frames
+    // name, file ending, streams, shows frames
     static constexpr ReportForm kForms[] = {
-        {"text", ".txt", true, true, false, openTextReport},
-        {"json", ".json", true, false, false, openJsonReport},
-        {"jsonl", ".jsonl", true, true, false, openJsonlReport},
-        {"junit", ".xml", true, false, false, openJunitReport},
-        {"html", ".html", false, false, true, openHtmlReport},
+        {"text", ".txt", true, false, openTextReport},
+        {"json", ".json", false, true, openJsonReport},
+        {"jsonl", ".jsonl", true, false, openJsonlReport},
+        {"junit", ".xml", false, false, openJunitReport},
+        {"html", ".html", false, true, openHtmlReport},
     };
     return kForms;
 }
@@ -46,12 +46,10 @@ const ReportForm* reportFormOf(const std::string& file) {
     return findForm([&ending](const ReportForm& form) { return form.ending == ending; });
 }
 
-std::vector<std::string> outputFormNames() {
+std::vector<std::string> reportFormNames() {
     std::vector<std::string> names;
     for (const ReportForm& form : reportForms()) {
-        if (form.forOutput) {
-            names.emplace_back(form.name);
-        }
+        names.emplace_back(form.name);
     }
     return names;
 }

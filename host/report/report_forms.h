@@ -20,8 +20,8 @@ const ReportForm* reportFormNamed(std::string_view name);
 // The form that a file's ending asks for, upper case or lower; null when no form has it.
 const ReportForm* reportFormOf(const std::string& file);
 
-// The names of the forms for standard output, and the endings of all forms.
-std::vector<std::string> outputFormNames();
+// The names and the endings of all forms.
+std::vector<std::string> reportFormNames();
 std::vector<std::string> reportEndings();
 
 }  // namespace host

@@ -20,6 +20,9 @@ namespace {
 // Rows shown of a long table unless the report is verbose: as many from its start and its end.
 constexpr std::size_t kRowsAtEachEnd = 15;
 
+// Repetitions that did not pass and are listed unless the report is verbose.
+constexpr std::size_t kRunsListed = 10;
+
 class Writer {
   public:
     explicit Writer(const TextStyle& style) : _style(style) {}
@@ -97,12 +100,12 @@ std::string errorText(const FailureRecord& failure, const RunRecord& run, const 
     if (failure.error == nullptr) {
         return out;
     }
-    out += fmt::format("    {} {}\n", failure.error->domain(), failure.error->code());
+    out += fmt::format("    {} {}\n", plainLine(failure.error->domain()), failure.error->code());
     for (platform::ErrorRef under = failure.error->underlyingError(); under != nullptr;
          under = under->underlyingError()) {
-        out +=
-            fmt::format("    caused by: {}\n      {} {}\n",
-                        plainLine(under->localizedDescription()), under->domain(), under->code());
+        out += fmt::format("    caused by: {}\n      {} {}\n",
+                           plainLine(under->localizedDescription()), plainLine(under->domain()),
+                           under->code());
     }
     return out;
 }
@@ -201,6 +204,20 @@ class TextReport final : public RunListener {
         _sink(text + textReport(run, _style));
     }
 
+    // What came of all names, when there are several.
+    void sessionEnded(const SessionRecord& session) override {
+        if (session.runs.size() > 1) {
+            std::size_t counts[] = {0, 0, 0};
+            for (const RunRecord& run : session.runs) {
+                ++counts[static_cast<std::size_t>(run.verdict)];
+            }
+            const Writer writer(_style);
+            _sink(fmt::format(
+                "\n{}  {}: {} passed, {} failed, {} in error\n", writer.verdict(session.verdict),
+                plural(session.runs.size(), "run", "runs"), counts[0], counts[1], counts[2]));
+        }
+    }
+
   private:
     const ReportSink _sink;
     const TextStyle _style;
@@ -232,20 +249,8 @@ std::string textReport(const RunRecord& run, const TextStyle& style) {
 
 std::string textLine(const RunRecord& run, const TextStyle& style) {
     const Writer writer(style);
-    std::string why;
-    if (!run.failures.empty()) {
-        why = plainLine(failureText(run.failures.front()));
-    } else {
-        for (const ResultRecord& result : run.results) {
-            if (result.judgement == Judgement::Outside) {
-                why = fmt::format("{} is {}, {}", result.name, valueText(result.value, result.unit),
-                                  limitLine(result.limit, result.unit));
-                break;
-            }
-        }
-    }
     return fmt::format("{:>6}  {}  {}  {:.2f} s  {}", run.number, writer.verdict(run.verdict),
-                       run.plan.name, run.seconds, why);
+                       run.plan.name, run.seconds, whyText(run));
 }
 
 std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
@@ -253,6 +258,17 @@ std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
     std::string out = fmt::format("{}  {}: {} passed, {} failed, {} in error\n",
                                   writer.strong(repeat.name), plural(repeat.runs, "run", "runs"),
                                   repeat.passed, repeat.failed, repeat.errors);
+    const std::size_t listed =
+        style.verbose ? repeat.notPassed.size() : std::min(repeat.notPassed.size(), kRunsListed);
+    for (std::size_t at = 0; at < listed; ++at) {
+        const Repetition& one = repeat.notPassed[at];
+        out += fmt::format("  {:>6}  {}  {}\n", one.number, writer.verdict(one.verdict), one.why);
+    }
+    if (repeat.failed + repeat.errors > listed) {
+        out += writer.faintLine(
+            fmt::format("      …  {} did not pass",
+                        plural(repeat.failed + repeat.errors - listed, "more run", "more runs")));
+    }
     std::vector<ResultStatistics> shown;
     std::copy_if(repeat.results.begin(), repeat.results.end(), std::back_inserter(shown),
                  [&style](const ResultStatistics& result) {

@@ -40,6 +40,21 @@ std::optional<platform::Number> readNumber(std::string_view text) {
     return isInteger ? std::nullopt : readAs<double>(text);
 }
 
+// Why there is nothing to run under the name.
+std::string unknownText(const ZRLab& lab, const std::string& name) {
+    const auto analyses = lab.analysisNames();
+    if (std::find(analyses.begin(), analyses.end(), name) != analyses.end()) {
+        std::string text = name + " is an analysis: it is run as a part of a diagnostic";
+        for (const auto& diagnostic : lab.diagnostics()) {
+            text += diagnostic.analysisName == name ? ", " + diagnostic.name : "";
+        }
+        return text;
+    }
+    const std::string meant = input::didYouMean(name, runnableNames(lab));
+    return "unknown diagnostic or experiment \"" + name + "\"" +
+           (meant.empty() ? "; zrlab list shows them" : meant);
+}
+
 RunPlan planOf(const ZRLab& lab, const std::string& name) {
     RunPlan plan;
     plan.name = name;
@@ -51,8 +66,7 @@ RunPlan planOf(const ZRLab& lab, const std::string& name) {
     }
     const auto experiments = lab.experimentNames();
     if (std::find(experiments.begin(), experiments.end(), name) == experiments.end()) {
-        throw Problem(kExitUsage, "unknown diagnostic or experiment \"" + name + "\"" +
-                                      input::didYouMean(name, runnableNames(lab)));
+        throw Problem(kExitUsage, unknownText(lab, name));
     }
     plan.experiment.name = name;
     return plan;
@@ -125,7 +139,7 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
     std::vector<RunPlan> plans;
     std::vector<bool> used(settings.size(), false);
     std::vector<std::string> declared;
-    std::string missing;
+    std::vector<std::string> missing;  // "NAME of its experiment"
 
     for (const std::string& name : names) {
         RunPlan& plan = plans.emplace_back(planOf(lab, name));
@@ -141,11 +155,9 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
                 const auto value = valueFor(parameter, kind, settings, used);
                 if (value.has_value()) {
                     part.parameters.emplace_back(parameter, *value);
-                } else if (declaration.required() && missing.empty()) {
-                    missing = fmt::format(
-                        "{}: parameter \"{}\" of its {} has no value; give one with --set "
-                        "{}=NUMBER",
-                        name, parameter, partText(kind), parameter);
+                } else if (declaration.required()) {
+                    missing.push_back(
+                        fmt::format("\"{}\" of the {} {}", parameter, partText(kind), part.name));
                 }
             }
         };
@@ -169,7 +181,8 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
         }
     }
     if (!missing.empty()) {
-        throw Problem(kExitUsage, missing);
+        throw Problem(kExitUsage, fmt::format("no value for {}; give one with --set PARAM=NUMBER",
+                                              fmt::join(missing, ", ")));
     }
     return plans;
 }

@@ -4,6 +4,8 @@
 #include <limits>
 #include <utility>
 
+#include "host/record/run_text.h"
+
 namespace host {
 
 namespace {
@@ -45,6 +47,9 @@ void RepeatStatistics::add(const RunRecord& run) {
         case Verdict::Error:
             ++_record.errors;
             break;
+    }
+    if (run.verdict != Verdict::Passed && _record.notPassed.size() < kMostRepetitions) {
+        _record.notPassed.push_back({run.number, run.verdict, whyText(run)});
     }
     for (const ResultRecord& result : run.results) {
         ResultStatistics one;

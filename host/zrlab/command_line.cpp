@@ -60,9 +60,9 @@ std::string joined(const std::vector<std::string>& words, std::string_view betwe
 std::string formLines() {
     std::string lines = "Forms of a report:\n";
     for (const ReportForm& form : reportForms()) {
-        lines += fmt::format("  {:<6}  {:<6}  {}{}\n", form.name, form.ending,
-                             form.streams ? "written as the session goes on" : "written at its end",
-                             form.forOutput ? "" : "; to a file only");
+        lines +=
+            fmt::format("  {:<6}  {:<6}  {}\n", form.name, form.ending,
+                        form.streams ? "written as the session goes on" : "written at its end");
     }
     return lines;
 }
@@ -151,12 +151,13 @@ void CommandLine::_addRun() {
                    "of real time")
         ->type_name("FACTOR|max")
         ->default_str("1");
-    const std::vector<std::string> formats = outputFormNames();
+    const std::vector<std::string> formats = reportFormNames();
     run.add_option("--format", session.format, "Form of the report")
         ->check(oneOf(formats))
         ->type_name(joined(formats, "|"))
         ->capture_default_str();
-    run.add_option("--output", session.output, "Write the report to this file, whole or not at all")
+    run.add_option("--output", session.output,
+                   "Write the report to this file, whole or not at all;\n- is standard output")
         ->type_name("FILE")
         ->check(CLI::Validator(
             [](const std::string& file) {

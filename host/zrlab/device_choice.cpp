@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <charconv>
 #include <exception>
+#include <stdexcept>
 #include <string_view>
 
 #include "devices/simulator/kind.h"
@@ -61,6 +62,18 @@ devices::Kind kindOf(const DeviceChoice& choice) {
                                   "\"" + input::didYouMean(name, names));
 }
 
+// Where to look for a device's name, unless one is near enough to have been suggested or a file was meant.
+std::string whereListed(const devices::Kind& kind, const std::string& name) {
+    std::vector<std::string> names;
+    if (kind.list && name.find_first_of("/.") == std::string::npos) {
+        for (const devices::Entry& entry : kind.list()) {
+            names.push_back(entry.name);
+        }
+    }
+    return !names.empty() && input::nearest(name, names).empty() ? "; zrlab devices lists them"
+                                                                 : "";
+}
+
 }  // namespace
 
 void registerBuiltInKinds() {
@@ -93,6 +106,8 @@ devices::Device openDevice(const DeviceChoice& choice) {
     const double speed = choice.speed.has_value() ? readSpeed(*choice.speed) : 1;
     try {
         return kind.open({.what = deviceArgument(choice), .speed = speed});
+    } catch (const std::invalid_argument& problem) {
+        throw Problem(kExitUsage, problem.what() + whereListed(kind, deviceArgument(choice)));
     } catch (const std::exception& problem) {
         throw Problem(kExitError, problem.what());
     }

@@ -29,8 +29,8 @@ void loadDeviceModules(const std::vector<std::string>& files);
 // What the device is opened with: the part of `device` behind its kind. It may be the name of a file.
 std::string deviceArgument(const DeviceChoice& choice);
 
-// Opens the device. Throws a Problem: kExitUsage about an unknown kind, or a speed that is wrong or that
-// the kind does not take; kExitError about a device that the kind cannot open.
+// Opens the device. Throws a Problem: kExitUsage about an unknown kind or device, or a speed that is
+// wrong or that the kind does not take; kExitError about a device that fails.
 devices::Device openDevice(const DeviceChoice& choice);
 
 // A device that --device takes.

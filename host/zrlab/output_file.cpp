@@ -19,12 +19,12 @@ namespace host {
 
 namespace {
 
-[[noreturn]] void fail(const std::string& path, const std::string& reason) {
-    throw Problem(kExitError, "cannot write " + path + ": " + reason);
+std::string problemWith(const std::string& path, const std::string& reason) {
+    return "cannot write " + path + ": " + reason;
 }
 
-[[noreturn]] void fail(const std::string& path, int number) {
-    fail(path, std::generic_category().message(number));
+std::string problemWith(const std::string& path, int number) {
+    return problemWith(path, std::generic_category().message(number));
 }
 
 // Where a report goes: what stands there now, its links followed.
@@ -101,12 +101,12 @@ bool writeSpecial(const Target& target, std::string_view content) {
 void requireWritable(const std::string& path) {
     const Target target(path);
     if (target.isFolder()) {
-        fail(path, EISDIR);
+        throw Problem(kExitUsage, problemWith(path, EISDIR));
     }
     const bool isWritable =
         target.isSpecial() ? access(target.path.c_str(), W_OK) == 0 : Temporary(target).isOpen();
     if (!isWritable) {
-        fail(path, errno);
+        throw Problem(kExitUsage, problemWith(path, errno));
     }
 }
 
@@ -116,7 +116,7 @@ void writeFile(const std::string& path, std::string_view content) {
     const bool written = target.isSpecial() ? writeSpecial(target, content)
                                             : Temporary(target).replace(target, content);
     if (!written) {
-        fail(path, errno);
+        throw Problem(kExitError, problemWith(path, errno));
     }
 }
 
@@ -134,7 +134,8 @@ void Spool::append(std::string_view text) {
 
 void Spool::writeTo(const std::string& path) {
     if (_lost || std::fflush(_file) != 0) {
-        fail(path, "no room for it in the folder of temporary files");
+        throw Problem(kExitError,
+                      problemWith(path, "no room for it in the folder of temporary files"));
     }
     const long size = std::ftell(_file);
     if (size == 0) {
@@ -144,7 +145,7 @@ void Spool::writeTo(const std::string& path) {
     const auto length = static_cast<std::size_t>(size);
     void* pages = mmap(nullptr, length, PROT_READ, MAP_PRIVATE, fileno(_file), 0);
     if (pages == MAP_FAILED) {
-        fail(path, errno);
+        throw Problem(kExitError, problemWith(path, errno));
     }
     const std::unique_ptr<void, std::function<void(void*)>> unmapped(
         pages, [length](void* mapped) { munmap(mapped, length); });

@@ -8,7 +8,7 @@
 
 namespace host {
 
-// Throws a Problem (kExitError) when no file can be written at `path`. Leaves nothing behind: used before
+// Throws a Problem (kExitUsage) when no file can be written at `path`. Leaves nothing behind: used before
 // a long run, so that its report is not lost at the end.
 void requireWritable(const std::string& path);
 

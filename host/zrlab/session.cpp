@@ -79,7 +79,7 @@ class Session {
                 report->logged(line);
             }
         };
-        _recorder = std::make_shared<RunRecorder>(lineLogged, _reports->drawFrames());
+        _recorder = std::make_shared<RunRecorder>(lineLogged, _reports->showFrames());
         platform::setLogSink(_recorder, log.minimum);
         platform::installServices(observed::observe(std::move(device.services), _recorder));
         platform::RunLoop::forThisThread();  // some experiments need one

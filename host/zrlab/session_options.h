@@ -15,8 +15,8 @@ struct SessionOptions {
     std::vector<std::string> names;     // what to run, in this order
     std::vector<std::string> settings;  // PARAM=VALUE
     DeviceChoice device;
-    std::string format = "text";       // name of a report form for standard output
-    std::string output;                // the file that gets the format; empty for standard output
+    std::string format = "text";  // name of a report form for standard output
+    std::string output;           // the file that gets the format; empty or "-" for standard output
     std::vector<std::string> reports;  // further files, their form by their ending
     std::uint64_t repeat = 0;          // how often; 0 when not asked for
     bool untilFail = false;            // stop at the first run that does not pass

@@ -15,7 +15,7 @@ namespace host {
 
 SessionReports::SessionReports(const SessionOptions& options) {
     const ReportForm& format = *reportFormNamed(options.format);
-    if (options.output.empty()) {
+    if (options.output.empty() || options.output == "-") {
         const TextStyle style{.colour = Terminal::outputTakesColour(options.colour),
                               .verbose = options.verbose};
         _listeners.push_back(format.open(
@@ -25,7 +25,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
                 }
             },
             style));
-        _drawFrames = format.drawsFrames;
+        _showFrames = format.showsFrames;
     } else {
         const ReportForm* meant = reportFormOf(options.output);
         if (meant != nullptr && meant != &format) {
@@ -58,7 +58,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
 
 void SessionReports::_addFile(const std::string& path, const ReportForm& form) {
     _files.push_back({path, &form, nullptr});
-    _drawFrames = _drawFrames || form.drawsFrames;
+    _showFrames = _showFrames || form.showsFrames;
 }
 
 // Two reports in one file, or a report over the file that describes the device.

@@ -23,8 +23,8 @@ namespace host {
 // Threads  The session's, but for the listeners' logged().
 class SessionReports {
   public:
-    // Checks that every report can be written. Throws a Problem: kExitUsage about a file's ending, or a
-    // file that is used twice or for the device; kExitError about a file that cannot be written.
+    // Checks that every report can be written. Throws a Problem: kExitUsage about a file's ending, a file
+    // that is used twice or for the device, or one that cannot be written.
     explicit SessionReports(const SessionOptions& options);
 
     SessionReports(const SessionReports&) = delete;
@@ -33,8 +33,8 @@ class SessionReports {
     // The reports, in the order in which they were asked for.
     const std::vector<std::shared_ptr<RunListener>>& listeners() const { return _listeners; }
 
-    // Whether one of them draws frames.
-    bool drawFrames() const { return _drawFrames; }
+    // Whether one of them shows frames.
+    bool showFrames() const { return _showFrames; }
 
     // Whether standard output takes no more: its reader has gone.
     bool outputFailed() const { return _outputFailed; }
@@ -56,7 +56,7 @@ class SessionReports {
 
     std::vector<File> _files;
     std::vector<std::shared_ptr<RunListener>> _listeners;
-    bool _drawFrames = false;
+    bool _showFrames = false;
     // Set by the thread that makes a line, read by the session's.
     std::atomic<bool> _outputFailed{false};
 };

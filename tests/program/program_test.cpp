@@ -35,6 +35,12 @@ std::vector<std::string> with(std::vector<std::string> arguments,
     return arguments;
 }
 
+// An empty folder that no other test uses.
+fs::path newFolder() {
+    std::string name = (fs::path(testing::TempDir()) / "zrlab-XXXXXX").string();
+    return mkdtemp(name.data());
+}
+
 const std::string kBoardModule = std::string(ZR_TEST_MODULES) + "/board.so";
 
 // A run with the device module of the tests.
@@ -112,8 +118,9 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "VantorFaultDiagnostic?\n"},
         {{"run", "VantorFaultDiagnostic", "--set", "frameCount=3"},
          64,
-         "zrlab: VantorFaultDiagnostic: parameter \"timeout\" of its experiment has no value; give "
-         "one with --set timeout=NUMBER\n"},
+         "zrlab: no value for \"timeout\" of the experiment VantorFaultExperiment; give one with "
+         "--set "
+         "PARAM=NUMBER\n"},
         {{"run", "VantorMeterixDiagnostic", "--report", "a.pdf"},
          64,
          "zrlab: --report a.pdf: its ending is not one of .html, .json, .jsonl, .txt, .xml\n"},
@@ -124,7 +131,7 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          64,
          "zrlab: --speed -1: neither \"max\" nor a factor from 0.001 to 100\n"},
         {{"run", "VantorMeterixDiagnostic", "--output", "/no/such/folder/report"},
-         2,
+         64,
          "zrlab: cannot write /no/such/folder/report: No such file or directory\n"},
         {{"list", "--plugin", "/no/such.so"},
          2,
@@ -137,11 +144,14 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "zrlab: --device simulatr:healthy: unknown kind of device \"simulatr\"; did you mean "
          "simulator?\n"},
         {{"run", "VantorMeterixDiagnostic", "--device", "helthy"},
-         2,
+         64,
          "zrlab: unknown device \"helthy\"; did you mean healthy?\n"},
         {{"run", "VantorMeterixDiagnostic", "--device-module", "/no/such.so"},
          64,
          "zrlab: device module /no/such.so: no such file\n"},
+        {{"run", "VantorMeterixDiagnostic", "--device", "xyzzy"},
+         64,
+         "zrlab: unknown device \"xyzzy\"; zrlab devices lists them\n"},
         {board({"--device", "board:rev-b", "--speed", "2"}), 64,
          "zrlab: --speed 2: devices of the kind \"board\" do not take a speed\n"},
         {board({"--device", "board:rev-z"}), 2, "zrlab: board rev-z: not connected\n"},
@@ -195,9 +205,7 @@ TEST(Program, ColourOnlyWhenAsked) {
 }
 
 TEST(Program, WritesSeveralReportsOfOneRun) {
-    const fs::path folder = fs::path(testing::TempDir()) / "zrlab-reports";
-    fs::remove_all(folder);
-    fs::create_directory(folder);
+    const fs::path folder = newFolder();
     std::vector<std::string> arguments =
         with(kFaultRun, {"--output", (folder / "out.txt").string()});
     for (const char* ending : {"html", "json", "jsonl", "xml", "txt"}) {
@@ -214,6 +222,19 @@ TEST(Program, WritesSeveralReportsOfOneRun) {
     EXPECT_EQ(files, 6);
 }
 
+// Every form may go to standard output; "-" stands for it.
+TEST(Program, WritesAnyFormToStandardOutput) {
+    for (const auto& [form, start] :
+         {std::pair("html", "<!DOCTYPE html>"), std::pair("junit", "<?xml"),
+          std::pair("jsonl", "{\"sequenceNumber\":0")}) {
+        EXPECT_THAT(
+            zrlab({"run", "VantorMeterixDiagnostic", "--format", form, "--output", "-"}).output,
+            StartsWith(start));
+    }
+    EXPECT_THAT(zrlab({"run", "VantorMeterixDiagnostic", "VantorMeterixDiagnostic"}).output,
+                HasSubstr("\n\nPASS  2 runs: 2 passed, 0 failed, 0 in error\n"));
+}
+
 TEST(Program, RepeatsAndCountsOrStopsAtTheFirstFailure) {
     const test::Outcome repeated = zrlab(with(kFaultRun, {"--repeat", "20", "--format", "json"}));
     EXPECT_EQ(repeated.status, 0) << repeated.errors;
@@ -225,7 +246,13 @@ TEST(Program, RepeatsAndCountsOrStopsAtTheFirstFailure) {
     const test::Outcome stopped = zrlab({"run", "VantorMeterixDiagnostic", "--device",
                                          "counter-stuck", "--until-fail", "--format", "json"});
     EXPECT_EQ(stopped.status, 1);
-    EXPECT_EQ(Json::parse(stopped.output)["repeats"][0]["runs"], 1);
+    const Json stoppedRepeat = Json::parse(stopped.output)["repeats"][0];
+    EXPECT_EQ(stoppedRepeat["runs"], 1);
+    EXPECT_EQ(
+        stoppedRepeat["notPassed"],
+        Json::array({{{"run", 1},
+                      {"verdict", "FAIL"},
+                      {"why", "Number Xel INT_FAULT_CC is 3 events, Max Reports: 0 … 0 events"}}}));
 }
 
 // A time-out of an hour is pending when the run is over: the program must not wait for it.
@@ -238,9 +265,7 @@ TEST(Program, EndsAtOnceWithATimeOutPending) {
 }
 
 TEST(Program, AnInterruptEndsItAtOnceAndLeavesNoFile) {
-    const fs::path folder = fs::path(testing::TempDir()) / "zrlab-interrupt";
-    fs::remove_all(folder);
-    fs::create_directory(folder);
+    const fs::path folder = newFolder();
     for (const auto& [number, status] : {std::pair(SIGINT, 130), std::pair(SIGTERM, 143)}) {
         test::Program program({ZR_PROGRAM, "run", "VantorFaultDiagnostic", "--set",
                                "frameCount=1000000", "--set", "timeout=3600", "--log", "debug",

@@ -224,6 +224,17 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
     const std::string counts =
         fmt::format("{}: {} passed, {} failed, {} in error", plural(repeat->runs, "run", "runs"),
                     repeat->passed, repeat->failed, repeat->errors);
+    Table runs("Runs that did not pass", {{"Run", "number"}, {"Verdict"}, {"Why"}});
+    for (const Repetition& one : repeat->notPassed) {
+        runs.row({std::to_string(one.number),
+                  fmt::format("<span class=\"{}\">{}</span>", verdictClass(one.verdict),
+                              verdictText(one.verdict)),
+                  htmlText(one.why)});
+    }
+    const std::uint64_t notListed = repeat->failed + repeat->errors - repeat->notPassed.size();
+    const std::string more = notListed > 0 ? fmt::format("<p>{} did not pass.</p>\n",
+                                                         plural(notListed, "more run", "more runs"))
+                                           : "";
     const std::vector<Column> columns = {
         {"Result"}, {"Least", "number"}, {"Median", "number"}, {"Greatest", "number"}, {"Unit"},
         {"Limit"},  {"Range"},           {"Outside", "number"}};
@@ -250,7 +261,7 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
         "<div class=\"shares\" role=\"img\" aria-label=\"{0}\">{3}</div>\n{4}",
         counts, run.number,
         run.verdict == Verdict::Passed ? "the last" : "the first that did not pass", shares,
-        table.html() +
+        runs.html() + more + table.html() +
             folded(plural(alikeCount, "result alike in every run", "results alike in every run"),
                    alike.html()));
 }

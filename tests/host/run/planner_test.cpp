@@ -126,16 +126,21 @@ TEST(RunPlan, RefusesBeforeAnythingRuns) {
         {{"PlanDiagnostik"},
          {},
          "unknown diagnostic or experiment \"PlanDiagnostik\"; did you mean PlanDiagnostic?"},
-        {{"Zzz"}, {}, "unknown diagnostic or experiment \"Zzz\""},
-        {{"PlanAnalysis"}, {}, "unknown diagnostic or experiment \"PlanAnalysis\""},
+        {{"Zzz"}, {}, "unknown diagnostic or experiment \"Zzz\"; zrlab list shows them"},
+        {{"PlanAnalysis"},
+         {},
+         "PlanAnalysis is an analysis: it is run as a part of a diagnostic, PlanDiagnostic"},
         {{"PlanExperiment"},
          {},
-         "PlanExperiment: parameter \"count\" of its experiment has no value; give one with --set "
-         "count=NUMBER"},
+         "no value for \"count\" of the experiment PlanExperiment; give one with --set "
+         "PARAM=NUMBER"},
         {{"PlanDiagnostic"},
          {"experiment:count=1"},
-         "PlanDiagnostic: parameter \"count\" of its analysis has no value; give one with --set "
-         "count=NUMBER"},
+         "no value for \"count\" of the analysis PlanAnalysis; give one with --set PARAM=NUMBER"},
+        {{"PlanDiagnostic"},
+         {},
+         "no value for \"count\" of the experiment PlanExperiment, \"count\" of the analysis "
+         "PlanAnalysis; give one with --set PARAM=NUMBER"},
         {{"PlanExperiment"},
          {"coumt=1"},
          "none of the parts to be run declares a parameter \"coumt\"; did you mean count?"},

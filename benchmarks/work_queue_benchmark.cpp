@@ -74,6 +74,7 @@ void queueBursts(benchmark::State& state, Queue& queue) {
 
 void workQueue(benchmark::State& state) {
     platform::WorkQueue queue("benchmark", platform::WorkQueue::Priority::UserInteractive);
+    const platform::WorkQueue::Hold hold(queue);
     queueBursts(state, queue);
 }
 void plainQueueBaseline(benchmark::State& state) {

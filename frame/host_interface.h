@@ -106,7 +106,8 @@ class ZRDescription {
     std::vector<std::pair<std::string, ZRNumberParameter>> _parameters;
 };
 
-// What an experiment hands back. Both containers are live: the experiment inserts into them.
+// What an experiment hands back. Both containers are live: the experiment inserts into them. No
+// measurement may be null.
 class ZRExperimentResult {
   public:
     platform::StringMap<MeasurementRef>& measurements() { return _measurements; }
@@ -157,6 +158,7 @@ using ZRLimitRef = std::shared_ptr<ZRLimit>;
 // information only.
 class ZRMeasuredResult {
   public:
+    // `measurement` must not be null.
     ZRMeasuredResult(std::string name, MeasurementRef measurement)
         : _name(std::move(name)), _measurement(std::move(measurement)) {}
 

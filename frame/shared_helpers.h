@@ -23,8 +23,8 @@ platform::ErrorRef ZRMakeError(std::string_view domain,
 // the chain.
 platform::Dictionary dictionaryRepresentation(const platform::Error& error);
 
-// Whether every character of the UTF-8 `text` is a letter, a mark or a number (the Unicode general
-// categories L, M and N). True for the empty string; false for bytes that are not UTF-8.
+// Whether every character of the UTF-8 `text` is a letter, a mark or a number (the general categories
+// L, M and N of Unicode 14.0). True for the empty string; false for bytes that are not UTF-8.
 bool isAlphaNumeric(std::string_view text);
 
 // The plug-in's one log handle: category "zerith". Made by the first call, the same on every thread,

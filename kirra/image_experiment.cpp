@@ -1,6 +1,7 @@
 #include "kirra/image_experiment.h"
 
 #include <new>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -123,7 +124,13 @@ ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
 }
 
 platform::RunLoopOutcome ZRKirraImageExperiment::_runObserved(platform::RunLoop& runLoop) {
-    const Observation exit(runLoop, _makeExitObserver());
+    std::optional<Observation> exit;
+    try {
+        exit.emplace(runLoop, _makeExitObserver());
+    } catch (...) {
+        _disconnect();  // without the observer no exit does it
+        throw;
+    }
     return runLoop.run(platform::kRunLoopDefaultMode, static_cast<double>(_timeoutInSeconds));
 }
 
@@ -135,11 +142,15 @@ std::shared_ptr<platform::RunLoopObserver> ZRKirraImageExperiment::_makeExitObse
     observer->callback = [weak = weak_from_this()](std::uint32_t activity) {
         const auto self = weak.lock();
         if (self != nullptr && (activity & platform::RunLoopExit) != 0) {
-            self->_stream->setDelegate(nullptr);
-            self->_stream->close();
+            self->_disconnect();
         }
     };
     return observer;
+}
+
+void ZRKirraImageExperiment::_disconnect() {
+    _stream->setDelegate(nullptr);
+    _stream->close();
 }
 
 ZRExperimentResultRef ZRKirraImageExperiment::_buildResult() const {

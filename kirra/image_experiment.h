@@ -50,8 +50,8 @@ class ZRKirraImageExperiment final : public ZRExperiment,
     //   3, 4, 5                               opening the stream failed: see ZRKirraImageStream
     //   6  "Timed out after %lu seconds."     what had arrived is dropped, a sensor's error too
     // or the sensor's own error, unchanged. Throws platform::InternalInconsistency when there is no
-    // HID manager, and whatever a callback of the run loop throws. Whatever the outcome, a stream that
-    // was opened is closed when run() ends.
+    // HID manager, std::bad_alloc, and whatever a callback of the run loop throws. Whatever the outcome,
+    // a stream that was opened is closed when run() ends.
     ZRExperimentResultRef run(platform::ErrorSlot error) override;
 
     // Of the stream's delegate.
@@ -62,6 +62,7 @@ class ZRKirraImageExperiment final : public ZRExperiment,
     static bool _displayIsPowered(platform::ErrorSlot error);
     platform::RunLoopOutcome _runObserved(platform::RunLoop& runLoop);
     std::shared_ptr<platform::RunLoopObserver> _makeExitObserver();
+    void _disconnect();
     ZRExperimentResultRef _buildResult() const;
 
     std::shared_ptr<ZRKirraImageStream> _stream;

@@ -1,5 +1,9 @@
 // The display framebuffer service and the device registry, as far as the display's power state
 // needs them.
+//
+// Lifetime  A display may go away at any time, on any thread, also between two of these calls. Its ids
+//           then stand for nothing: registryObject() returns the empty object, and property() a Value
+//           that holds nothing.
 #ifndef ZR_PLATFORM_DISPLAY_H
 #define ZR_PLATFORM_DISPLAY_H
 
@@ -11,7 +15,8 @@
 namespace platform {
 
 using DisplayId = std::uint32_t;
-using RegistryObject = std::uint32_t;  // 0 is the empty object
+// An id, not a reference: nothing releases it. 0 is the empty object.
+using RegistryObject = std::uint32_t;
 
 // The registry property with a display's power state, and the path in it: a dictionary that holds a
 // dictionary that holds a number, zero when the panel is off.

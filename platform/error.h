@@ -1,8 +1,8 @@
 // Error objects, the slot through which an operation reports one, and the one way to fail.
 //
 // An operation that can fail returns false or nothing and, only when its caller passed a slot,
-// stores a new error object there. Success leaves the slot alone. Without a slot no error object is
-// built and no message is formatted.
+// stores a new error object there. Success leaves the slot alone, with one documented exception: the
+// fault experiment's run(). Without a slot no error object is built and no message is formatted.
 #ifndef ZR_PLATFORM_ERROR_H
 #define ZR_PLATFORM_ERROR_H
 
@@ -47,7 +47,7 @@ class Error {
 };
 
 // The result of an operation that failed: converts to whatever the operation returns for failure.
-struct Failure {
+struct [[nodiscard]] Failure {
     // To bool exactly: by way of a bool an optional number would hold a zero.
     template <std::same_as<bool> T>
     operator T() const {

@@ -25,7 +25,7 @@ struct LogLine {
 
 // Receives lines, on the thread that logs them; several threads may be in write() at once. The log
 // holds no lock of its own during the call, but its caller may hold one (the fault experiment logs
-// under the lock of its stop): a sink must not call back into what logs.
+// under the lock of its stop): a sink must not call the code that logged the line. It must not throw.
 class LogSink {
   public:
     virtual ~LogSink() = default;
@@ -33,7 +33,8 @@ class LogSink {
 };
 
 // Replaces the process's sink; lines below `minimum` are then off. A null sink stands for the system
-// log. A line being written keeps the old sink alive until it is done.
+// log. A line being written keeps the old sink alive until it is done. Until the first call,
+// lines of LogLevel::Default and above go to the system log.
 void setLogSink(std::shared_ptr<LogSink> sink, LogLevel minimum);
 
 class Log {

@@ -2,6 +2,7 @@
 
 #include <exception>
 #include <filesystem>
+#include <string_view>
 #include <system_error>
 
 #include <dlfcn.h>
@@ -9,10 +10,13 @@
 namespace platform {
 
 const void* loadModule(const std::string& path) {
-    std::error_code noStatus;
-    const auto status = std::filesystem::status(path, noStatus);
-    if (!std::filesystem::exists(status)) {
+    std::error_code failure;
+    const auto status = std::filesystem::status(path, failure);
+    if (status.type() == std::filesystem::file_type::not_found) {
         throw ModuleProblem("no such file");
+    }
+    if (failure) {
+        throw ModuleProblem(failure.message());
     }
     if (!std::filesystem::is_regular_file(status)) {
         throw ModuleProblem("not a file");
@@ -31,7 +35,11 @@ const void* loadModule(const std::string& path) {
         throw ModuleProblem("its initializer failed with an exception of an unknown kind");
     }
     if (module == nullptr) {
-        throw ModuleProblem(std::string("cannot be loaded: ") + dlerror());
+        std::string_view reason = dlerror();
+        if (const std::string prefix = absolute + ": "; reason.starts_with(prefix)) {
+            reason.remove_prefix(prefix.size());
+        }
+        throw ModuleProblem("cannot be loaded: " + std::string(reason));
     }
     return module;
 }

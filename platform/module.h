@@ -17,9 +17,9 @@ class ModuleProblem : public std::runtime_error {
 // a handle that is the same for every load of the same file. A module stays mapped until the process
 // ends: what it registered may be called at any time.
 //
-// Throws a ModuleProblem when there is no such file, when it is not a regular file, when the system's
-// loader refuses it (not a shared object, a symbol that nothing defines) and when an initializer throws. After the last
-// the loader's lock stays held by this thread: end the process soon.
+// Throws a ModuleProblem when the file cannot be found, is not a regular file or is refused by the
+// loader, or when an initializer throws. In the last case this thread keeps the loader's lock: end the
+// process soon.
 //
 // Any thread, one at a time.
 const void* loadModule(const std::string& path);

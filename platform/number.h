@@ -21,8 +21,13 @@
 
 namespace platform {
 
+template <class T, class... Types>
+concept OneOf = (std::same_as<T, Types> || ...);
+
+// What a Number can box. Characters are not numbers.
 template <class T>
-concept Arithmetic = std::is_arithmetic_v<T> && sizeof(T) <= 8;
+concept Arithmetic = std::is_arithmetic_v<T> && sizeof(T) <= 8 &&
+                     !OneOf<T, char, wchar_t, char8_t, char16_t, char32_t>;
 
 class Number {
   public:

@@ -1,8 +1,9 @@
 // RunLoop: one thread's loop over event sources.
 //
 // A thread that wants one asks for it with forThisThread(). Any thread may signal a source; only the
-// loop's own thread runs it. Sources and observers belong to modes, and a run serves one mode. The
-// common modes have one member, kRunLoopDefaultMode: either name stands for the other.
+// loop's own thread runs it. Sources and observers belong to modes, and a run serves one mode. Any
+// string is a mode. The common modes have one member, kRunLoopDefaultMode: either name stands for the
+// other.
 //
 // Owner    The thread's storage holds the loop until the thread ends; others may hold references
 //          longer. Sources and observers are shared: the loop holds them while they are added.
@@ -50,7 +51,7 @@ class RunLoop;
 // into one.
 class RunLoopSource {
   public:
-    explicit RunLoopSource(std::function<void()> callback);
+    explicit RunLoopSource(std::function<void()> callback);  // must not be empty
     ~RunLoopSource();
     RunLoopSource(const RunLoopSource&) = delete;
     RunLoopSource& operator=(const RunLoopSource&) = delete;
@@ -70,21 +71,21 @@ class RunLoopSource {
 };
 
 // An observer: called at every activity of its mask. Observers of one activity are called in rising
-// `order`, those of equal order as they were added. Constant while it is added to a loop.
+// `order`, those of equal order as they were added. Do not change it while it is added.
 struct RunLoopObserver {
     std::uint32_t activities;
     int order;
-    std::function<void(std::uint32_t activity)> callback;
+    std::function<void(std::uint32_t activity)> callback;  // must not be empty
 };
 
 class RunLoop {
   public:
-    // The calling thread's loop; made by the first call on a thread. From when the thread's end begins
-    // to destroy its loop (a destructor can still ask), each call makes another loop, which belongs to
-    // its caller alone and cannot be run.
+    // The calling thread's loop; made by the first call on a thread. Once the ending thread has begun
+    // to destroy its loop, a call (from a destructor, say) makes a new loop that only its caller holds
+    // and that cannot be run.
     static std::shared_ptr<RunLoop> forThisThread();
-    // The calling thread's loop; null when the thread never asked for one, and from when its end
-    // begins to destroy the loop.
+    // The calling thread's loop; null when the thread never asked for one, and once the ending thread
+    // has begun to destroy it.
     static std::shared_ptr<RunLoop> current();
 
     ~RunLoop();

@@ -57,7 +57,8 @@ class Dictionary {
     Dictionary(MutableDictionary entries);
     Dictionary(std::initializer_list<std::pair<std::string_view, Value>> entries);
 
-    // The value under `key`; one that holds nothing when the key is missing.
+    // The value under `key`; one that holds nothing when the key is missing. Valid as long as the
+    // dictionary.
     const Value& operator[](std::string_view key) const;
     // The number under `key`; absent when the key is missing or its value is not a number.
     Number number(std::string_view key) const;
@@ -83,7 +84,7 @@ class Value {
     Value(T value) : Value(Number(value)) {}
     Value(std::string text);
     Value(std::string_view text) : Value(std::string(text)) {}
-    Value(const char* text) : Value(std::string(text)) {}
+    Value(const char* text) : Value(std::string(text)) {}  // not null
     Value(List list) : _content(std::move(list)) {}
     Value(Dictionary dictionary) : _content(std::move(dictionary)) {}
 
@@ -111,7 +112,8 @@ class Value {
     // The number, or an absent one.
     Number asNumber() const { return number() != nullptr ? *number() : Number(); }
 
-    // The entry under `key` of a dictionary; a Value that holds nothing in every other case.
+    // The entry under `key` of a dictionary; a Value that holds nothing in every other case. Valid as
+    // long as this Value.
     const Value& operator[](std::string_view key) const;
 
     // Numbers by kind and value, strings by text, lists and dictionaries entry by entry, objects by

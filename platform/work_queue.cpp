@@ -54,12 +54,20 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     const Priority priority;
 
     void push(Item item) {
+        // The thread waits only while there are no items. Once the lock is given up, the item may have
+        // run and dropped every other reference.
+        std::shared_ptr<State> waiting;
         {
             const MutexLock lock(_mutex);
             _needThread();  // first: if none can be started, nothing was queued
+            if (_items.empty()) {
+                waiting = shared_from_this();
+            }
             _items.push_back(std::move(item));
         }
-        _changed.notifyAll();
+        if (waiting != nullptr) {
+            waiting->_changed.notifyAll();
+        }
     }
 
     // Queues a delayed item whose time has come, or nothing when the item is empty. False when no

@@ -12,9 +12,9 @@
 //          items of all queues wait on one further thread, which exists while there are any or a
 //          queue is held.
 // Failure  Queueing and holding throw std::system_error when they need a thread and none can be
-//          started; the item is then dropped. On a held queue that does not happen. A delayed item
-//          whose time has come and for which no thread can be started stays queued, and the start is
-//          tried again until it succeeds.
+//          started; the item is then dropped. A held queue needs no new thread, so neither throws. A
+//          delayed item whose time has come and for which no thread can be started stays queued, and
+//          the start is tried again until it succeeds.
 // Exit     Neither a queued nor a delayed item keeps the process from exiting.
 #ifndef ZR_PLATFORM_WORK_QUEUE_H
 #define ZR_PLATFORM_WORK_QUEUE_H
@@ -37,8 +37,8 @@ class WorkQueue {
     // started its thread by holding it or by queueing an item.
     enum class Priority { UserInteractive, Background };
 
-    // An item owns what it captured; that is released right after it ran, on the queue's thread. An
-    // exception that leaves an item ends the process.
+    // Must not be empty. An item owns what it captured; that is released right after it ran, on the
+    // queue's thread. An exception that leaves an item ends the process.
     using Item = std::function<void()>;
 
     // Holds a queue as long as it lives: the queue's thread and that of the delayed items exist, so
@@ -66,8 +66,9 @@ class WorkQueue {
 
     void async(Item item);
 
-    // Queues `item` once `delay` has passed; at once when the delay is zero, negative or NaN, never
-    // when now plus the delay lies beyond the clock's end.
+    // Queues `item` once `delay` has passed; at once when the delay is zero, negative or NaN. When now
+    // plus the delay lies beyond the clock's end, the item never runs: it is kept, with all that it
+    // owns, until the process ends.
     void after(std::chrono::duration<double> delay, Item item);
 
   private:

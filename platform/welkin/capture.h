@@ -43,28 +43,42 @@ using WLRylFrameHandler =
 using WLRylEventHandler =
     std::function<void(std::int32_t event, platform::MediaTime time, std::int64_t info)>;
 
-// Property keys of a stream, in the order in which a client usually meets them.
+// Property keys of a stream, in the order in which a client usually meets them. The comment at each key
+// is the Value that is read or written. Numbers may be of any kind: convert what you read.
+
+// Read. String: one of the port types below.
 inline constexpr std::string_view kRylCaptureStreamProperty_PortType = "ryl.stream.port-type";
+// Written. Dictionary: the three light-source keys below, each to an integer.
 inline constexpr std::string_view kRylCaptureStreamProperty_InfraredLightSourceConfiguration =
     "ryl.stream.infrared-light-source";
+// Written. Boolean.
 inline constexpr std::string_view kRylCaptureStreamProperty_MultipleOutputSupportEnabled =
     "ryl.stream.multiple-outputs";
+// Written. Unsigned integer: which of the sensor's formats, from 0.
 inline constexpr std::string_view kRylCaptureStreamProperty_FormatIndex = "ryl.stream.format-index";
+// Written. Integers: frames per second.
 inline constexpr std::string_view kRylCaptureStreamProperty_MinimumFrameRate =
-    "ryl.stream.minimum-frame-rate";  // frames per second
+    "ryl.stream.minimum-frame-rate";
 inline constexpr std::string_view kRylCaptureStreamProperty_MaximumFrameRate =
-    "ryl.stream.maximum-frame-rate";  // frames per second
+    "ryl.stream.maximum-frame-rate";
+// Written. Dictionary: output to dictionary: ..._AttachRaw to boolean.
 inline constexpr std::string_view kRylCaptureStreamProperty_VideoOutputConfigurations =
     "ryl.stream.output-configurations";
+// Written. Dictionary: output to boolean.
 inline constexpr std::string_view kRylCaptureStreamProperty_VideoOutputsEnabled =
     "ryl.stream.outputs-enabled";
+// Written. Boolean: automatic exposure.
 inline constexpr std::string_view kRylCaptureStreamProperty_AEEnabled = "ryl.stream.auto-exposure";
+// Written. Dictionary: output to dictionary: ..._PixelBufferHandler to an opaque WLRylFrameHandler,
+// ..._EventHandler to an opaque WLRylEventHandler.
 inline constexpr std::string_view kRylCaptureStreamProperty_VideoOutputHandlers =
     "ryl.stream.output-handlers";
+// Read. Dictionary: error counter, by the keys below, to number.
 inline constexpr std::string_view kRylCaptureStreamProperty_ErrorCounters =
     "ryl.stream.error-counters";
 
-// Keys of the light-source configuration: three integers.
+// Keys of the light-source configuration. The dense-interleaved structured-light mode is mode 2,
+// current 0, pattern 1.
 inline constexpr std::string_view kRylCaptureStreamInfraredLightSourceConfigurationKey_Mode =
     "ryl.light-source.mode";
 inline constexpr std::string_view
@@ -74,8 +88,7 @@ inline constexpr std::string_view
     kRylCaptureStreamInfraredLightSourceConfigurationKey_StructuredLightPattern =
         "ryl.light-source.pattern";
 
-// Outputs of a stream, and the keys of an output's configuration and handlers. The handlers travel
-// as opaque values of the two handler types above.
+// Outputs of a stream, and the keys of an output's configuration and handlers.
 inline constexpr std::string_view kRylCaptureStreamVideoOutputID_PrimaryScaler =
     "ryl.output.primary-scaler";
 inline constexpr std::string_view kRylCaptureStreamVideoOutputConfigurationKey_AttachRaw =
@@ -85,14 +98,26 @@ inline constexpr std::string_view kRylCaptureStreamVideoOutputHandlerKey_PixelBu
 inline constexpr std::string_view kRylCaptureStreamVideoOutputHandlerKey_EventHandler =
     "ryl.output.event-handler";
 
-// Keys of the error counters: numbers of errors.
+// Keys of the error counters: these two, and the plain "LPDPErrorCount", "UARTErrorCount",
+// "SIFErrorCount" and "ProjectorErrorCount". A counter that is missing reads as 0, others are ignored.
 inline constexpr std::string_view kRylCaptureStreamPropertyValue_I2CErrorCount = "ryl.errors.i2c";
 inline constexpr std::string_view kRylCaptureStreamPropertyValue_MIPIErrorCount = "ryl.errors.mipi";
 
-// The attachment of a delivered buffer that holds the frame's metadata dictionary, and the two
-// metadata keys that are the service's own.
+// The attachment of a delivered buffer that holds the frame's metadata dictionary.
 inline constexpr std::string_view kRylCaptureSampleBufferAttachmentKey_MetadataDictionary =
     "ryl.buffer.metadata";
+
+// Keys of the metadata, each to a number (a boolean is one): two that are the service's own, and the
+// plain
+//   "MetaDataProjectorMode"        "MetaDataProjectorProbeMode"    "NTCTemperatureIdle"
+//   "MetaDataProjectorIndex"       "MetaDataProjectorPowerProbeA"  "NTCTemperatureStandby"
+//   "MetaDataProjectorPowerLow"    "MetaDataProjectorPowerProbeB"  "NTCTemperatureActive"
+//   "MetaDataProjectorPowerHigh"   "MetaDataProjectorPulseWidth"   "DIETemperatureIdle"
+//   "MetaDataProjectorPowerFlood"  "HardwareEvents"                "DIETemperatureStandby"
+//                                                                  "DIETemperatureActive"
+// A frame may lack the flood temperature; lacking another ends the run. A light source of 1 or 2 means
+// that the projector lit the frame. "HardwareEvents" are 16 flags; bit 13 is set when projection was
+// switched off for safety.
 inline constexpr std::string_view kRylCaptureStreamMetadata_InfraredLightSource =
     "RylInfraredLightSource";
 inline constexpr std::string_view kRylCaptureStreamMetadata_FloodActiveTemperature =

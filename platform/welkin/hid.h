@@ -6,6 +6,7 @@
 //
 // Threads  A device is used on one thread, the one whose run loop it is scheduled on; its callback
 //          runs there. The last reference to a device may go on any thread, also inside its callback.
+//          A manager is used by one thread at a time.
 #ifndef ZR_PLATFORM_WELKIN_HID_H
 #define ZR_PLATFORM_WELKIN_HID_H
 
@@ -31,7 +32,7 @@ class WLIOHIDDeviceInterface {
     // Closes the device if it is still open.
     virtual ~WLIOHIDDeviceInterface() = default;
 
-    // Opens the device. On failure it may supply an error.
+    // Opens the device; false when it is open already. On failure it may supply an error.
     virtual bool open(platform::ErrorSlot error) = 0;
 
     // Installs the function that receives input reports; an empty one removes it. It may be replaced
@@ -44,14 +45,14 @@ class WLIOHIDDeviceInterface {
                                         platform::ErrorSlot error) = 0;
 
     // Starts and stops the delivery of callbacks on the run loop in the mode. Stopping what was not
-    // started does nothing. To unscheduleFromRunLoop() a null run loop stands for the one that the
-    // device was scheduled on and that is gone.
+    // started does nothing. Pass null to unscheduleFromRunLoop() when the run loop no longer exists.
     virtual void scheduleWithRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                                      std::string_view mode) = 0;
     virtual void unscheduleFromRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                                        std::string_view mode) = 0;
 
-    // Closes the device; false when it was not open or could not be closed.
+    // Closes the device and ends its delivery of callbacks; false when it was not open or could not be
+    // closed.
     virtual bool close(platform::ErrorSlot error) = 0;
 };
 
@@ -66,7 +67,7 @@ class WLHIDManager {
     // matches a dictionary when it has every entry of it.
     virtual void enumerateDevicesMatching(const std::vector<platform::Dictionary>& matching) = 0;
 
-    // The matched devices, each once, in no particular order.
+    // The matched devices, each once, in no particular order. None is null.
     virtual std::vector<std::shared_ptr<WLIOHIDDeviceInterface>> devices() = 0;
 };
 

@@ -43,6 +43,7 @@ using WLMeterixChannelDescriptionRef = std::shared_ptr<const WLMeterixChannelDes
 // A channel as a snapshot saw it.
 class WLMeterixChannel {
   public:
+    // `description` must not be null.
     WLMeterixChannel(WLMeterixChannelDescriptionRef description, platform::Number count)
         : _description(std::move(description)), _count(count) {}
 
@@ -69,7 +70,7 @@ class WLMeterixSample {
 
 namespace platform {
 
-using MeterixChannels = std::vector<WLMeterixChannelDescriptionRef>;
+using MeterixChannels = std::vector<WLMeterixChannelDescriptionRef>;  // none is null
 using MeterixSamples = std::vector<WLMeterixSample>;
 
 // What a device implements. A null result is a failure, with or without an error in the slot. Any
@@ -85,7 +86,8 @@ class MeterixFacility {
     virtual std::shared_ptr<const MeterixSamples> sample(const MeterixChannels& channels,
                                                          ErrorSlot error) = 0;
 
-    // Channel by channel, the later count less the baseline's.
+    // Channel by channel, the later count less the baseline's. What becomes of a channel that one side
+    // lacks is the implementation's choice.
     virtual std::shared_ptr<const MeterixSamples> difference(const MeterixSamples& later,
                                                              const MeterixSamples& baseline,
                                                              ErrorSlot error) = 0;

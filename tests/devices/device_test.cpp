@@ -51,9 +51,12 @@ TEST(DeviceModule, ABadOneIsNamedWithTheReason) {
     const std::size_t before = devices::kinds().size();
     EXPECT_EQ(load("/no/such.so"), "no such file");
     EXPECT_EQ(load(ZR_TEST_MODULES), "not a file");
-    EXPECT_THAT(load(__FILE__), HasSubstr("cannot be loaded: "));
+    EXPECT_EQ(load(std::string(300, 'n')), "File name too long");
+    EXPECT_EQ(load(ZR_TEST_MODULES "/../CTestTestfile.cmake"),
+              "cannot be loaded: invalid ELF header");
     EXPECT_THAT(load(module("unresolved")),
-                AllOf(HasSubstr("cannot be loaded: "), HasSubstr("nobodyHasThisFunction")));
+                AllOf(StartsWith("cannot be loaded: undefined symbol: "),
+                      HasSubstr("nobodyHasThisFunction")));
     EXPECT_EQ(load(module("silent")), "it registers no kind of device");
     EXPECT_EQ(load(module("other_version")),
               "it is built for version 2 of the device interface, this is version 1");

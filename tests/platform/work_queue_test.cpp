@@ -304,6 +304,18 @@ TEST(WorkQueue, ItsOwnerMayEndInAnyOfItsItems) {
     EXPECT_TRUE(eventually([] { return threadsNamed("relay") == 0; }));
 }
 
+// The queue may end before async() returns. Only the sanitizers see it when that is a fault.
+TEST(WorkQueue, AnItemMayBeTheOnlyOwnerOfItsQueue) {
+    constexpr int kQueues = 100;
+    std::latch done(kQueues);
+    for (int i = 0; i < kQueues; ++i) {
+        auto owner = std::make_shared<WorkQueue>("owned by item", Priority::UserInteractive);
+        WorkQueue& queue = *owner;
+        queue.async([owner = std::move(owner), &done] { done.count_down(); });
+    }
+    done.wait();
+}
+
 // Leaves the process while items wait without end, are pending, and use what the process shares.
 void exitWithItemsUnderWay() {
     std::latch never(1);

@@ -35,7 +35,7 @@ struct Script {
             throw std::logic_error("No HID Manager available?!");
         }
         if (!silently) {
-            platform::fail(error, "domain", 7, nullptr, "%@ failed", name);
+            static_cast<void>(platform::fail(error, "domain", 7, nullptr, "%@ failed", name));
         }
         return false;
     }

@@ -78,6 +78,7 @@ class Suite {
             setText(_node, "system-out", log);
         }
         setCounts(_node, _counts);
+        _node.append_attribute("skipped").set_value(0);
         return _counts;
     }
 

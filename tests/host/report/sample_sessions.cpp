@@ -180,7 +180,8 @@ SessionRecord repeatedSession() {
     addResults(run, true);
     run.number = 7;
     host::RepeatRecord repeat{run.plan.name, 20, 17, 2, 1, 61.5, {}, {}};
-    repeat.notPassed = {{7, Verdict::Failed, "Frame Count is 71 frames"}, {9, Verdict::Error, kHostile}};
+    repeat.notPassed = {{7, Verdict::Failed, "Frame Count is 71 frames"},
+                        {9, Verdict::Error, kHostile}};
     for (const host::ResultRecord& result : run.results) {
         const bool outside = result.judgement == Judgement::Outside;
         repeat.results.push_back({result.name, result.unit, result.limit, 19, outside ? 2U : 0U,

@@ -33,8 +33,8 @@ class LogSink {
 };
 
 // Replaces the process's sink; lines below `minimum` are then off. A null sink stands for the system
-// log. A line being written keeps the old sink alive until it is done. Until the first call,
-// lines of LogLevel::Default and above go to the system log.
+// log. A line being written keeps the old sink alive until it is done. Until the first call, lines
+// of LogLevel::Default and above go to the system log.
 void setLogSink(std::shared_ptr<LogSink> sink, LogLevel minimum);
 
 class Log {

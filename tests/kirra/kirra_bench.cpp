@@ -3,7 +3,6 @@
 #include <utility>
 
 #include "devices/observed/hid.h"
-#include "platform/services.h"
 #include "platform/text_format.h"
 
 namespace test {
@@ -95,17 +94,6 @@ Journal joined(Journal first, const Journal& second) {
 
 platform::ErrorRef sensorError(std::string_view text) {
     return std::make_shared<const platform::Error>("sensor", 7, std::string(text));
-}
-
-class KirraTest::Witness final : public observed::Observer {
-  public:
-    void misused(std::string_view what) override { ADD_FAILURE() << what; }
-};
-
-KirraTest::KirraTest() : _witness(std::make_shared<Witness>()) {}
-
-KirraTest::~KirraTest() {
-    platform::installServices({});
 }
 
 void KirraTest::install() {

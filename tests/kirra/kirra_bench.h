@@ -12,11 +12,13 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "devices/observed/observer.h"
 #include "devices/simulator/display_service.h"
 #include "devices/simulator/hid_sensor.h"
 #include "kirra/image_experiment.h"
 #include "kirra/image_stream.h"
 #include "platform/run_loop.h"
+#include "platform/services.h"
 #include "tests/support/is_error.h"
 
 namespace test {
@@ -39,8 +41,7 @@ platform::ErrorRef sensorError(std::string_view text);
 
 class KirraTest : public ::testing::Test {
   protected:
-    KirraTest();
-    ~KirraTest() override;
+    ~KirraTest() override { platform::installServices({}); }
 
     simulator::HidDeviceProfile& sensor() { return hid.devices.at(1); }
 
@@ -63,8 +64,10 @@ class KirraTest : public ::testing::Test {
     platform::ErrorRef error;
 
   private:
-    class Witness;
-    std::shared_ptr<Witness> _witness;
+    struct Witness final : observed::Observer {
+        void misused(std::string_view what) override { ADD_FAILURE() << what; }
+    };
+    std::shared_ptr<Witness> _witness = std::make_shared<Witness>();
     std::shared_ptr<Tap> _tap;
 };
 

@@ -75,15 +75,9 @@ FaultTest::~FaultTest() {
     platform::setLogSink(nullptr, platform::LogLevel::Error);
 }
 
-simulator::FrameOverride& FaultTest::from(std::uint64_t frame) {
-    simulator::FrameOverride& range = camera().overrides.emplace_back();
-    range.frames.first = frame;
-    return range;
-}
-
 simulator::FrameOverride& FaultTest::at(std::uint64_t frame) {
-    simulator::FrameOverride& range = from(frame);
-    range.frames.last = frame;
+    simulator::FrameOverride& range = camera().overrides.emplace_back();
+    range.frames = {.first = frame, .last = frame};
     return range;
 }
 
@@ -91,11 +85,8 @@ void FaultTest::install() {
     const auto progress = std::make_shared<simulator::StreamProgress>();
     _plugIn = observed::observeCapture(simulator::makeCapturePlugIn(capture, speed, progress),
                                        observed::Reporter(_witness));
-    platform::installServices({.capture = _plugIn,
-                               .meterix = simulator::makeMeterixFacility(meterix, progress),
-                               .hid = nullptr,
-                               .display = nullptr,
-                               .registry = nullptr});
+    platform::installServices(
+        {.capture = _plugIn, .meterix = simulator::makeMeterixFacility(meterix, progress)});
 }
 
 void FaultTest::install(WLRylCaptureStreamList streams) {

@@ -3,10 +3,12 @@
 #ifndef ZR_TESTS_VANTOR_FAULT_FAULT_BENCH_H
 #define ZR_TESTS_VANTOR_FAULT_FAULT_BENCH_H
 
+#include <algorithm>
 #include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include <gmock/gmock.h>
@@ -27,13 +29,15 @@ namespace test {
 // process that runs many it may appear in the log of a later one.
 inline constexpr double kLate = 20;
 
+// Whether `condition` comes true in a generous time.
+bool eventually(const std::function<bool()>& condition);
+
 // Records the log's lines, and can hold a thread in one of them.
 class LogRecorder final : public platform::LogSink {
   public:
     void write(const platform::LogLine& line) override {
         const platform::MutexLock lock(_mutex);
         _lines.push_back({line.level, std::string(line.message)});
-        _changed.notifyAll();
         while (!_held.empty() && line.message.starts_with(_held)) {
             _changed.wait(_mutex);
         }
@@ -49,21 +53,17 @@ class LogRecorder final : public platform::LogSink {
         _changed.notifyAll();
     }
 
-    // Whether so many lines of that level with this beginning come, in a generous time.
-    bool waitFor(platform::LogLevel level, std::string_view beginning, std::size_t times = 1) {
-        const auto deadline = platform::deadlineAfter(kGenerous);
-        const platform::MutexLock lock(_mutex);
-        while (_count(level, beginning) < times) {
-            if (std::chrono::steady_clock::now() >= deadline) {
-                return false;
-            }
-            _changed.waitUntil(_mutex, deadline);
-        }
-        return true;
-    }
+    // How many lines of that level have this beginning.
     std::size_t count(platform::LogLevel level, std::string_view beginning) {
         const platform::MutexLock lock(_mutex);
-        return _count(level, beginning);
+        return static_cast<std::size_t>(
+            std::count_if(_lines.begin(), _lines.end(), [&](const Line& line) {
+                return line.level == level && line.message.starts_with(beginning);
+            }));
+    }
+    // Whether such a line comes in a generous time.
+    bool waitFor(platform::LogLevel level, std::string_view beginning) {
+        return eventually([&] { return count(level, beginning) > 0; });
     }
     std::vector<std::string> messages() {
         const platform::MutexLock lock(_mutex);
@@ -80,23 +80,11 @@ class LogRecorder final : public platform::LogSink {
         std::string message;
     };
 
-    std::size_t _count(platform::LogLevel level, std::string_view beginning) const
-        ZR_REQUIRES(_mutex) {
-        std::size_t count = 0;
-        for (const Line& line : _lines) {
-            count += line.level == level && line.message.starts_with(beginning) ? 1 : 0;
-        }
-        return count;
-    }
-
     platform::Mutex _mutex;
     platform::Condition _changed;
     std::vector<Line> _lines ZR_GUARDED_BY(_mutex);
     std::string _held ZR_GUARDED_BY(_mutex);
 };
-
-// Whether `condition` comes true in a generous time.
-bool eventually(const std::function<bool()>& condition);
 
 // An error as a device service would report it.
 platform::ErrorRef serviceError(std::string_view text);
@@ -115,6 +103,7 @@ struct HandFedStream final : WLRylCaptureStream {
                   std::string_view forProperty,
                   platform::ErrorSlot /*error*/) override {
         values.set(forProperty, value);
+        written.emplace_back(forProperty, value);
         return true;
     }
     bool start(platform::ErrorSlot /*error*/) override {
@@ -125,6 +114,7 @@ struct HandFedStream final : WLRylCaptureStream {
 
     std::function<void()> onStart = [] {};
     platform::MutableDictionary values;  // the properties
+    std::vector<std::pair<std::string, platform::Value>> written;
 };
 
 class FaultTest : public ::testing::Test {
@@ -136,8 +126,7 @@ class FaultTest : public ::testing::Test {
 
     // The infrared camera of the profile.
     simulator::StreamProfile& camera() { return capture.streams.back(); }
-    // What is different from some frame on.
-    simulator::FrameOverride& from(std::uint64_t frame);
+    // What is different in a frame.
     simulator::FrameOverride& at(std::uint64_t frame);
 
     // Makes the profiles the installed device. The one before must have all its buffers back.

@@ -17,7 +17,6 @@ using ::testing::ElementsAre;
 using ::testing::StartsWith;
 
 constexpr std::string_view kTimeoutLine = "Timeout has been reached.";
-constexpr std::string_view kLateLine = "Received frame that won't be counted at time: ";
 
 double value(const ZRExperimentResultRef& result, std::string_view name) {
     const MeasurementRef* measurement = result->measurements().find(name);
@@ -35,29 +34,15 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
         int code;  // of the error; 0: a result
         std::string_view text;
     } kCases[] = {
-        {"every frame lit", [] {}, 3, 0, ""},
         {"no frame asked for", [] {}, 0, 0, ""},
-        {"no flood temperature", [&] { from(1).remove = {"RylFloodActiveTemperature"}; }, 2, 0, ""},
         {"a light source read as 32 bits",
-         [&] { from(1).set.set(kLight, (std::int64_t{1} << 32) + 2); }, 2, 0, ""},
-        {"unlit", [&] { at(2).set.set(kLight, 0); }, 3, 206,
-         "Frame 2 is not illuminated for unknown reason!"},
-        {"an unknown light source", [&] { at(1).set.set(kLight, 3); }, 1, 206,
-         "Frame 1 is not illuminated for unknown reason!"},
-        {"a negative light source",
-         [&] {
-             at(1).set.set(kLight, -1);
-             at(1).set.set("HardwareEvents", 0x1FFF);
-         },
-         1, 206, "Frame 1 is not illuminated for unknown reason!"},
+         [&] { at(1).set.set(kLight, (std::int64_t{1} << 32) + 2); }, 2, 0, ""},
         {"unlit for safety",
          [&] {
              at(3).set.set(kLight, 0);
              at(3).set.set("HardwareEvents", 0x12000);
          },
          3, 213, "Frame 3 is not illuminated for safety reason!"},
-        {"metadata missing", [&] { at(2).noMetadata = true; }, 9, 206,
-         "Frame metadata is missing!"},
         {"metadata corrupt", [&] { at(1).metadataIsNoDictionary = true; }, 9, 206,
          "Frame metadata is not a dictionary!"},
         {"metadata incomplete", [&] { at(2).remove = {"HardwareEvents"}; }, 9, 206,
@@ -68,20 +53,12 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
              at(2).set.set(kLight, 0);
          },
          9, 206, "Frame 1 is not illuminated for unknown reason!"},
-        {"does not stop", [&] { camera().stop = Fault::failing(nullptr); }, 1, 205,
-         "Failed to stop stream!"},
         {"does not stop after an unlit frame",
          [&] {
              at(1).set.set(kLight, 0);
              camera().stop = Fault::failing(test::serviceError("stuck"));
          },
          1, 206, "Frame 1 is not illuminated for unknown reason!"},
-        {"error counters unreadable",
-         [&] {
-             camera().propertyFaults.set(kRylCaptureStreamProperty_ErrorCounters,
-                                         Fault::failing(test::serviceError("gone")));
-         },
-         2, 210, "Failed to get error counters from zorvel."},
         {"error counters of another kind", [&] { camera().errorCounters = 5; }, 2, 210,
          "Failed to get error counters from zorvel."},
         {"neither stops nor counts",
@@ -106,9 +83,6 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
             EXPECT_EQ(result, nullptr);
             EXPECT_THAT(error, IsPlainError(ZRCapturePlugInErrorDomain, code, text));
         }
-        const auto again = make(frameCount, kLate);  // without a slot: the same
-        EXPECT_EQ(again->run(nullptr) != nullptr, code == 0);
-        again->teardown(nullptr);
     }
 }
 
@@ -140,9 +114,6 @@ TEST_F(FaultStreaming, MeasuresFramesErrorsAndTheRiseOfTheCounters) {
     EXPECT_EQ(unit("SIF"), &ZRDimensionlessUnit::errors());
     EXPECT_EQ(unit("UART"), &ZRDimensionlessUnit::events());
     EXPECT_TRUE(result->auxiliaryData().empty());
-
-    meterix.channels.clear();
-    EXPECT_EQ(run(3, kLate)->measurements().size(), 7U);
 }
 
 TEST_F(FaultStreaming, LogsEachStepOfAFrameThatFailed) {
@@ -181,18 +152,6 @@ TEST_F(FaultStreaming, EndsWithAResultAtTheTimeOut) {
     EXPECT_GE(log->count(LogLevel::Error, kTimeoutLine), 3U);
 }
 
-TEST_F(FaultStreaming, ALateTimeOutChangesNothing) {
-    install();
-    auto experiment = make(2, 0.02);
-    const std::weak_ptr<Experiment> weak = experiment;
-    EXPECT_NE(experiment->run(&error), nullptr);
-    EXPECT_TRUE(experiment->teardown(&error));
-    experiment = nullptr;
-    EXPECT_TRUE(log->waitFor(LogLevel::Error, kTimeoutLine));
-    EXPECT_TRUE(test::eventually([&] { return weak.expired(); }));
-    EXPECT_EQ(error, nullptr);
-}
-
 // What is received after the stop is logged with its time, in seconds, and not counted.
 TEST_F(FaultStreaming, CountsNoFrameAfterTheStop) {
     camera().stallAfterFrame = 0;
@@ -201,15 +160,9 @@ TEST_F(FaultStreaming, CountsNoFrameAfterTheStop) {
     const auto result = experiment->run(nullptr);
     const WLRylFrameHandler deliver = frameHandler(*experiment);
     deliver(buffer(), {.value = 5, .timescale = 2});
-    deliver(std::make_shared<const platform::ImageBuffer>(Dictionary()), {.flags = 0});
-    EXPECT_TRUE(log->waitFor(LogLevel::Default, kLateLine, 2));
-    EXPECT_EQ(log->count(LogLevel::Default, std::string(kLateLine) + "2.5"), 1U);
-    EXPECT_EQ(log->count(LogLevel::Default, std::string(kLateLine) + "nan"), 1U);
+    EXPECT_TRUE(
+        log->waitFor(LogLevel::Default, "Received frame that won't be counted at time: 2.5"));
     EXPECT_EQ(value(result, "FrameCount"), 0);
-
-    camera().stallAfterFrame.reset();
-    camera().framesAfterStop = 5;
-    EXPECT_NE(run(1, kLate), nullptr);  // and their buffers come back: checked at the end
 }
 
 TEST_F(FaultStreaming, TakesANullBufferForOneWithoutMetadata) {
@@ -239,20 +192,18 @@ TEST_F(FaultStreaming, TheFirstTriggerDecidesTheOutcome) {
     constexpr int kRounds = 60;
     constexpr auto kLight = kRylCaptureStreamMetadata_InfraredLightSource;
     const struct {
-        std::string_view name;
         std::uint64_t last;     // 0: none
         std::uint64_t unlit;    // 0: none
         std::uint64_t missing;  // 0: none
         bool timesOut;
     } kPairs[] = {
-        {"last and unlit", 5, 6, 0, false},    {"last and missing", 5, 0, 6, false},
-        {"unlit and missing", 0, 5, 6, false}, {"last and time-out", 5, 0, 0, true},
-        {"unlit and time-out", 0, 5, 0, true}, {"missing and time-out", 0, 0, 5, true},
-        {"all of them", 4, 5, 6, true},
+        {5, 6, 0, false}, {5, 0, 6, false}, {0, 5, 6, false}, {5, 0, 0, true},
+        {0, 5, 0, true},  {0, 0, 5, true},  {4, 5, 6, true},
     };
     const auto healthy = capture;
-    for (const auto& [name, last, unlit, missing, timesOut] : kPairs) {
-        SCOPED_TRACE(name);
+    for (const auto& [last, unlit, missing, timesOut] : kPairs) {
+        SCOPED_TRACE(::testing::Message()
+                     << last << ' ' << unlit << ' ' << missing << ' ' << timesOut);
         for (int round = 0; round < kRounds; ++round) {
             capture = healthy;
             if (unlit != 0) {

@@ -7,7 +7,6 @@
 namespace {
 
 using platform::ErrorRef;
-using platform::ErrorSlot;
 using test::IsError;
 using test::IsPlainError;
 
@@ -29,19 +28,11 @@ TEST(Error, IsStoredOnlyInASlotAndFormattedOnlyForOne) {
     ErrorRef second;
     EXPECT_FALSE(platform::fail(&second, "other", -7, first, "Failed."));
     EXPECT_THAT(second, IsError("other", -7, "Failed.", first));
-}
 
-TEST(Error, IsHandedOnUnchangedAndNullLeavesTheSlotAlone) {
-    const ErrorRef lower = std::make_shared<const platform::Error>("lower", 3, "below");
-    ErrorRef error;
-    const auto nothing = [&](ErrorSlot slot, const ErrorRef& cause) -> std::optional<int> {
-        return platform::failWith(slot, cause);
-    };
-    EXPECT_EQ(nothing(&error, lower), std::nullopt);
-    EXPECT_EQ(error, lower);
-    EXPECT_EQ(nothing(&error, nullptr), std::nullopt);
-    EXPECT_EQ(error, lower);
-    EXPECT_EQ(nothing(nullptr, lower), std::nullopt);
+    EXPECT_FALSE(platform::failWith(nullptr, first));
+    EXPECT_FALSE(platform::failWith(&second, first));
+    EXPECT_FALSE(platform::failWith(&second, nullptr));
+    EXPECT_EQ(second, first);
 }
 
 }  // namespace

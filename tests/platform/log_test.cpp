@@ -6,30 +6,19 @@
 
 #include <gmock/gmock.h>
 
-#include "platform/mutex.h"
-
 namespace {
 
 using platform::Log;
 using platform::LogLevel;
 using platform::LogLine;
 
-class RecordingSink final : public platform::LogSink {
-  public:
+struct RecordingSink final : platform::LogSink {
     void write(const LogLine& line) override {
-        const platform::MutexLock lock(_mutex);
-        _lines.push_back(std::string(line.subsystem) + ':' + std::string(line.category) + ' ' +
-                         std::to_string(static_cast<int>(line.level)) + ' ' +
-                         std::string(line.message));
+        lines.push_back(std::string(line.subsystem) + ':' + std::string(line.category) + ' ' +
+                        std::to_string(static_cast<int>(line.level)) + ' ' +
+                        std::string(line.message));
     }
-    std::vector<std::string> lines() {
-        const platform::MutexLock lock(_mutex);
-        return _lines;
-    }
-
-  private:
-    platform::Mutex _mutex;
-    std::vector<std::string> _lines ZR_GUARDED_BY(_mutex);
+    std::vector<std::string> lines;
 };
 
 class LogTest : public ::testing::Test {
@@ -54,7 +43,7 @@ TEST_F(LogTest, ComputesAMessageOnlyWhenItsLevelIsOn) {
                                    std::to_string(expected.size() + 1));
             }
         }
-        EXPECT_EQ(sink->lines(), expected);
+        EXPECT_EQ(sink->lines, expected);
         EXPECT_EQ(computed, static_cast<int>(expected.size()));
     }
 }

@@ -9,12 +9,10 @@
 #include <gmock/gmock.h>
 
 #include "platform/services.h"
-#include "tests/support/is_error.h"
 
 namespace {
 
 using platform::Number;
-using simulator::Fault;
 using simulator::MeterixProfile;
 
 class MeterixFacility : public ::testing::Test {
@@ -60,28 +58,11 @@ TEST_F(MeterixFacility, TheDifferenceIsWhatStreamingAdded) {
     EXPECT_EQ(error, nullptr);
 }
 
-TEST_F(MeterixFacility, AbsenceAndAFailureComeThroughToTheEnd) {
-    const auto cause = std::make_shared<const platform::Error>("facility", 9, "refused");
-    for (Fault MeterixProfile::*const failing :
-         {&MeterixProfile::report, &MeterixProfile::firstSnapshot, &MeterixProfile::laterSnapshots,
-          &MeterixProfile::difference}) {
-        for (const platform::ErrorRef& given : {platform::ErrorRef(cause), platform::ErrorRef()}) {
-            MeterixProfile broken = profile;
-            broken.*failing = Fault::failing(given);
-            platform::ErrorRef error;
-            const WLMeterixSnapshot difference = measure(broken, &error);
-            EXPECT_FALSE(difference);
-            EXPECT_TRUE(difference.samples().empty());
-            EXPECT_EQ(error, given);
-            EXPECT_FALSE(measure(broken, nullptr));
-        }
-    }
-}
-
 TEST_F(MeterixFacility, WithoutAFacilityOrABaselineTheResultIsAbsentWithoutAnError) {
     platform::ErrorRef error;
     const WLMeterixSnapshot present = measure(profile, &error);
     EXPECT_FALSE(present.snapshotWithBaseline({}, &error));
+    EXPECT_TRUE(WLMeterixSnapshot().samples().empty());
     EXPECT_FALSE(WLMeterixSnapshot().snapshotWithBaseline(present, &error));
     platform::installServices({});
     EXPECT_FALSE(WLMeterix::reportWithOnlySimpleChannels(&error).snapshot(&error));

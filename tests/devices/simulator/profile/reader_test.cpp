@@ -23,8 +23,6 @@ namespace {
 namespace fs = std::filesystem;
 using simulator::DeviceProfile;
 using simulator::loadProfile;
-using ::testing::ElementsAre;
-using ::testing::Field;
 using ::testing::SizeIs;
 
 constexpr auto kLast = std::numeric_limits<std::uint64_t>::max();
@@ -87,6 +85,10 @@ TEST_F(ProfileReader, TellsWhatIsWrongWithAProfile) {
 }
 
 TEST_F(ProfileReader, TellsWhatIsNoStrictJson) {
+    std::string deep;
+    for (int level = 0; level < 64; ++level) {
+        deep += "/0";
+    }
     const std::pair<std::string, std::string> kCases[] = {
         {"",
          "line 1, column 1: syntax error while parsing value - unexpected end of input; "
@@ -102,14 +104,7 @@ TEST_F(ProfileReader, TellsWhatIsNoStrictJson) {
         {R"({"a": [{}, {"b": 1, "c": [], "b": 2}]})", "/a/1/b: the key comes twice"},
         {R"({"summary": "", "a\nb": 1})", "/a?b: unknown key"},
         {R"({"display": {"powered": 1e999}})", "number overflow parsing '1e999'"},
-        {std::string(100000, '['),
-         [] {
-             std::string pointer;
-             for (int level = 0; level < 64; ++level) {
-                 pointer += "/0";
-             }
-             return pointer + ": nested more than 64 deep";
-         }()},
+        {std::string(100000, '['), deep + ": nested more than 64 deep"},
         {std::string((1U << 20U) + 1, ' '), "longer than 1 MiB"},
     };
     for (const auto& [text, problem] : kCases) {
@@ -150,22 +145,8 @@ TEST_F(ProfileReader, TellsWhatCannotBeFound) {
     write("17.json", "{}");
     EXPECT_EQ(problemOf("0.json"), "15.json: /extends: more than 16 profiles in a row");
     write("healthy", R"({"extends": "healthy"})");
-    load("./healthy");
+    EXPECT_EQ(load("./healthy").name, "./healthy");
     EXPECT_EQ(load("2.json").display.powered, platform::Value(true));
-}
-
-TEST_F(ProfileReader, AnEmptyProfileIsADeviceWithoutFaults) {
-    write("x.json", "{}");
-    const DeviceProfile device = load("./x.json");
-    EXPECT_EQ(device.name, "./x.json");
-    EXPECT_THAT(device.capture.streams,
-                ElementsAre(Field(&simulator::StreamProfile::portType, "ryl.port.rear"),
-                            Field(&simulator::StreamProfile::portType, "ryl.port.front"),
-                            Field(&simulator::StreamProfile::portType, "ryl.port.front-infrared")));
-    EXPECT_EQ(device.capture.streams[2].lightSources, (std::vector<std::int32_t>{1, 2}));
-    EXPECT_THAT(device.meterix.channels, SizeIs(64));
-    EXPECT_THAT(device.hid.devices, SizeIs(3));
-    EXPECT_EQ(device.display.powered, platform::Value(true));
 }
 
 TEST_F(ProfileReader, AnExtensionChangesWhatItNamesAndKeepsTheRest) {

@@ -261,7 +261,7 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
         "<div class=\"shares\" role=\"img\" aria-label=\"{0}\">{3}</div>\n{4}",
         counts, run.number,
         run.verdict == Verdict::Passed ? "the last" : "the first that did not pass", shares,
-        runs.html() + more + table.html() +
+        table.html() + runs.html() + more +
             folded(plural(alikeCount, "result alike in every run", "results alike in every run"),
                    alike.html()));
 }

@@ -113,8 +113,8 @@ devices::Device openDevice(const DeviceChoice& choice) {
     }
 }
 
-std::vector<ListedDevice> listDevices() {
-    std::vector<ListedDevice> listed;
+std::vector<devices::Entry> listDevices() {
+    std::vector<devices::Entry> listed;
     bool isFirst = true;
     for (const devices::Kind& kind : devices::kinds()) {
         const std::string prefix = isFirst ? "" : kind.name + ":";

@@ -33,15 +33,9 @@ std::string deviceArgument(const DeviceChoice& choice);
 // wrong or that the kind does not take; kExitError about a device that fails.
 devices::Device openDevice(const DeviceChoice& choice);
 
-// A device that --device takes.
-struct ListedDevice {
-    std::string name;
-    std::string summary;
-};
-
 // The devices that the registered kinds list, by kind. The simulator's, which come first, go without
 // their kind.
-std::vector<ListedDevice> listDevices();
+std::vector<devices::Entry> listDevices();
 
 }  // namespace host
 

@@ -110,11 +110,11 @@ int deviceKinds() {
 int listedDevices(bool namesOnly) {
     const auto listed = listDevices();
     std::size_t width = 0;
-    for (const ListedDevice& device : listed) {
+    for (const devices::Entry& device : listed) {
         width = std::max(width, device.name.size());
     }
     std::string out;
-    for (const ListedDevice& device : listed) {
+    for (const devices::Entry& device : listed) {
         out += namesOnly ? device.name + "\n"
                          : fmt::format("{:<{}}  {}\n", device.name, width, device.summary);
     }

@@ -29,6 +29,9 @@ enum class Verdict {
     Passed,  // a diagnostic whose every limited result is within its limit; an experiment that ran
     Failed,  // a result is outside its limit
     Error,   // something did not complete, so there is no verdict
+    // The program was asked to stop during the run. It says nothing about the unit; what the run had
+    // found until then is in its record.
+    Interrupted,
 };
 
 // Where a result stands with respect to its limit.
@@ -87,6 +90,7 @@ struct LogRecord {
     platform::Date time;
     platform::LogLevel level;
     std::string message;
+    bool late = false;  // it came when its run had ended
 };
 
 // A frame that the device delivered, with what a report draws of it.
@@ -144,6 +148,7 @@ struct RepeatRecord {
     std::uint64_t passed = 0;
     std::uint64_t failed = 0;
     std::uint64_t errors = 0;
+    std::uint64_t interrupted = 0;  // the last one, when the program was asked to stop during it
     double seconds = 0;  // of all runs
     std::vector<ResultStatistics> results;
     std::vector<Repetition> notPassed;  // the first kMostRepetitions of them
@@ -162,7 +167,9 @@ struct SessionRecord {
     double seconds = 0;
     // One entry per name asked for; known when the session starts.
     std::vector<RunPlan> planned;
-    // One record per name asked for; of a repeated run the first that did not pass, else the last.
+    // One record per name, in the order of `planned`; of a repeated run the first that did not pass, else
+    // the last. An interrupted session has fewer than it planned: the last of these, if any, was in
+    // progress, and the names behind it were not started.
     std::vector<RunRecord> runs;
     // One entry per name when runs were repeated; empty otherwise.
     std::vector<RepeatRecord> repeats;

@@ -17,9 +17,11 @@ std::string_view verdictText(Verdict verdict) {
         case Verdict::Failed:
             return "FAIL";
         case Verdict::Error:
+            return "ERROR";
+        case Verdict::Interrupted:
             break;
     }
-    return "ERROR";
+    return "INTERRUPTED";
 }
 
 std::string_view partText(Part part) {
@@ -78,6 +80,9 @@ std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view 
 }
 
 std::string headline(const RunRecord& run) {
+    if (run.verdict == Verdict::Interrupted) {
+        return "stopped before its end";
+    }
     if (run.verdict == Verdict::Error) {
         return "did not complete";
     }

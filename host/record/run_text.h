@@ -11,7 +11,7 @@
 
 namespace host {
 
-// "PASS", "FAIL", "ERROR".
+// "PASS", "FAIL", "ERROR", "INTERRUPTED".
 std::string_view verdictText(Verdict verdict);
 
 // "experiment", "analysis".

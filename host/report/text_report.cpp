@@ -34,6 +34,7 @@ class Writer {
             case Verdict::Failed:
                 return _painted("1;31", verdictText(verdict));
             case Verdict::Error:
+            case Verdict::Interrupted:
                 break;
         }
         return _painted("1;35", verdictText(verdict));

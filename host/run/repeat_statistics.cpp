@@ -47,6 +47,9 @@ void RepeatStatistics::add(const RunRecord& run) {
         case Verdict::Error:
             ++_record.errors;
             break;
+        case Verdict::Interrupted:
+            ++_record.interrupted;
+            break;
     }
     if (run.verdict != Verdict::Passed && _record.notPassed.size() < kMostRepetitions) {
         _record.notPassed.push_back({run.number, run.verdict, whyText(run)});

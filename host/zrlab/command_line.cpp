@@ -96,6 +96,19 @@ CommandLine::CommandLine()
         ->excludes(names);
     _addDeviceModule(*devices);
 
+    CLI::App* device = _app.add_subcommand(
+        "device", "Show what a device is made of, or check the description of one");
+    device->add_option("ACTION", action, "Show a device, or check descriptions")
+        ->required()
+        ->type_name("show|check")
+        ->check(oneOf({"show", "check"}));
+    device->add_option("WHAT", subjects, "A device that \"zrlab devices\" lists, a file, KIND:WHAT")
+        ->required();
+    _addDeviceModule(*device);
+    device->footer(
+        "Examples:\n  zrlab device show counter-stuck > mine.json\n"
+        "  zrlab device check ./mine.json");
+
     CLI::App* help = _app.add_subcommand("help", "Show the help of a command");
     help->add_option("COMMAND", helpTopic, "The command to explain");
 

@@ -33,7 +33,8 @@ class CommandLine {
     const CLI::App* find(const std::string& command) const;
 
     std::string plugin;                 // the module to load
-    std::vector<std::string> subjects;  // of describe
+    std::vector<std::string> subjects;  // of describe and device
+    std::string action;                 // of device
     bool namesOnly = false;             // of list and devices
     bool kindsOnly = false;             // of devices
     std::string helpTopic;              // of help

@@ -12,6 +12,7 @@
 #include "host/run/planner.h"
 #include "host/zrlab/command_line.h"
 #include "host/zrlab/device_choice.h"
+#include "host/zrlab/device_command.h"
 #include "host/zrlab/session.h"
 #include "host/zrlab/terminal.h"
 #include "input/nearest.h"
@@ -165,6 +166,12 @@ int run(int count, const char* const* arguments) {
     if (command == "devices") {
         loadDeviceModules(commandLine.session.device.modules);
         return commandLine.kindsOnly ? deviceKinds() : listedDevices(commandLine.namesOnly);
+    }
+    if (command == "device") {
+        loadDeviceModules(commandLine.session.device.modules);
+        const DeviceAnswer answer = deviceCommand(commandLine.action, commandLine.subjects);
+        print(answer.text);
+        return answer.status;
     }
     if (command == "help") {
         return help(commandLine.helpTopic);

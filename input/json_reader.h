@@ -112,7 +112,7 @@ T JsonNode::asInteger(T least, T most) const {
     const bool isFloat = _json->is_number_float();
     const double number = isFloat ? _json->get<double>() : 0;
     _require(_json->is_number() && number == std::trunc(number), "not an integer");
-    const bool isConvertible = number >= -0x1p63 && number < 0x1p64;
+    const bool isConvertible = number > -0x1p63 && number < 0x1p64;
     const bool isUnsigned = isFloat ? number >= 0 : _json->is_number_unsigned();
     const auto within = [&](auto value) {
         return std::cmp_greater_equal(value, least) && std::cmp_less_equal(value, most);

@@ -93,14 +93,15 @@ auto answer(const devices::Kind& kind, const std::string& what, const Ask& ask) 
     }
 }
 
-// An operation that a kind need not have.
+// An operation that a kind need not have; `done` is what cannot be done without it.
 template <class Operation>
 const Operation& require(const Operation& operation,
                          const devices::Kind& kind,
-                         const std::string& device) {
+                         const std::string& device,
+                         const std::string& done) {
     if (!operation) {
-        throw Problem(kExitUsage, device + ": devices of the kind \"" + kind.name +
-                                      "\" have no description to show or check");
+        throw Problem(kExitUsage,
+                      device + ": devices of the kind \"" + kind.name + "\" cannot be " + done);
     }
     return operation;
 }
@@ -140,14 +141,14 @@ devices::Device openDevice(const DeviceChoice& choice) {
 
 std::string showDevice(const std::string& device) {
     const devices::Kind kind = kindOf(device);
-    const auto& show = require(kind.show, kind, device);
+    const auto& show = require(kind.show, kind, device, "shown");
     const std::string what = argumentOf(device);
     return answer(kind, what, [&] { return show(what); });
 }
 
 std::vector<std::string> checkDevice(const std::string& device) {
     const devices::Kind kind = kindOf(device);
-    return require(kind.check, kind, device)(argumentOf(device));
+    return require(kind.check, kind, device, "checked")(argumentOf(device));
 }
 
 std::vector<devices::Entry> listDevices() {

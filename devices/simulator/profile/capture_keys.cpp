@@ -13,9 +13,7 @@ namespace simulator {
 
 namespace {
 
-constexpr std::string_view kPortTypePrefix = "ryl.port.";
-
-// The service's own keys under the names that a profile has for them.
+// The service's own metadata keys under the names that a profile has for them.
 struct ShortName {
     std::string_view name;
     std::string_view key;
@@ -25,36 +23,6 @@ constexpr ShortName kMetadataNames[] = {
     {"infraredLightSource", kRylCaptureStreamMetadata_InfraredLightSource},
     {"floodActiveTemperature", kRylCaptureStreamMetadata_FloodActiveTemperature},
 };
-
-constexpr ShortName kErrorCounterNames[] = {
-    {"i2c", kRylCaptureStreamPropertyValue_I2CErrorCount},
-    {"mipi", kRylCaptureStreamPropertyValue_MIPIErrorCount},
-    {"lpdp", "LPDPErrorCount"},
-    {"uart", "UARTErrorCount"},
-    {"sif", "SIFErrorCount"},
-    {"projector", "ProjectorErrorCount"},
-};
-
-constexpr ShortName kPropertyNames[] = {
-    {"portType", kRylCaptureStreamProperty_PortType},
-    {"lightSource", kRylCaptureStreamProperty_InfraredLightSourceConfiguration},
-    {"multipleOutputs", kRylCaptureStreamProperty_MultipleOutputSupportEnabled},
-    {"formatIndex", kRylCaptureStreamProperty_FormatIndex},
-    {"minimumFrameRate", kRylCaptureStreamProperty_MinimumFrameRate},
-    {"maximumFrameRate", kRylCaptureStreamProperty_MaximumFrameRate},
-    {"outputConfigurations", kRylCaptureStreamProperty_VideoOutputConfigurations},
-    {"outputsEnabled", kRylCaptureStreamProperty_VideoOutputsEnabled},
-    {"autoExposure", kRylCaptureStreamProperty_AEEnabled},
-    {"outputHandlers", kRylCaptureStreamProperty_VideoOutputHandlers},
-    {"errorCounters", kRylCaptureStreamProperty_ErrorCounters},
-};
-
-template <std::size_t N>
-const ShortName* find(const ShortName (&names)[N], std::string_view name) {
-    const auto* found = std::find_if(std::begin(names), std::end(names),
-                                     [&](const ShortName& row) { return row.name == name; });
-    return found == std::end(names) ? nullptr : found;
-}
 
 // A new stream starts as the healthy one of its port type, or as the front camera when there is none.
 StreamProfile newStream(std::string_view portType) {
@@ -101,8 +69,10 @@ bool isMetadataName(std::string_view name) {
 constexpr char kNewKey = '+';
 
 std::string_view metadataKey(const JsonNode& node, std::string_view name) {
-    if (const ShortName* found = find(kMetadataNames, name)) {
-        return found->key;
+    for (const ShortName& row : kMetadataNames) {
+        if (row.name == name) {
+            return row.key;
+        }
     }
     if (name.size() > 1 && name.front() == kNewKey) {
         return name.substr(1);
@@ -147,21 +117,6 @@ Json writeEntries(const platform::StringMap<T>& entries, const std::vector<std::
         json[metadataName(key)] = jsonOf(value);
     }
     return json;
-}
-
-// The key of a name that must be in the table.
-template <std::size_t N>
-std::string_view knownKey(const ShortName (&names)[N],
-                          const JsonNode& node,
-                          std::string_view name,
-                          std::vector<std::string> others = {}) {
-    if (const ShortName* found = find(names, name)) {
-        return found->key;
-    }
-    for (const ShortName& row : names) {
-        others.emplace_back(row.name);
-    }
-    input::failUnknownKey(node, name, others);
 }
 
 void readOverrideMetadata(const JsonNode& node, FrameOverride& change) {
@@ -211,30 +166,71 @@ constexpr JsonKey<FrameEvent> kFrameEventKeys[] = {
     memberKey<&FrameEvent::info>("info"),
 };
 
-void readErrorCounters(const JsonNode& node, StreamProfile& stream) {
-    platform::MutableDictionary counters;
-    if (const platform::Dictionary* known = stream.errorCounters.dictionary()) {
-        counters = known->entries();
-    }
-    node.forEachKey([&](const std::string& name, const JsonNode& value) {
-        const std::string_view key = knownKey(kErrorCounterNames, value, name);
-        platform::Value counter;
-        readInto(value, counter);
-        counters.remove(key);
-        if (counter.isPresent()) {
-            counters.set(key, std::move(counter));
-        }
-    });
-    stream.errorCounters = platform::Dictionary(std::move(counters));
+// An entry of the error counters that a client reads.
+template <const std::string_view& counter>
+constexpr JsonKey<StreamProfile> errorCounterKey(std::string_view name) {
+    return {name,
+            [](const JsonNode& node, StreamProfile& stream) {
+                platform::MutableDictionary counters;
+                if (const platform::Dictionary* known = stream.errorCounters.dictionary()) {
+                    counters = known->entries();
+                }
+                platform::Value value;
+                readInto(node, value);
+                if (value.isPresent()) {
+                    counters.set(counter, std::move(value));
+                } else {
+                    counters.remove(counter);
+                }
+                stream.errorCounters = platform::Dictionary(std::move(counters));
+            },
+            [](const StreamProfile& stream) { return jsonOf(stream.errorCounters[counter]); }};
 }
 
-Json writeErrorCounters(const StreamProfile& stream) {
-    Json json = Json::object();
-    for (const ShortName& row : kErrorCounterNames) {
-        json[std::string(row.name)] = jsonOf(stream.errorCounters[row.key]);
-    }
-    return json;
+constexpr std::string_view kLpdpErrors = "LPDPErrorCount";
+constexpr std::string_view kUartErrors = "UARTErrorCount";
+constexpr std::string_view kSifErrors = "SIFErrorCount";
+constexpr std::string_view kProjectorErrors = "ProjectorErrorCount";
+constexpr JsonKey<StreamProfile> kErrorCounterKeys[] = {
+    errorCounterKey<kRylCaptureStreamPropertyValue_I2CErrorCount>("i2c"),
+    errorCounterKey<kRylCaptureStreamPropertyValue_MIPIErrorCount>("mipi"),
+    errorCounterKey<kLpdpErrors>("lpdp"),
+    errorCounterKey<kUartErrors>("uart"),
+    errorCounterKey<kSifErrors>("sif"),
+    errorCounterKey<kProjectorErrors>("projector"),
+};
+
+// Whether reading or writing a property fails.
+template <const std::string_view& property>
+constexpr JsonKey<StreamProfile> propertyKey(std::string_view name) {
+    return {name,
+            [](const JsonNode& node, StreamProfile& stream) {
+                Fault fault;
+                readInto(node, fault);
+                stream.propertyFaults.set(property, std::move(fault));
+            },
+            [](const StreamProfile& stream) {
+                const Fault* fault = stream.propertyFaults.find(property);
+                return jsonOf(fault != nullptr ? *fault : Fault());
+            }};
 }
+
+constexpr JsonKey<StreamProfile> kStreamFaultKeys[] = {
+    memberKey<&StreamProfile::control>("control"),
+    memberKey<&StreamProfile::start>("start"),
+    memberKey<&StreamProfile::stop>("stop"),
+    propertyKey<kRylCaptureStreamProperty_PortType>("portType"),
+    propertyKey<kRylCaptureStreamProperty_InfraredLightSourceConfiguration>("lightSource"),
+    propertyKey<kRylCaptureStreamProperty_MultipleOutputSupportEnabled>("multipleOutputs"),
+    propertyKey<kRylCaptureStreamProperty_FormatIndex>("formatIndex"),
+    propertyKey<kRylCaptureStreamProperty_MinimumFrameRate>("minimumFrameRate"),
+    propertyKey<kRylCaptureStreamProperty_MaximumFrameRate>("maximumFrameRate"),
+    propertyKey<kRylCaptureStreamProperty_VideoOutputConfigurations>("outputConfigurations"),
+    propertyKey<kRylCaptureStreamProperty_VideoOutputsEnabled>("outputsEnabled"),
+    propertyKey<kRylCaptureStreamProperty_AEEnabled>("autoExposure"),
+    propertyKey<kRylCaptureStreamProperty_VideoOutputHandlers>("outputHandlers"),
+    propertyKey<kRylCaptureStreamProperty_ErrorCounters>("errorCounters"),
+};
 
 void readWarming(const JsonNode& node, StreamProfile& stream) {
     readEntries(node, stream.warming);
@@ -248,49 +244,12 @@ Json writeWarming(const StreamProfile& stream) {
     return writeEntries(stream.warming, names);
 }
 
-constexpr std::pair<std::string_view, Fault StreamProfile::*> kCalls[] = {
-    {"control", &StreamProfile::control},
-    {"start", &StreamProfile::start},
-    {"stop", &StreamProfile::stop},
-};
-
-// By the name of a call or of a property.
-void readStreamFaults(const JsonNode& node, StreamProfile& stream) {
-    node.forEachKey([&](const std::string& name, const JsonNode& value) {
-        std::vector<std::string> calls;
-        for (const auto& [call, fault] : kCalls) {
-            if (call == name) {
-                readInto(value, stream.*fault);
-                return;
-            }
-            calls.emplace_back(call);
-        }
-        const std::string_view key = knownKey(kPropertyNames, value, name, std::move(calls));
-        Fault fault;
-        readInto(value, fault);
-        stream.propertyFaults.set(key, std::move(fault));
-    });
-}
-
-Json writeStreamFaults(const StreamProfile& stream) {
-    Json json = Json::object();
-    for (const auto& [call, fault] : kCalls) {
-        json[std::string(call)] = jsonOf(stream.*fault);
-    }
-    for (const ShortName& row : kPropertyNames) {
-        const Fault* fault = stream.propertyFaults.find(row.key);
-        json[std::string(row.name)] = jsonOf(fault != nullptr ? *fault : Fault());
-    }
-    return json;
-}
-
-// A port type that the service has itself may be given by its short name, the stream's.
+// A port type that the service has itself may be given by the name of the healthy stream that has it.
 std::string portTypeOf(const JsonNode& node) {
-    std::string text = node.asText();
-    std::string own = std::string(kPortTypePrefix) + text;
+    const std::string text = node.asText();
     for (const StreamProfile& stream : healthyCapture().streams) {
-        if (stream.portType == own) {
-            return own;
+        if (stream.name == text) {
+            return stream.portType;
         }
     }
     return text;
@@ -300,8 +259,8 @@ constexpr JsonKey<StreamProfile> kStreamKeys[] = {
     {"portType",
      [](const JsonNode& node, StreamProfile& stream) { stream.portType = portTypeOf(node); },
      [](const StreamProfile& stream) { return jsonOf(stream.portType); }},
-    {"faults", readStreamFaults, writeStreamFaults},
-    {"errorCounters", readErrorCounters, writeErrorCounters},
+    groupKey<kStreamFaultKeys>("faults"),
+    groupKey<kErrorCounterKeys>("errorCounters"),
     {"metadata",
      [](const JsonNode& node, StreamProfile& stream) { readEntries(node, stream.metadata); },
      [](const StreamProfile& stream) { return writeEntries(stream.metadata, metadataNames()); }},

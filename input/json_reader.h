@@ -12,7 +12,9 @@
 #include <concepts>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <initializer_list>
+#include <iterator>
 #include <limits>
 #include <stdexcept>
 #include <string>
@@ -219,9 +221,8 @@ void readNamed(const JsonNode& node,
                                   [&](const T& each) { return each.*names.name == name; });
         if (entry == list.end()) {
             std::vector<std::string> known;
-            for (const T& each : list) {
-                known.push_back(each.*names.name);
-            }
+            std::transform(list.begin(), list.end(), std::back_inserter(known),
+                           std::mem_fn(names.name));
             for (const std::string_view key : names.required) {
                 if (!key.empty() && (!value.isObject() || !value.json().contains(key))) {
                     failUnknownName(value, name, known, std::string(names.kind),

@@ -246,7 +246,7 @@ Json writeWarming(const StreamProfile& stream) {
 
 // A port type that the service has itself may be given by the name of the healthy stream that has it.
 std::string portTypeOf(const JsonNode& node) {
-    const std::string text = node.asText();
+    std::string text = node.asText();
     for (const StreamProfile& stream : healthyCapture().streams) {
         if (stream.name == text) {
             return stream.portType;

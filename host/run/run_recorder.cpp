@@ -33,9 +33,20 @@ void RunRecorder::begin() {
     const platform::MutexLock lock(_mutex);
     _began = std::chrono::steady_clock::now();
     _frames.clear();
+    _lostFrames = {};
+}
+
+void RunRecorder::takeFrames(RunRecord& run) {
+    const platform::MutexLock lock(_mutex);
+    run.framesDelivered = _frameCount;
+    run.framesLost = _lostFrames.count();
+    run.imagesDelivered = _imageCount;
+    run.frames.insert(run.frames.end(), _frames.begin(), _frames.end());
+    _frames.clear();
 }
 
 void RunRecorder::end(RunRecord& run) {
+    takeFrames(run);
     const platform::MutexLock lock(_mutex);
     run.log = std::exchange(_log, {});
     if (_linesLeftOut > 0) {
@@ -43,7 +54,6 @@ void RunRecorder::end(RunRecord& run) {
                            std::to_string(_linesLeftOut) + " further lines left out."});
         _linesLeftOut = 0;
     }
-    run.frames = std::exchange(_frames, {});
     for (std::string& what : _misuses) {
         run.failures.push_back({.part = Part::Experiment,
                                 .step = kStepDevice,
@@ -68,20 +78,28 @@ void RunRecorder::write(const platform::LogLine& line) {
 
 void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
     ++_frameCount;
-    if (!_keepFrames) {
-        return;
-    }
+    const platform::Number* sensorNumber = frame.metadata[kSensorFrameNumber].number();
     FrameRecord record{.number = frame.number,
+                       .sensorNumber = sensorNumber != nullptr
+                                           ? std::optional(sensorNumber->as<std::int64_t>())
+                                           : std::nullopt,
                        .presentation = frame.time.seconds(),
                        .delivered = 0,
-                       .lightSource = numberOf(frame.metadata, kLightSource),
+                       .lightSource = std::nullopt,
                        .temperatures = {}};
-    std::transform(
-        std::begin(kTemperatures), std::end(kTemperatures), record.temperatures.begin(),
-        [&frame](const TemperatureEntry& entry) { return numberOf(frame.metadata, entry.key); });
+    if (_keepFrames) {
+        record.lightSource = numberOf(frame.metadata, kLightSource);
+        std::transform(std::begin(kTemperatures), std::end(kTemperatures),
+                       record.temperatures.begin(), [&frame](const TemperatureEntry& entry) {
+                           return numberOf(frame.metadata, entry.key);
+                       });
+    }
     const platform::MutexLock lock(_mutex);
-    record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
-    _frames.push_back(record);
+    _lostFrames.before(record.sensorNumber);
+    if (_keepFrames) {
+        record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
+        _frames.push_back(record);
+    }
 }
 
 void RunRecorder::imageDelivered(std::uint64_t /*number*/) {

@@ -17,6 +17,7 @@
 #include <vector>
 
 #include "devices/observed/observer.h"
+#include "host/record/frame_gap.h"
 #include "host/record/run_record.h"
 #include "platform/log.h"
 #include "platform/mutex.h"
@@ -30,6 +31,8 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     RunRecorder(std::function<void(const LogRecord&)> lineLogged, bool keepFrames);
 
     void begin();
+    // Moves the frames recorded so far into the run's record: what was delivered, lost and kept.
+    void takeFrames(RunRecord& run);
     // Moves what was recorded into the run's record.
     void end(RunRecord& run);
 
@@ -54,6 +57,7 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     std::chrono::steady_clock::time_point _began ZR_GUARDED_BY(_mutex);
     std::vector<LogRecord> _log ZR_GUARDED_BY(_mutex);
     std::uint64_t _linesLeftOut ZR_GUARDED_BY(_mutex) = 0;
+    LostFrames _lostFrames ZR_GUARDED_BY(_mutex);
     std::vector<FrameRecord> _frames ZR_GUARDED_BY(_mutex);
     std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
 };

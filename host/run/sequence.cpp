@@ -35,7 +35,10 @@ class Sequence {
         _tell([](RunListener& listener, const RunRecord& run) { listener.runStarted(run); });
 
         ZRExperimentResultRef result;
-        _part(Part::Experiment, _run.experimentSeconds, [&] { result = _experiment(); });
+        _part(Part::Experiment, _run.experimentSeconds, [&] {
+            result = _experiment();
+            recorder.takeFrames(_run);
+        });
         if (_plan.isDiagnostic() && result != nullptr) {
             _part(Part::Analysis, _run.analysisSeconds.emplace(), [&] { _analysis(*result); });
         }

@@ -44,11 +44,11 @@ void setCounts(pugi::xml_node node, const Counts& counts) {
 }
 
 // "DEVICE.NAME": a CI system takes the dots for levels and splits at blanks, so the device has neither.
-std::string classNameOf(const SessionRecord& session, const RunPlan& plan) {
+std::string classNameOf(const SessionRecord& session, std::string_view name) {
     std::string device = session.deviceName;
     std::replace_if(
         device.begin(), device.end(), [](unsigned char c) { return c == '.' || c <= ' '; }, '_');
-    return device + "." + plan.name;
+    return fmt::format("{}.{}", device, name);
 }
 
 // The names of the results that a run of this name has in the session.
@@ -84,7 +84,7 @@ class Suite {
         , _session(session)
         , _run(run)
         , _repeat(repeat)
-        , _className(classNameOf(session, run.plan)) {}
+        , _className(classNameOf(session, run.plan.name)) {}
 
     Counts write() {
         setAttribute(_node, "name", _run.plan.name);
@@ -223,16 +223,11 @@ class Suite {
         _property("errors", std::to_string(repeat.errors));
         _property("interrupted", std::to_string(repeat.interrupted));
         _property("run shown", std::to_string(_run.number));
-        const std::string runs = plural(repeat.runs, "run", "runs");
         // A failed step of the run that is shown has a case of its own.
         if (repeat.errors > 0 && _run.failures.empty()) {
-            const std::string message =
-                fmt::format("{} of {} did not complete", repeat.errors, runs);
+            const std::string message = fmt::format("{} of {} did not complete", repeat.errors,
+                                                    plural(repeat.runs, "run", "runs"));
             _error(_case("repetitions"), "repetitions in error", message, message);
-        }
-        if (repeat.interrupted > 0 && _run.verdict != Verdict::Interrupted) {
-            const std::string message = fmt::format("stopped in the last of {}", runs);
-            _error(_case("last repetition"), "interrupted", message, message);
         }
         for (const ResultStatistics& result : repeat.results) {
             _result(result.name,
@@ -255,15 +250,22 @@ class Suite {
     Counts _counts;
 };
 
-// The suite of a name that was planned and not started: one skipped case.
-void writeNotStarted(pugi::xml_node suite, const SessionRecord& session, const RunPlan& plan) {
-    setAttribute(suite, "name", plan.name);
+// A suite of one case without a run: `outcome` is "skipped" or "error".
+void writeSuite(pugi::xml_node suite,
+                std::string_view name,
+                const std::string& className,
+                const char* outcome,
+                std::string_view message) {
+    const bool isError = std::string_view(outcome) == "error";
+    setAttribute(suite, "name", name);
     pugi::xml_node node = suite.append_child("testcase");
     setAttribute(node, "name", "run");
-    setAttribute(node, "classname", classNameOf(session, plan));
-    setAttribute(node.append_child("skipped"), "message", "not started");
-    setCounts(suite, {.tests = 1});
-    suite.append_attribute("skipped").set_value(1);
+    setAttribute(node, "classname", className);
+    pugi::xml_node finding = node.append_child(outcome);
+    setAttribute(finding, "type", isError ? "interrupted" : "not started");
+    setAttribute(finding, "message", message);
+    setCounts(suite, {.tests = 1, .errors = isError ? 1U : 0U});
+    suite.append_attribute("skipped").set_value(isError ? 0 : 1);
 }
 
 }  // namespace
@@ -286,8 +288,18 @@ std::string junitReport(const SessionRecord& session) {
         total.errors += counts.errors;
     }
     for (const RunPlan& plan : session.notStarted()) {
-        writeNotStarted(root.append_child("testsuite"), session, plan);
+        writeSuite(root.append_child("testsuite"), plan.name, classNameOf(session, plan.name),
+                   "skipped", "not started");
         ++total.tests;
+    }
+    // When no run that is shown was interrupted, the session has the error.
+    const bool isShown =
+        !session.runs.empty() && session.runs.back().verdict == Verdict::Interrupted;
+    if (session.verdict == Verdict::Interrupted && !isShown) {
+        writeSuite(root.append_child("testsuite"), "session", classNameOf(session, "session"),
+                   "error", interruptionText(session));
+        ++total.tests;
+        ++total.errors;
     }
     setCounts(root, total);
     std::ostringstream out;

@@ -12,6 +12,7 @@
 #include "host/run/planner.h"
 #include "host/zrlab/command_line.h"
 #include "host/zrlab/device_choice.h"
+#include "host/zrlab/interrupt.h"
 #include "host/zrlab/session.h"
 #include "host/zrlab/terminal.h"
 #include "input/nearest.h"
@@ -155,7 +156,7 @@ int withPlugin(const CommandLine& commandLine) {
 }
 
 int run(int count, const char* const* arguments) {
-    Terminal::shared().endOnInterrupt();
+    interrupt::watch();
     CommandLine commandLine;
     if (const auto answer = commandLine.read(count, arguments)) {
         return print(*answer);

@@ -228,11 +228,14 @@ std::string framesText(const RunRecord& run) {
     return text;
 }
 
+bool isNumberedApart(const FrameRecord& frame) {
+    return frame.sensorNumber.has_value() &&
+           static_cast<std::uint64_t>(*frame.sensorNumber) != frame.number;
+}
+
 std::string frameText(const FrameRecord& frame) {
-    const bool isSame = !frame.sensorNumber.has_value() ||
-                        static_cast<std::uint64_t>(*frame.sensorNumber) == frame.number;
     return fmt::format("frame {}", frame.number) +
-           (isSame ? "" : fmt::format(" (the sensor's {})", *frame.sensorNumber));
+           (isNumberedApart(frame) ? fmt::format(" (the sensor's {})", *frame.sensorNumber) : "");
 }
 
 }  // namespace host

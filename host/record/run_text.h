@@ -80,6 +80,9 @@ std::string levelText(const LogRecord& line);
 // Empty when the run delivered no frames.
 std::string framesText(const RunRecord& run);
 
+// Whether the sensor's number of the frame is another than the received one.
+bool isNumberedApart(const FrameRecord& frame);
+
 // The frame by its received number, and by the sensor's where that differs: "frame 41 (the sensor's
 // 44)".
 std::string frameText(const FrameRecord& frame);

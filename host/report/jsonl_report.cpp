@@ -306,9 +306,8 @@ void JsonlReport::_writeFailures(const RunRecord& run) {
 }
 
 void JsonlReport::_writeFrames(const RunRecord& run) {
-    std::size_t series = 0;
     for (const FrameSeries& one : frameSeries()) {
-        const std::string id = fmt::format("{}-frames-{}", _step, series++);
+        const std::string id = fmt::format("series-{}", _series++);
         std::uint64_t count = 0;
         const FrameRecord* before = nullptr;
         for (const FrameRecord& frame : run.frames) {
@@ -330,7 +329,7 @@ void JsonlReport::_writeFrames(const RunRecord& run) {
                          {"timestamp", timeOf(frame, run).timestamp()},
                          {"measurementSeriesId", id},
                          {"metadata", {{"frame", frame.number}}}};
-            if (frame.sensorNumber.has_value()) {
+            if (isNumberedApart(frame)) {
                 element["metadata"]["sensorFrame"] = *frame.sensorNumber;
             }
             _writeStep("measurementSeriesElement", std::move(element));

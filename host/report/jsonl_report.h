@@ -69,6 +69,7 @@ class JsonlReport final : public RunListener {
     platform::Mutex _mutex;
     std::uint64_t _sequenceNumber ZR_GUARDED_BY(_mutex) = 0;
     std::uint64_t _steps ZR_GUARDED_BY(_mutex) = 0;
+    std::uint64_t _series ZR_GUARDED_BY(_mutex) = 0;
     // The step that is open; empty when none is. It stays open until the next one begins or the
     // verdict is known: a diagnosis can only be written in a step.
     std::string _step ZR_GUARDED_BY(_mutex);

@@ -46,6 +46,7 @@ class Page(html.parser.HTMLParser):
         super().__init__(convert_charrefs=True)
         self.problems = []
         self.open = []
+        self.named = None  # the id of the element that was opened last
         self.headings = []
         self.ids = []
         self.referenced = []
@@ -53,13 +54,21 @@ class Page(html.parser.HTMLParser):
         self.text = []
         self.tables = []
         self.figures = []
+        self.landmarks = []  # of each its element, and its name or the id of the element that names it
+        self.names = {}  # texts of the elements that have an id
 
     def handle_starttag(self, tag, attributes):
         attributes = dict(attributes)
         self.seen.add(tag)
         if tag not in VOID:
             self.open.append(tag)
-        self.ids += [attributes["id"]] if "id" in attributes else []
+        if "id" in attributes:
+            self.ids.append(attributes["id"])
+            self.names[attributes["id"]] = ""
+            self.named = attributes["id"]
+        name = attributes.get("aria-label") or attributes.get("aria-labelledby")
+        if tag == "nav" or tag == "section" and name or attributes.get("role") == "region":
+            self.landmarks.append((tag, name))
         for name in ("aria-labelledby", "aria-describedby"):
             self.referenced += attributes.get(name, "").split()
         for name in ("src", "href", "xlink:href", "action", "data"):
@@ -92,6 +101,7 @@ class Page(html.parser.HTMLParser):
     def handle_endtag(self, tag):
         if tag in VOID:
             return
+        self.named = None
         if not self.open or self.open.pop() != tag:
             self.problems.append(f"</{tag}> closes nothing")
 
@@ -101,6 +111,8 @@ class Page(html.parser.HTMLParser):
                 self.problems.append("the style sheet loads something")
         else:
             self.text.append(data)
+            if self.named:
+                self.names[self.named] += data
 
 
 def problems_of(written, read, must_contain):
@@ -127,6 +139,9 @@ def problems_of(written, read, must_contain):
               for table in drawn.tables if table != {"caption", "thead", "tbody"}]
     found += ["a figure lacks its caption, title or description"
               for figure in drawn.figures if figure != {"figcaption", "title", "desc"}]
+    landmarks = [(tag, drawn.names.get(name, name)) for tag, name in drawn.landmarks]
+    found += [f"two landmarks <{tag}> have the name {name}"
+              for tag, name in sorted(set(landmarks), key=str) if landmarks.count((tag, name)) > 1]
     twice = {one for one in drawn.ids if drawn.ids.count(one) > 1}
     found += [f"the id {one} is there twice" for one in sorted(twice)]
     found += [f"the id {one} is referred to and missing"

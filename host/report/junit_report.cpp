@@ -91,6 +91,7 @@ class Suite {
         setAttribute(_node, "timestamp", _run.started.timestamp());
         setSeconds(_node, _repeat != nullptr ? _repeat->seconds : _run.seconds);
         _properties = _node.append_child("properties");
+        _property("verdict", verdictText(_run.verdict));
         _property("version", _session.version);
         _property("commandLine", _session.commandLine);
         _property("device", _session.deviceName);

@@ -21,6 +21,8 @@ BROKEN = [
     ("<main ", '<main onclick="f()" ', "a script in onclick"),
     ("</main>", '<img src="http://example.org/x.png"></main>', "<img> refers to http://example.org"),
     ("</style>", "a { background: url(x.png) }</style>", "the style sheet loads something"),
+    ("</main>", '<nav aria-label="Sections of FaultDiagnostic"></nav></main>',
+     "two landmarks <nav> have the name Sections of FaultDiagnostic"),
     ('id="run-1-2"', 'id="run-1-1"', "the id run-1-1 is there twice"),
     ('id="results"', "", "the id results is referred to and missing"),
     ('role="img" aria-labelledby', "aria-labelledby", "no name for screen readers"),

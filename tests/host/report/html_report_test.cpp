@@ -48,7 +48,8 @@ TEST(HtmlReport, TellsTheVerdictFirstThenWhatFailed) {
                                                             "Parameters",
                                                             "80.5",
                                                             "Log",
-                                                            "late",
+                                                            "error, late",
+                                                            "time-out",
                                                             "zrlab run Diagnostic"});
     expectInOrder(
         host::htmlReport(test::brokenSession()),
@@ -56,16 +57,47 @@ TEST(HtmlReport, TellsTheVerdictFirstThenWhatFailed) {
          "PlugInErrorDomain 204", "caused by", "Start was refused", "Capture 7", "caused by",
          "Stream is busy", "Service -3", "No manager available?!", "property written too early"});
     expectInOrder(host::htmlReport(test::repeatedSession()),
-                  {"17 of 20 runs passed", "Number of Channel 17", "Repetitions",
-                   "20 runs: 17 passed, 2 failed, 1 in error", "show run 7", "Number of Channel 17",
-                   "2 of 19", "59 results alike in every run"});
+                  {"17 of 20 runs passed",
+                   "Number of Channel 17",
+                   "Repetitions",
+                   "20 runs: 17 passed, 2 failed, 1 in error",
+                   "show run 7",
+                   "Runs that did not pass",
+                   "7",
+                   "3.25 s",
+                   "Number of Channel 17",
+                   "3 events",
+                   "9",
+                   "1.50 s",
+                   "Failed to start streaming.",
+                   "PlugInErrorDomain 204",
+                   "10",
+                   "71 frames",
+                   "Number of Channel 17",
+                   ">0<",
+                   ">0.5<",
+                   ">3<",
+                   "2 of 19",
+                   "59 results alike in every run",
+                   "Results and limits"});
+    expectInOrder(
+        host::htmlReport(test::interruptedSession()),
+        {"INTERRUPTED", "FaultDiagnostic stopped after 37 of 90 frames", "PASS", "ImageExperiment",
+         "not started", "FaultDiagnostic (1 of 2)", "FaultDiagnostic (2 of 2)",
+         "stopped after 37 of 90 frames", "As measured by the experiment", "Channel 59"});
 }
 
 TEST(HtmlReport, DrawsWhatThereIsAndNothingElse) {
     const std::string page = host::htmlReport(test::streamedSession(90));
-    expectInOrder(page, {"device&#39;s clock", "greatest 66.67 ms (frame 41)", "arrival",
-                         "Temperatures", "Flood active", "Light source"});
-    // The flood temperature lacks the first ten of thirty frames: three stretches, one line.
+    expectInOrder(
+        page, {"device&#39;s clock", "arrival", "Temperatures", "Flood active", "Light source"});
+    expectInOrder(page, {"90 frames delivered, 1 lost.",
+                         "1 frame lost between the received frames 40 and 41 (the sensor&#39;s 40 "
+                         "and 42)",
+                         "greatest 66.67 ms at frame 41 (the sensor&#39;s 42)",
+                         "<line class=\"gap\"", "1 frame lost"});
+    // The flood temperature lacks the first ten of thirty frames, and is broken where a frame was lost, at
+    // the start of a stretch: three stretches, one line.
     const std::size_t flood =
         page.find("class=\"line hue-c\" d=\"", page.find("Temperatures</h4>"));
     const std::string path = page.substr(flood, page.find('>', flood) - flood);
@@ -102,6 +134,13 @@ TEST(HtmlReport, EscapesEveryText) {
 TEST(HtmlReport, StaysSmallHoweverLongTheRun) {
     EXPECT_LT(host::htmlReport(test::streamedSession(20000)).size(), 1'000'000U);
     EXPECT_LT(host::htmlReport(test::imagesSession(3000)).size(), 1'000'000U);
+    host::SessionRecord lossy = test::streamedSession(20000);
+    for (host::FrameRecord& frame : lossy.runs.front().frames) {
+        frame.sensorNumber = static_cast<std::int64_t>(2 * frame.number);
+    }
+    const std::string page = host::htmlReport(lossy);
+    EXPECT_LT(page.size(), 1'000'000U);
+    EXPECT_THAT(page, HasSubstr("and 19994 more gaps"));
 }
 
 TEST(HtmlPlot, DecimationKeepsPeaksOrderAndGaps) {

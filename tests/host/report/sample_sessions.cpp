@@ -201,8 +201,8 @@ SessionRecord repeatedSession() {
     for (const host::ResultRecord& result : run.results) {
         const bool outside = result.judgement == Judgement::Outside;
         repeat.results.push_back({result.name, result.unit, result.limit, 19, outside ? 2U : 0U,
-                                  std::min(result.value, outside ? 0.0 : result.value),
-                                  outside ? 0 : result.value, result.value});
+                                  outside ? 0 : result.value, outside ? 0.5 : result.value,
+                                  result.value});
     }
     SessionRecord session = sessionOf(std::move(run));
     session.repeats = {std::move(repeat)};
@@ -268,16 +268,11 @@ void play(const SessionRecord& session, host::RunListener& listener) {
 }
 
 std::vector<std::pair<std::string, SessionRecord>> sampleSessions() {
-    return {{"pass", streamedSession(90)},
-            {"fail", judgedSession()},
-            {"hostile", judgedSession(kHostile)},
-            {"error", brokenSession()},
-            {"images", imagesSession(25)},
-            {"long", streamedSession(20000)},
-            {"long-images", imagesSession(3000)},
-            {"repeated", repeatedSession()},
-            {"interrupted", interruptedSession()},
-            {"mixed", mixedSession()},
+    return {{"pass", streamedSession(90)},         {"fail", judgedSession()},
+            {"hostile", judgedSession(kHostile)},  {"error", brokenSession()},
+            {"images", imagesSession(25)},         {"long", streamedSession(20000)},
+            {"long-images", imagesSession(3000)},  {"repeated", repeatedSession()},
+            {"interrupted", interruptedSession()}, {"mixed", mixedSession()},
             {"empty-images", imagesSession(0)}};
 }
 

@@ -8,6 +8,7 @@ With --screenshot each page is drawn into the folder: NAME.png, NAME.dark.png an
 """
 
 import argparse
+import html
 import html.parser
 import pathlib
 import re
@@ -20,11 +21,25 @@ CHROMIUM = [
     "--no-first-run", "--disable-background-networking", "--disable-component-update",
     "--disable-sync", "--hide-scrollbars",
 ]
+NARROW = 400  # pixels: a telephone
 VIEWS = {
     "": ["--window-size=1280,3400"],
     ".dark": ["--window-size=1280,3400", "--blink-settings=preferredColorScheme=0"],
-    ".narrow": ["--window-size=400,3600"],
+    ".narrow": [f"--window-size={NARROW},3600"],
 }
+# Reads the page in a frame as wide as a telephone, and says what reaches beyond it.
+NARROW_READER = """<iframe src="{uri}" width="{width}" height="900" style="border: 0"></iframe>
+<pre id="found"></pre>
+<script>
+addEventListener("load", () => {{
+  const page = document.querySelector("iframe").contentDocument;
+  const cut = [...page.querySelectorAll("h1, h2, h3, p, dd, tbody th, tbody td, figure")]
+      .filter(one => one.getBoundingClientRect().right > {width} && one.offsetParent);
+  const wide = page.documentElement.scrollWidth > {width} ? ["the page"] : [];
+  document.querySelector("#found").textContent =
+      "read " + [...wide, ...cut.map(one => one.textContent.slice(0, 60))].join("|");
+}});
+</script>"""
 LANDMARKS = ("header", "main", "footer")
 VOID = {"meta", "br", "hr", "img", "input", "link"}
 
@@ -37,6 +52,19 @@ def browse(page, *flags):
     if done.returncode != 0:
         raise RuntimeError(f"chromium ended with {done.returncode}")
     return done.stdout.decode()
+
+
+def cut_off(page):
+    """What does not fit on a narrow screen."""
+    with tempfile.NamedTemporaryFile(suffix=".html", mode="w") as reader:
+        reader.write(NARROW_READER.format(uri=page.resolve().as_uri(), width=NARROW))
+        reader.flush()
+        read = browse(pathlib.Path(reader.name), "--allow-file-access-from-files",
+                      "--window-size=800,1000", "--virtual-time-budget=10000", "--dump-dom")
+    found = re.search(r'<pre id="found">read (.*?)</pre>', read, re.DOTALL)
+    if found is None:
+        return ["nothing: the page could not be read"]
+    return [html.unescape(one) for one in found[1].split("|") if one]
 
 
 class Page(html.parser.HTMLParser):
@@ -163,6 +191,9 @@ def main():
         read = browse(page, "--dump-dom")
         for problem in problems_of(page.read_text(), read, given.must_contain):
             print(f"{page}: {problem}")
+            failed = True
+        for what in cut_off(page):
+            print(f"{page}: cut off at a width of {NARROW}: {what}")
             failed = True
         if given.screenshot:
             given.screenshot.mkdir(parents=True, exist_ok=True)

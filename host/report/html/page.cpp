@@ -143,7 +143,7 @@ std::string htmlReport(const SessionRecord& session) {
 <a class="skip" href="#results">Skip to the results</a>
 )",
         verdictText(session.verdict), htmlText(subjectOf(session)), kReportStyle);
-    const bool manyRuns = session.runs.size() > 1 || !session.repeats.empty();
+    const bool manyRuns = namesIn(session) > 1 || !session.repeats.empty();
     page += headHtml(session) + contentsHtml(session) + "<main class=\"sheet\" id=\"results\">\n";
     for (std::size_t at = 0; at < session.runs.size(); ++at) {
         page += runHtml(session.runs[at], session.repeatOf(at),

@@ -306,6 +306,13 @@ void JsonlReport::_writeFailures(const RunRecord& run) {
 }
 
 void JsonlReport::_writeFrames(const RunRecord& run) {
+    if (run.framesDelivered > 0) {
+        Json content{{"delivered", run.framesDelivered}};
+        if (run.framesLost.has_value()) {
+            content["lost"] = *run.framesLost;
+        }
+        _writeStep("extension", {{"name", "frames"}, {"content", std::move(content)}});
+    }
     for (const FrameSeries& one : frameSeries()) {
         const std::string id = fmt::format("series-{}", _series++);
         std::uint64_t count = 0;

@@ -7,7 +7,8 @@
 //   measurement    in an experiment's step what it measured; in an analysis's step each judged result
 //                  with its limit as validators, which carry the limit's name
 //   measurementSeries…  in the experiment's step one series per quantity of the frames that the page draws
-//   extension      one for each element of a list in the experiment's auxiliary data ("images")
+//   extension      one for each element of a list in the experiment's auxiliary data ("images"); one with
+//                  the counts of frames delivered and lost ("frames")
 //   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
 //                  causes as message; "interrupted" in the run when the program was asked to stop
 //   diagnosis      one per diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error",

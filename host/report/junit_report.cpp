@@ -106,6 +106,12 @@ class Suite {
         if (_run.framesDelivered > 0) {
             _property("frames", framesText(_run));
         }
+        // The results repeat the measurements.
+        for (const MeasurementRecord& one : _run.measurements) {
+            if (_run.results.empty()) {
+                _property("measurement." + one.name, valueText(one.value, one.unit));
+            }
+        }
         for (const FailureRecord& failure : _run.failures) {
             _failedStep(failure);
         }
@@ -197,11 +203,6 @@ class Suite {
                     fmt::format("{}, {}", valueText(result.value, result.unit),
                                 limitLine(result.limit, result.unit)),
                     result.judgement == Judgement::Outside);
-        }
-        if (!_run.plan.isDiagnostic()) {
-            for (const MeasurementRecord& one : _run.measurements) {
-                _property("measurement." + one.name, valueText(one.value, one.unit));
-            }
         }
     }
 

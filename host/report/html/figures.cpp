@@ -255,6 +255,23 @@ std::string frameFigures(const RunRecord& run, const std::string& id) {
     return FrameFigures(run.frames, id).html();
 }
 
+std::string repetitionFigure(const RepeatRecord& repeat, const std::string& id) {
+    std::vector<Point> points;
+    for (const RepetitionOutcome& one : repeat.outcomes) {
+        points.push_back({static_cast<double>(points.size() + 1), one.seconds});
+    }
+    const auto run = [](double x) { return fmt::format("run {:g}", x); };
+    const std::string caption = spreadText(points, "s", run);
+    return linePlot({.figure = {.id = id + "-seconds",
+                                .title = "Seconds of each run",
+                                .caption = caption,
+                                .xLabel = "run",
+                                .yLabel = "seconds"},
+                     .series = {{"seconds", "hue-a", std::move(points)}},
+                     .bands = {},
+                     .gaps = {}});
+}
+
 std::string imageFigures(const RunRecord& run, const std::string& id) {
     const platform::List* images = imagesOf(run.auxiliaryData);
     if (images == nullptr || images->empty()) {

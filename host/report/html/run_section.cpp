@@ -216,6 +216,10 @@ std::string resultsHtml(const RunRecord& run) {
     return table.html();
 }
 
+std::string figuresHtml(const std::string& figures) {
+    return figures.empty() ? "" : "<div class=\"figures\">\n" + figures + "</div>\n";
+}
+
 // What is known of a repetition that did not pass; the JSON report has all of it.
 std::string findingsHtml(const Repetition& one) {
     std::vector<std::string> findings;
@@ -321,7 +325,9 @@ std::string statisticsHtml(const RepeatRecord& repeat) {
                   alike.html());
 }
 
-std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
+std::string repetitionsHtml(const RepeatRecord* repeat,
+                            const RunRecord& run,
+                            const std::string& id) {
     if (repeat == nullptr) {
         return "";
     }
@@ -329,7 +335,8 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
                "<p>{}: {}. The other sections show run {}, {}.</p>\n",
                plural(repeat->runs, "run", "runs"), countsText(*repeat), run.number,
                run.verdict == Verdict::Passed ? "the last" : "the first that did not pass") +
-           outcomesHtml(*repeat) + notPassedHtml(*repeat) + statisticsHtml(*repeat);
+           outcomesHtml(*repeat) + notPassedHtml(*repeat) + statisticsHtml(*repeat) +
+           figuresHtml(repetitionFigure(*repeat, id));
 }
 
 std::string measurementsHtml(const RunRecord& run) {
@@ -430,14 +437,11 @@ std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const Sect
     const std::string outcome =
         fmt::format("<p class=\"outcome\">{} {} <span class=\"faint\">in {:.2f} s</span></p>\n",
                     verdictHtml(run.verdict), htmlText(headline(run)), run.seconds);
-    const auto figures = [](const std::string& content) {
-        return content.empty() ? "" : "<div class=\"figures\">\n" + content + "</div>\n";
-    };
     Sections sections(place.id);
     sections.add("What failed", failuresHtml(run));
-    sections.add("Repetitions", repetitionsHtml(repeat, run));
-    sections.add("Frames", framesHtml(run) + figures(frameFigures(run, place.id)));
-    sections.add("Images", figures(imageFigures(run, place.id)));
+    sections.add("Repetitions", repetitionsHtml(repeat, run, place.id));
+    sections.add("Frames", framesHtml(run) + figuresHtml(frameFigures(run, place.id)));
+    sections.add("Images", figuresHtml(imageFigures(run, place.id)));
     sections.add("Results and limits", resultsHtml(run));
     sections.add("Measurements", measurementsHtml(run));
     sections.add("Parameters", parametersHtml(run));

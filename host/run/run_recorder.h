@@ -22,7 +22,7 @@
 #include "host/record/frame_gap.h"
 #include "host/record/run_record.h"
 #include "platform/log.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/run_tag.h"
 
 namespace host {

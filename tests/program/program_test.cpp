@@ -231,6 +231,11 @@ TEST(Program, WritesAnyFormToStandardOutput) {
             zrlab({"run", "VantorMeterixDiagnostic", "--format", form, "--output", "-"}).output,
             StartsWith(start));
     }
+    const test::Outcome mixed =
+        zrlab({"run", "VantorMeterixDiagnostic", "KirraImageExperiment", "--set", "images=1",
+               "--set", "timeout=60", "--device", "counter-stuck", "--speed", "max"});
+    EXPECT_EQ(mixed.status, 1) << mixed.errors;
+    EXPECT_THAT(mixed.output, HasSubstr("\nFAIL  2 runs: 1 passed, 1 failed, 0 in error\n"));
     EXPECT_THAT(zrlab({"run", "VantorMeterixDiagnostic", "VantorMeterixDiagnostic"}).output,
                 HasSubstr("\n\nPASS  2 runs: 2 passed, 0 failed, 0 in error\n"));
 }

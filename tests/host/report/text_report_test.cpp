@@ -34,13 +34,20 @@ TEST(TextReport, SaysWhatWasInterruptedAndWhatWasNotStarted) {
         textOf(test::interruptedSession()),
         AllOf(
             HasSubstr("\n  ! 90 frames delivered, 1 lost\n"),
-            HasSubstr("\nINTERRUPTED  FaultDiagnostic  stopped after 37 of 90 frames  3.25 s\n"),
+            HasSubstr("\n\nINTERRUPTED  FaultDiagnostic  stopped after 37 of 90 frames  3.25 s\n"),
             HasSubstr("\n    60 measurements of the experiment, --verbose lists them\n"),
             HasSubstr("\nINTERRUPTED  2 runs: 1 passed, 0 failed, 0 in error, 1 interrupted, 1 not "
                       "started\n      not started: ImageExperiment\n")));
     host::SessionRecord early = test::interruptedSession();
     early.runs.clear();
     EXPECT_THAT(textOf(early), StartsWith("INTERRUPTED  0 runs: "));
+}
+
+TEST(TextReport, ARepeatedNameBeginsWithItsFigures) {
+    EXPECT_THAT(textOf(test::repeatedSession()),
+                AllOf(StartsWith("FaultDiagnostic  20 runs: 17 passed, 2 failed, 1 in error\n"
+                                 "       7  FAIL  Number of Channel 17 is 3 events\n"),
+                      HasSubstr("\n\nrun 7:\nFAIL")));
 }
 
 TEST(TextReport, BeginsWithAHeadingWhenItIsKept) {

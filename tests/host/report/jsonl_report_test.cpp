@@ -156,8 +156,10 @@ TEST(JsonlReport, ClosesWhatWasInterruptedAndSkipsWhatWasNotStarted) {
     const std::string given = "2-FaultDiagnostic-1-experiment";
     const std::string skipped = "3-ImageExperiment-not-started";
     expectArtifacts(
-        {artifacts.end() - 7, artifacts.end()},
-        {step(given, R"("diagnosis": {"verdict": "FaultDiagnostic-interrupted", "type": "UNKNOWN",
+        {artifacts.end() - 8, artifacts.end()},
+        {step(given, R"("measurementSeriesEnd": {"measurementSeriesId": "series-19",
+                                                 "totalCount": 20})"),
+         step(given, R"("diagnosis": {"verdict": "FaultDiagnostic-interrupted", "type": "UNKNOWN",
              "message": "stopped after 37 of 90 frames", "hardwareInfoId": "device"})"),
          step(given, R"("testStepEnd": {"status": "ERROR"})"),
          step(skipped, R"("testStepStart": {"name": "Experiment"})"),

@@ -1,7 +1,5 @@
 #include "host/record/frame_gap.h"
 
-#include <cstddef>
-
 #include <fmt/format.h>
 
 #include "host/record/run_text.h"

@@ -122,7 +122,7 @@ struct RunRecord {
     std::vector<MeasurementRecord> measurements;  // of the experiment, by name
     platform::Dictionary auxiliaryData;           // of the experiment
     std::vector<ResultRecord> results;            // of the analysis, in its order
-    std::vector<FailureRecord> failures;          // empty unless the verdict is Error
+    std::vector<FailureRecord> failures;          // empty when the verdict is about results
     std::vector<LogRecord> log;                   // lines of the run, in the order they came
     std::uint64_t framesDelivered = 0;
     // By the sensor's numbers; absent when no frame had one.

@@ -43,8 +43,12 @@ void RunRecorder::takeFrames(RunRecord& run) {
     run.framesDelivered = _frameCount;
     run.framesLost = _lostFrames.count();
     run.imagesDelivered = _imageCount;
-    run.frames.insert(run.frames.end(), _frames.begin(), _frames.end());
-    _frames.clear();
+    std::vector<FrameRecord> frames = std::exchange(_frames, {});
+    if (run.frames.empty()) {
+        run.frames = std::move(frames);  // there may be very many
+    } else {
+        run.frames.insert(run.frames.end(), frames.begin(), frames.end());
+    }
 }
 
 void RunRecorder::end(RunRecord& run) {

@@ -69,6 +69,15 @@ std::string formLines() {
 
 }  // namespace
 
+const CLI::App* subcommandOf(const CLI::App& app, const std::string& name) {
+    for (const CLI::App* command : app.get_subcommands({})) {
+        if (command->get_name() == name) {
+            return command;
+        }
+    }
+    return nullptr;
+}
+
 CommandLine::CommandLine()
     : plugin(defaultPlugin())
     , _app(
@@ -85,7 +94,11 @@ CommandLine::CommandLine()
     CLI::App* describe =
         _app.add_subcommand("describe", "Show what a name is for and which parameters it takes");
     describe->add_option("NAME", subjects, "An experiment, an analysis or a diagnostic")
-        ->required();
+        ->required()
+        ->type_name("");
+    describe->add_flag("--limits", limits,
+                       "Also show results and limits: runs the name once, on a simulated device\n"
+                       "without faults, every required parameter 1 and the time-out 30 s");
     _addPlugin(*describe);
 
     _addRun();
@@ -97,7 +110,7 @@ CommandLine::CommandLine()
     _addDeviceModule(*devices);
 
     CLI::App* help = _app.add_subcommand("help", "Show the help of a command");
-    help->add_option("COMMAND", helpTopic, "The command to explain");
+    help->add_option("COMMAND", helpTopic, "The command to explain")->type_name("");
 
     CLI::App* completion =
         _app.add_subcommand("completion", "Print a completion script for a shell");
@@ -133,17 +146,20 @@ void CommandLine::_addDeviceModule(CLI::App& command) {
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
-        ->required();
-    run.add_option("--set", session.settings,
-                   "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
-                   "analysis:PARAM=VALUE\ngives it to one part only")
+        ->required()
+        ->type_name("");
+    run.add_option(
+           "--set", session.settings,
+           "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
+           "analysis:PARAM=VALUE\ngives it to one part only. VALUE is a number, true or false;\n"
+           "a count that is not whole or a negative time-out gets a warning")
         ->type_name("PARAM=VALUE")
         ->take_all()
         ->allow_extra_args(false);
     run.add_option("--device", session.device.device,
                    "The device: one that \"zrlab devices\" lists, a file of a simulated one, or\n"
                    "KIND:WHAT for another kind")
-        ->type_name("NAME|FILE|KIND:WHAT")
+        ->type_name("DEVICE|FILE|KIND:WHAT")
         ->capture_default_str();
     _addDeviceModule(run);
     run.add_option("--speed", session.device.speed,
@@ -207,7 +223,7 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
                        input::didYouMean(argument, {"--help", "--version"});
             }
         } else if (given == nullptr) {
-            given = find(argument);
+            given = subcommandOf(_app, argument);
             if (given == nullptr) {
                 return "unknown command \"" + argument + "\"" +
                        input::didYouMean(argument, commandNames());
@@ -258,15 +274,6 @@ std::vector<std::string> CommandLine::commandNames() const {
         names.push_back(command->get_name());
     }
     return names;
-}
-
-const CLI::App* CommandLine::find(const std::string& command) const {
-    for (const CLI::App* known : _app.get_subcommands({})) {
-        if (known->get_name() == command) {
-            return known;
-        }
-    }
-    return nullptr;
 }
 
 std::string CommandLine::command() const {

@@ -53,7 +53,10 @@ std::string unknownText(const ZRLab& lab, const std::string& name) {
         }
         return text;
     }
-    const std::string meant = input::didYouMean(name, runnableNames(lab));
+    std::string meant = input::didYouMean(name, runnableNames(lab));
+    if (meant.empty() && name.find('=') != std::string::npos) {
+        meant = "; did you mean --set " + name + "?";
+    }
     return "unknown diagnostic or experiment \"" + name + "\"" +
            (meant.empty() ? "; zrlab list shows them" : meant);
 }
@@ -224,9 +227,10 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
                                           ? "no " + std::string(partText(*settings[i].part))
                                           : "none of the parts";
             std::erase(declared, settings[i].name);  // of another part
-            throw Problem(kExitUsage, whose + " to be run declares a parameter \"" +
-                                          settings[i].name + "\"" +
-                                          input::didYouMean(settings[i].name, declared));
+            const std::string meant = input::didYouMean(settings[i].name, declared);
+            throw Problem(kExitUsage,
+                          whose + " to be run declares a parameter \"" + settings[i].name + "\"" +
+                              (meant.empty() ? "; zrlab describe NAME shows them" : meant));
         }
     }
     if (!missing.empty()) {

@@ -28,7 +28,6 @@ class CommandLine {
 
     const CLI::App& app() const { return _app; }
 
-    std::vector<std::string> commandNames() const;
 
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe
@@ -47,6 +46,9 @@ class CommandLine {
 
     CLI::App _app;
 };
+
+// The commands directly below `app`.
+std::vector<std::string> commandNames(const CLI::App& app);
 
 // The command of that name directly below `app`, or null.
 const CLI::App* subcommandOf(const CLI::App& app, const std::string& name);

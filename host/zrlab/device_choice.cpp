@@ -58,8 +58,10 @@ devices::Kind kindOf(const DeviceChoice& choice) {
         }
         names.push_back(kind.name);
     }
+    const std::string meant = input::didYouMean(name, names);
     throw Problem(kExitUsage, "--device " + choice.device + ": unknown kind of device \"" + name +
-                                  "\"" + input::didYouMean(name, names));
+                                  "\"" +
+                                  (meant.empty() ? "; zrlab devices --kinds lists them" : meant));
 }
 
 // Where to look for a device's name, unless one is near enough to have been suggested or a file was meant.

@@ -77,8 +77,9 @@ int help(const std::string& topic) {
     }
     const CLI::App* command = subcommandOf(commandLine.app(), topic);
     if (command == nullptr) {
+        const std::string meant = input::didYouMean(topic, commandNames(commandLine.app()));
         throw Problem(kExitUsage, "help: unknown command \"" + topic + "\"" +
-                                      input::didYouMean(topic, commandLine.commandNames()));
+                                      (meant.empty() ? "; zrlab --help lists them" : meant));
     }
     return print(command->help(commandLine.app().get_name()));
 }

@@ -12,7 +12,6 @@
 
 namespace {
 
-using platform::Dictionary;
 using platform::ErrorRef;
 using platform::List;
 using platform::Number;
@@ -90,22 +89,6 @@ TEST_F(ImageExperiment, CapturesTheImagesInOrder) {
             EXPECT_EQ(captured[at]["frameID"], Value(static_cast<std::uint32_t>(at - 1)));
         }
         EXPECT_EQ(journal(), joined(kOpening, kClosing));
-    }
-}
-
-TEST_F(ImageExperiment, KeepsTheKindsOfTheNumbers) {
-    sensor().startTemperature = 36.5;
-    sensor().firstTimestamp = 4294967295;
-    const std::optional<List> images = run(1, kGenerous);
-    ASSERT_TRUE(images.has_value() && images->size() == 1);
-    const Dictionary& image = *(*images)[0].dictionary();
-    EXPECT_EQ(image.size(), 5U);
-    EXPECT_EQ(image.number("frameID"), Number(std::uint32_t{1}));
-    EXPECT_EQ(image.number("timestampInMilliseconds"), Number(std::uint32_t{4294967295}));
-    EXPECT_EQ(image.number("tmonDataInC"), Number(36.5F));
-    for (const std::string_view key : {"dScanI", "dScanQ"}) {
-        ASSERT_NE(image[key].list(), nullptr);
-        EXPECT_EQ(image[key].list()->size(), 48U);
     }
 }
 

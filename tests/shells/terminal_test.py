@@ -89,4 +89,14 @@ class Shells(unittest.TestCase):
                               COMPLETED[:1])
 
 
+class StatusLine(unittest.TestCase):
+    def test_is_cut_to_the_width(self):
+        program = pexpect.spawn(
+            str(ZRLAB), ["run", "VantorFaultDiagnostic", "--set", "frameCount=900", "--set", "timeout=60",
+                         "--speed", "max"],
+            env=dict(os.environ, TERM="xterm"), dimensions=(24, 30), encoding="utf-8", timeout=60)
+        lines = [line for line in program.read().split("\r\x1b[K") if " of 900" in line]
+        self.assertEqual({len(line) for line in lines}, {29}, lines)
+
+
 unittest.main(argv=sys.argv[:1])

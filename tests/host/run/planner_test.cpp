@@ -146,7 +146,10 @@ TEST(RunPlan, RefusesBeforeAnythingRuns) {
          "none of the parts to be run declares a parameter \"coumt\"; did you mean count?"},
         {{"PlanExperiment"},
          {"count=1", "analysis:count=1"},
-         "no analysis to be run declares a parameter \"count\""},
+         "no analysis to be run declares a parameter \"count\"; zrlab describe NAME shows them"},
+        {{"PlanExperiment", "count=1"},
+         {},
+         "unknown diagnostic or experiment \"count=1\"; did you mean --set count=1?"},
         {{"HalfDiagnostic"}, {"count=1"}, "HalfDiagnostic: its analysis Nowhere is not registered"},
     };
     for (const Row& row : rows) {

@@ -71,7 +71,7 @@ void Log::_emit(LogLevel level, std::string_view message) const {
         const MutexLock lock(shared.mutex);
         sink = shared.sink;
     }
-    sink->write({_subsystem, _category, level, message});
+    sink->write({_subsystem, _category, level, message, currentRunTag()});
 }
 
 }  // namespace platform

@@ -12,6 +12,8 @@
 #include <string_view>
 #include <utility>
 
+#include "platform/run_tag.h"
+
 namespace platform {
 
 enum class LogLevel { Debug, Default, Error };
@@ -21,6 +23,7 @@ struct LogLine {
     std::string_view category;
     LogLevel level;
     std::string_view message;
+    RunTag run;  // the run that the writing thread works for; zero for none
 };
 
 // Receives lines, on the thread that logs them; several threads may be in write() at once. The log

@@ -14,6 +14,7 @@
 
 #include "platform/deadline.h"
 #include "platform/mutex.h"
+#include "platform/run_tag.h"
 
 namespace platform {
 
@@ -41,6 +42,12 @@ void nameThisThread(const std::string& name) {
     pthread_setname_np(pthread_self(), name.c_str() + name.size() - kept);
 }
 
+// An item with what it takes over from the thread that queued it.
+struct Queued {
+    WorkQueue::Item item;
+    RunTag run;
+};
+
 }  // namespace
 
 // What the owner, the holds, the thread and the delayed items share. It outlives the owner, and its
@@ -53,7 +60,7 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     const std::string label;
     const Priority priority;
 
-    void push(Item item) {
+    void push(Queued item) {
         // The thread waits only while there are no items. Once the lock is given up, the item may have
         // run and dropped every other reference.
         std::shared_ptr<State> waiting;
@@ -70,13 +77,13 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
         }
     }
 
-    // Queues a delayed item whose time has come, or nothing when the item is empty. False when no
+    // Queues a delayed item whose time has come, or nothing when there is none. False when no
     // thread can be started for what is queued: it stays queued until a later call succeeds.
-    bool pushDue(Item item) {
+    bool pushDue(std::optional<Queued> item) {
         {
             const MutexLock lock(_mutex);
-            if (item != nullptr) {
-                _items.push_back(std::move(item));
+            if (item.has_value()) {
+                _items.push_back(std::move(*item));
             }
             try {
                 if (!_items.empty()) {
@@ -116,14 +123,16 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
         // Refused without the privilege to raise priorities; the thread then keeps the one it has.
         setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()),
                     priority == Priority::Background ? kBackgroundNice : kUserInteractiveNice);
-        while (std::optional<Item> item = _next()) {
-            (*item)();
+        while (std::optional<Queued> next = _next()) {
+            const RunTagScope scope(next->run);
+            next->item();
+            next.reset();  // what the item captured may log when it goes
         }
     }
 
     // The next item, as soon as there is one; nothing when the thread is to end. That is decided
     // under the lock that saw the queue empty: an item that comes later starts another thread.
-    std::optional<Item> _next() {
+    std::optional<Queued> _next() {
         const MutexLock lock(_mutex);
         while (_items.empty()) {
             if (_holds == 0) {
@@ -132,14 +141,14 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
             }
             _changed.wait(_mutex);
         }
-        std::optional<Item> item(std::move(_items.front()));
+        std::optional<Queued> item(std::move(_items.front()));
         _items.pop_front();
         return item;
     }
 
     Mutex _mutex;
     Condition _changed;
-    std::deque<Item> _items ZR_GUARDED_BY(_mutex);
+    std::deque<Queued> _items ZR_GUARDED_BY(_mutex);
     bool _hasThread ZR_GUARDED_BY(_mutex) = false;
     std::size_t _holds ZR_GUARDED_BY(_mutex) = 0;
 };
@@ -153,7 +162,7 @@ class WorkQueue::Timer {
         return timer;
     }
 
-    void add(Clock::time_point due, std::shared_ptr<State> queue, Item item) {
+    void add(Clock::time_point due, std::shared_ptr<State> queue, Queued item) {
         const MutexLock lock(_mutex);
         _needThread();
         const auto added = _pending.emplace(due, Delayed{std::move(queue), std::move(item)});
@@ -176,7 +185,8 @@ class WorkQueue::Timer {
   private:
     struct Delayed {
         std::shared_ptr<State> queue;
-        Item item;  // empty: was queued already, but no thread could be started for it
+        std::optional<Queued>
+            item;  // nothing: was queued already, but no thread could be started for it
     };
     using Pending = std::multimap<Clock::time_point, Delayed>;  // of equal times, the first added
 
@@ -191,7 +201,7 @@ class WorkQueue::Timer {
         nameThisThread("delayed items");
         while (Pending::node_type due = _next()) {
             Delayed& delayed = due.mapped();
-            if (!delayed.queue->pushDue(std::exchange(delayed.item, nullptr))) {
+            if (!delayed.queue->pushDue(std::exchange(delayed.item, std::nullopt))) {
                 due.key() = Clock::now() + kRetryDelay;
                 const MutexLock lock(_mutex);
                 _pending.insert(std::move(due));
@@ -250,12 +260,12 @@ WorkQueue::Priority WorkQueue::priority() const {
 }
 
 void WorkQueue::async(Item item) {
-    _state->push(std::move(item));
+    _state->push({std::move(item), currentRunTag()});
 }
 
 void WorkQueue::after(std::chrono::duration<double> delay, Item item) {
     if (delay.count() > 0) {
-        Timer::shared().add(deadlineAfter(delay), _state, std::move(item));
+        Timer::shared().add(deadlineAfter(delay), _state, {std::move(item), currentRunTag()});
     } else {
         async(std::move(item));
     }

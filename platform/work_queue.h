@@ -38,7 +38,8 @@ class WorkQueue {
     enum class Priority { UserInteractive, Background };
 
     // Must not be empty. An item owns what it captured; that is released right after it ran, on the
-    // queue's thread. An exception that leaves an item ends the process.
+    // queue's thread. An exception that leaves an item ends the process. The item has the run tag of
+    // the thread that queued it (platform/run_tag.h).
     using Item = std::function<void()>;
 
     // Holds a queue as long as it lives: the queue's thread and that of the delayed items exist, so

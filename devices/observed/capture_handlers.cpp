@@ -4,6 +4,7 @@
 #include <chrono>
 #include <utility>
 
+#include "platform/run_tag.h"
 #include "platform/welkin/capture.h"
 
 namespace observed {
@@ -20,10 +21,10 @@ constexpr std::string_view kEventHandler = kRylCaptureStreamVideoOutputHandlerKe
 
 thread_local int handlersOnThisThread = 0;
 
-// A call of a client's handler.
+// A call of a client's handler, for the run that wrote it.
 class HandlerCall {
   public:
-    HandlerCall(StreamWatch& stream, std::string_view handler) {
+    HandlerCall(StreamWatch& stream, std::string_view handler, platform::RunTag run) : _run(run) {
         ++handlersOnThisThread;
         if (stream.device->invalidated && !stream.lateHandlerReported.exchange(true)) {
             stream.reporter().misused(
@@ -33,13 +34,16 @@ class HandlerCall {
     ~HandlerCall() { --handlersOnThisThread; }
     HandlerCall(const HandlerCall&) = delete;
     HandlerCall& operator=(const HandlerCall&) = delete;
+
+  private:
+    const platform::RunTagScope _run;
 };
 
 // A call of a frame handler, of which a stream makes one at a time.
 class FrameHandlerCall {
   public:
-    explicit FrameHandlerCall(StreamWatch& stream)
-        : _call(stream, "a frame handler"), _stream(stream) {
+    FrameHandlerCall(StreamWatch& stream, platform::RunTag run)
+        : _call(stream, "a frame handler", run), _stream(stream) {
         if (stream.frameHandlersInside++ > 0 && !stream.overlapReported.exchange(true)) {
             stream.reporter().misused("two frame handlers of one stream were called at once");
         }
@@ -61,7 +65,7 @@ class WatchedFrameHandler {
         : _client(std::move(client)), _stream(std::move(stream)) {}
 
     void operator()(const platform::ImageBufferRef& buffer, platform::MediaTime time) const {
-        const FrameHandlerCall call(*_stream);
+        const FrameHandlerCall call(*_stream, _run);
         DeliveredFrame frame{
             .number = ++_stream->frames, .time = time, .delivered = Clock::now(), .metadata = {}};
         const auto& handler = *_client.object<WLRylFrameHandler>();
@@ -83,6 +87,7 @@ class WatchedFrameHandler {
   private:
     Value _client;
     std::shared_ptr<StreamWatch> _stream;
+    platform::RunTag _run = platform::currentRunTag();
 };
 
 class WatchedEventHandler {
@@ -91,7 +96,7 @@ class WatchedEventHandler {
         : _client(std::move(client)), _stream(std::move(stream)) {}
 
     void operator()(std::int32_t code, platform::MediaTime time, std::int64_t info) const {
-        const HandlerCall call(*_stream, "an event handler");
+        const HandlerCall call(*_stream, "an event handler", _run);
         const DeliveredEvent event{
             .code = code, .time = time, .info = info, .delivered = Clock::now()};
         (*_client.object<WLRylEventHandler>())(code, time, info);
@@ -103,6 +108,7 @@ class WatchedEventHandler {
   private:
     Value _client;
     std::shared_ptr<StreamWatch> _stream;
+    platform::RunTag _run = platform::currentRunTag();
 };
 
 // The handlers property with another frame and event handler of the output, if it has those.

@@ -8,6 +8,7 @@
 #include "devices/observed/wrapper_table.h"
 #include "platform/mutex.h"
 #include "platform/run_loop.h"
+#include "platform/run_tag.h"
 
 namespace observed {
 
@@ -133,6 +134,7 @@ class WatchedCallback {
     void operator()(std::int64_t reportID,
                     std::span<const std::byte> data,
                     const platform::ErrorRef& error) const {
+        const platform::RunTagScope scope(_run);
         _watch->checkCallbackThread();
         if (error != nullptr) {
             _watch->reporter().report(
@@ -148,6 +150,7 @@ class WatchedCallback {
   private:
     std::shared_ptr<const WLHIDInputReportCallback> _client;  // copies of this are one callback
     std::shared_ptr<HidWatch> _watch;
+    platform::RunTag _run = platform::currentRunTag();
 };
 
 class ObservedHidDevice final : public WLIOHIDDeviceInterface {

@@ -6,8 +6,9 @@
 
 namespace host {
 
-// Called on the session's thread, except logged(), which any thread may call, several at once, also after
-// sessionEnded(): a time-out may outlive its run. A record holds everything known so far.
+// Called by one thread at a time: the session's, or the run's own between runStarted() and runEnded(). Except
+// logged(), which any thread may call, several at once, also after sessionEnded(): a time-out may outlive its
+// run, and its line is then marked as late. A record holds everything known so far.
 class RunListener {
   public:
     virtual ~RunListener() = default;

@@ -19,6 +19,7 @@
 #include "host/record/run_plan.h"
 #include "platform/error.h"
 #include "platform/log.h"
+#include "platform/run_tag.h"
 #include "platform/value.h"
 #include "platform/wall_clock.h"
 
@@ -107,6 +108,7 @@ struct FrameRecord {
 struct RunRecord {
     RunPlan plan;              // what was run
     std::uint64_t number = 1;  // which repetition, from 1
+    platform::RunTag tag = 0;  // under which its log lines come
     platform::Date started = platform::Date::now();
     double seconds = 0;
 

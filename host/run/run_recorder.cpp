@@ -27,16 +27,20 @@ std::optional<double> numberOf(const platform::Dictionary& metadata, std::string
 RunRecorder::RunRecorder(std::function<void(const LogRecord&)> lineLogged, bool keepFrames)
     : _lineLogged(std::move(lineLogged)), _keepFrames(keepFrames) {}
 
-void RunRecorder::begin() {
+platform::RunTag RunRecorder::begin() {
     _frameCount = 0;
     _imageCount = 0;
     const platform::MutexLock lock(_mutex);
     _began = std::chrono::steady_clock::now();
     _frames.clear();
+    _current = ++_last;
+    return _last;
 }
 
 void RunRecorder::end(RunRecord& run) {
     const platform::MutexLock lock(_mutex);
+    _current = 0;
+    run.tag = _last;
     run.log = std::exchange(_log, {});
     if (_linesLeftOut > 0) {
         run.log.push_back({platform::Date::now(), platform::LogLevel::Default,
@@ -53,11 +57,21 @@ void RunRecorder::end(RunRecord& run) {
     _misuses.clear();
 }
 
+std::vector<std::pair<platform::RunTag, LogRecord>> RunRecorder::takeLateLines() {
+    const platform::MutexLock lock(_mutex);
+    return std::exchange(_lateLines, {});
+}
+
 void RunRecorder::write(const platform::LogLine& line) {
-    const LogRecord record{platform::Date::now(), line.level, std::string(line.message)};
+    LogRecord record{platform::Date::now(), line.level, std::string(line.message)};
     {
         const platform::MutexLock lock(_mutex);
-        if (_log.size() < kMostLines) {
+        record.late = !_isWanted(line.run);
+        if (record.late) {
+            if (_lateLines.size() < kMostLines) {
+                _lateLines.emplace_back(line.run, record);
+            }
+        } else if (_log.size() < kMostLines) {
             _log.push_back(record);
         } else {
             ++_linesLeftOut;
@@ -67,6 +81,9 @@ void RunRecorder::write(const platform::LogLine& line) {
 }
 
 void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
+    if (!_isWanted(platform::currentRunTag())) {
+        return;
+    }
     ++_frameCount;
     if (!_keepFrames) {
         return;
@@ -85,10 +102,15 @@ void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
 }
 
 void RunRecorder::imageDelivered(std::uint64_t /*number*/) {
-    ++_imageCount;
+    _imageCount += _isWanted(platform::currentRunTag()) ? 1 : 0;
 }
 
 void RunRecorder::misused(std::string_view what) {
+    const platform::RunTag run = platform::currentRunTag();
+    if (!_isWanted(run)) {
+        write({"zrlab", "device", platform::LogLevel::Error, what, run});
+        return;
+    }
     const platform::MutexLock lock(_mutex);
     if (_misuses.size() < kMostMisuses) {
         _misuses.emplace_back(what);

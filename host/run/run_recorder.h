@@ -2,10 +2,11 @@
 // device's interfaces.
 //
 // It is the process's log sink and the device's observer for the whole session; begin() and end()
-// enclose a run. What happens between two runs (such as the log line of a time-out that outlived its run)
-// belongs to the next one.
+// enclose a run. Each run has a tag, which the work that it starts carries: what comes under the tag of
+// a run that has ended does not enter the next one. A log line is then late, a broken rule becomes a late
+// line, anything else is dropped. What comes under no tag between two runs belongs to the next one.
 //
-// Threads  begin() and end() on the session's thread; everything else on any.
+// Threads  Any. One run at a time.
 #ifndef ZR_HOST_RUN_RUN_RECORDER_H
 #define ZR_HOST_RUN_RUN_RECORDER_H
 
@@ -14,12 +15,14 @@
 #include <cstdint>
 #include <functional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "devices/observed/observer.h"
 #include "host/record/run_record.h"
 #include "platform/log.h"
 #include "platform/mutex.h"
+#include "platform/run_tag.h"
 
 namespace host {
 
@@ -29,9 +32,13 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     // report will draw the frames.
     RunRecorder(std::function<void(const LogRecord&)> lineLogged, bool keepFrames);
 
-    void begin();
-    // Moves what was recorded into the run's record.
+    // Begins a run. The thread that drives it sets the tag.
+    platform::RunTag begin();
+    // Ends the run: moves what was recorded into its record.
     void end(RunRecord& run);
+
+    // The late lines since the last call, each with the tag of its run.
+    std::vector<std::pair<platform::RunTag, LogRecord>> takeLateLines();
 
     // Frames and images delivered since begin().
     std::uint64_t frames() const { return _frameCount.load(); }
@@ -46,14 +53,21 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     const std::function<void(const LogRecord&)> _lineLogged;
     const bool _keepFrames;
 
+    // Of the run in progress; zero between runs.
+    std::atomic<platform::RunTag> _current{0};
     // Counted by the device's threads, read by the one that shows progress.
     std::atomic<std::uint64_t> _frameCount{0};
     std::atomic<std::uint64_t> _imageCount{0};
 
+    // Whether work under this tag belongs to the run in progress, or to the next one.
+    bool _isWanted(platform::RunTag tag) const { return tag == 0 || tag == _current.load(); }
+
     platform::Mutex _mutex;
+    platform::RunTag _last ZR_GUARDED_BY(_mutex) = 0;
     std::chrono::steady_clock::time_point _began ZR_GUARDED_BY(_mutex);
     std::vector<LogRecord> _log ZR_GUARDED_BY(_mutex);
     std::uint64_t _linesLeftOut ZR_GUARDED_BY(_mutex) = 0;
+    std::vector<std::pair<platform::RunTag, LogRecord>> _lateLines ZR_GUARDED_BY(_mutex);
     std::vector<FrameRecord> _frames ZR_GUARDED_BY(_mutex);
     std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
 };

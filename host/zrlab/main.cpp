@@ -14,6 +14,7 @@
 #include "host/zrlab/completion.h"
 #include "host/zrlab/describe.h"
 #include "host/zrlab/device_choice.h"
+#include "host/zrlab/interrupt.h"
 #include "host/zrlab/session.h"
 #include "host/zrlab/terminal.h"
 #include "input/nearest.h"
@@ -104,7 +105,7 @@ int withPlugin(const CommandLine& commandLine) {
 }
 
 int run(int count, const char* const* arguments) {
-    Terminal::shared().endOnInterrupt();
+    interrupt::watch();
     CommandLine commandLine;
     registerBuiltInKinds();
     if (count > 1 && arguments[1] == kComplete) {

@@ -2,7 +2,7 @@
 #ifndef ZR_HOST_ZRLAB_OUTPUT_FILE_H
 #define ZR_HOST_ZRLAB_OUTPUT_FILE_H
 
-#include <cstdio>
+#include <memory>
 #include <string>
 #include <string_view>
 
@@ -18,24 +18,25 @@ void requireWritable(const std::string& path);
 // it was before.
 void writeFile(const std::string& path, std::string_view content);
 
-// What a long run has written so far, kept in a nameless file instead of in memory. It vanishes with
-// the object, also when the program is interrupted. One thread at a time.
-class Spool {
+// A report's file while the report is written. One thread at a time.
+class OutputFile {
   public:
-    Spool();
-    ~Spool();
-    Spool(const Spool&) = delete;
-    Spool& operator=(const Spool&) = delete;
+    virtual ~OutputFile() = default;
 
-    void append(std::string_view text);
+    // Adds text to the end. A failure is kept for finish().
+    virtual void append(std::string_view text) = 0;
 
-    // As writeFile(), with all that was appended.
-    void writeTo(const std::string& path);
-
-  private:
-    std::FILE* _file;  // owned
-    bool _lost = false;
+    // Puts the file in its place, as writeFile() does. Throws a Problem (kExitError) when that or an
+    // append() failed. Without it the target stays as it was.
+    virtual void finish() = 0;
 };
+
+// Opens the file at `path` for a report. With `asItComes` each append() is written at once to the file
+// "PATH.part" beside it, one write each, and finish() renames that: it is kept when the program is killed
+// and when something cannot be written. Otherwise, and where there is no file but a device or a pipe, all is
+// written by finish(). Throws a Problem (kExitUsage) when no file can be made there, or another program
+// is writing it.
+std::unique_ptr<OutputFile> openOutputFile(const std::string& path, bool asItComes);
 
 }  // namespace host
 

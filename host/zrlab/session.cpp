@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <stop_token>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -17,9 +18,10 @@
 #include "host/run/repeat_statistics.h"
 #include "host/run/run_recorder.h"
 #include "host/run/sequence.h"
+#include "host/zrlab/interrupt.h"
 #include "host/zrlab/progress.h"
 #include "host/zrlab/session_reports.h"
-#include "platform/run_loop.h"
+#include "host/zrlab/terminal.h"
 
 namespace host {
 
@@ -44,10 +46,13 @@ const LogChoice& logChoiceOf(std::string_view name) {
     throw Problem(kExitUsage, "--log " + std::string(name) + ": unknown level");
 }
 
+// A late line belongs to a run that is over, and shows only among the details.
 void showLine(const LogRecord& line) {
     static constexpr std::string_view kLevels[] = {"debug", "log", "error"};
-    Terminal::shared().line(std::string(kLevels[static_cast<std::size_t>(line.level)]) + ": " +
-                            line.message);
+    Terminal::shared().line(
+        (line.late ? "debug: late: "
+                   : std::string(kLevels[static_cast<std::size_t>(line.level)]) + ": ") +
+        line.message);
 }
 
 std::vector<RunPlan> plansOf(const SessionOptions& options) {
@@ -71,8 +76,8 @@ class Session {
         _record.deviceFacts = std::move(device.facts);
 
         const LogChoice& log = logChoiceOf(options.logLevel);
-        const auto lineLogged = [reports = _reports, isShown = log.isShown](const LogRecord& line) {
-            if (isShown) {
+        const auto lineLogged = [reports = _reports, log](const LogRecord& line) {
+            if (log.isShown && (!line.late || log.minimum == platform::LogLevel::Debug)) {
                 showLine(line);
             }
             for (const auto& report : reports->listeners()) {
@@ -82,7 +87,6 @@ class Session {
         _recorder = std::make_shared<RunRecorder>(lineLogged, _reports->showFrames());
         platform::setLogSink(_recorder, log.minimum);
         platform::installServices(observed::observe(std::move(device.services), _recorder));
-        platform::RunLoop::forThisThread();  // some experiments need one
     }
 
     int run() {
@@ -90,17 +94,26 @@ class Session {
             Terminal::shared().complain(warning);
         }
         const auto start = std::chrono::steady_clock::now();
+        _stop = interrupt::deferFirst();
         _tell([this](RunListener& report) { report.sessionStarted(_record); });
         for (const RunPlan& plan : _record.planned) {
-            if (!_reports->outputFailed()) {
-                _repeat(plan);
-                _tell([this](RunListener& report) { report.nameEnded(_record); });
+            if (!_mayStart()) {
+                break;
             }
+            _repeat(plan);
+            _tell([this](RunListener& report) { report.nameEnded(_record); });
         }
+        _keepLateLines(nullptr);
         _record.seconds =
             std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
         _tell([this](RunListener& report) { report.sessionEnded(_record); });
         const bool isWritten = _reports->finish();
+        if (_record.verdict == Verdict::Interrupted) {
+            if (_isGivenUp) {
+                Terminal::shared().leave(interrupt::exitStatus());
+            }
+            return interrupt::exitStatus();
+        }
         static constexpr int kStatuses[] = {kExitPassed, kExitFailed, kExitError};
         return isWritten ? kStatuses[static_cast<std::size_t>(_record.verdict)] : kExitError;
     }
@@ -113,6 +126,15 @@ class Session {
         }
     }
 
+    // Whether another run may start. No more do once standard output cannot be written, or after a request
+    // to stop, which leaves the session unfinished.
+    bool _mayStart() {
+        if (_stop.stop_requested()) {
+            _record.verdict = Verdict::Interrupted;
+        }
+        return !_stop.stop_requested() && !_reports->outputFailed();
+    }
+
     void _repeat(const RunPlan& plan) {
         const bool repeats = _options.repeat > 0 || _options.untilFail;
         // Until a run fails, unless a number is given too.
@@ -120,19 +142,18 @@ class Session {
             _options.repeat > 0 ? _options.repeat : (_options.untilFail ? UINT64_MAX : 1);
         RepeatStatistics statistics(plan.name);
         std::optional<RunRecord> kept;
-        for (std::uint64_t number = 1; number <= most; ++number) {
+        for (std::uint64_t number = 1; number <= most && (number == 1 || _mayStart()); ++number) {
             RunRecord run = _runWithProgress(plan, number, repeats ? most : 0);
             _record.verdict = worse(_record.verdict, run.verdict);
             if (repeats) {
                 statistics.add(run);
                 _showLine(run);
             }
-            // Also stop once standard output can no longer be written.
-            const bool stops =
-                _reports->outputFailed() || (_options.untilFail && run.verdict != Verdict::Passed);
+            const bool stops = _options.untilFail && run.verdict != Verdict::Passed;
             if (!kept.has_value() || kept->verdict == Verdict::Passed) {
                 kept = std::move(run);
             }
+            _keepLateLines(&*kept);
             if (stops) {
                 break;
             }
@@ -150,7 +171,27 @@ class Session {
                      (most != UINT64_MAX ? " of " + std::to_string(most) : "") + "  ";
         }
         const Progress progress(plan, *_recorder, std::move(prefix));
-        return runOnce(ZRLab::defaultLab(), plan, number, *_recorder, _reports->listeners());
+        SequenceOutcome outcome =
+            runOnce({ZRLab::defaultLab(), *_recorder, _reports->listeners(), _stop}, plan, number);
+        _isGivenUp = outcome.isGivenUp;
+        return std::move(outcome.run);
+    }
+
+    // Puts late log lines into the record of their run, if that is one that is kept: `kept` or one of the
+    // session's.
+    void _keepLateLines(RunRecord* kept) {
+        for (auto& [tag, line] : _recorder->takeLateLines()) {
+            if (kept != nullptr && kept->tag == tag) {
+                kept->log.push_back(std::move(line));
+                continue;
+            }
+            for (RunRecord& run : _record.runs) {
+                if (run.tag == tag) {
+                    run.log.push_back(std::move(line));
+                    break;
+                }
+            }
+        }
     }
 
     // One line per repetition, when a person watches.
@@ -165,6 +206,8 @@ class Session {
     SessionRecord _record;
     std::shared_ptr<SessionReports> _reports;
     std::shared_ptr<RunRecorder> _recorder;
+    std::stop_token _stop;
+    bool _isGivenUp = false;  // the last run
 };
 
 }  // namespace

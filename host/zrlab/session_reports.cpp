@@ -49,7 +49,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
         requireWritable(file.path);
     }
     for (File& file : _files) {
-        file.content = std::make_shared<Spool>();
+        file.content = openOutputFile(file.path, file.form->streams);
         _listeners.push_back(file.form->open(
             [content = file.content](std::string_view text) { content->append(text); },
             {.colour = false, .verbose = options.verbose}));
@@ -87,7 +87,7 @@ bool SessionReports::finish() {
     bool isWhole = true;
     for (const File& file : _files) {
         try {
-            file.content->writeTo(file.path);
+            file.content->finish();
         } catch (const Problem& problem) {
             Terminal::shared().complain(problem.what());
             isWhole = false;

@@ -20,7 +20,7 @@ namespace host {
 //
 // Owner    The session, and the log's sink: a time-out that outlives its run may log when the session is
 //          gone.
-// Threads  The session's, but for the listeners' logged().
+// Threads  The session's; what the listeners are called on, run_listener.h says.
 class SessionReports {
   public:
     // Checks that every report can be written. Throws a Problem: kExitUsage about a file's ending, a file
@@ -48,7 +48,7 @@ class SessionReports {
     struct File {
         std::string path;
         const ReportForm* form;
-        std::shared_ptr<Spool> content;
+        std::shared_ptr<OutputFile> content;
     };
 
     void _addFile(const std::string& path, const ReportForm& form);

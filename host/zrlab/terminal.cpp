@@ -2,13 +2,14 @@
 
 #include <cerrno>
 #include <chrono>
-#include <csignal>
 #include <cstdlib>
 #include <thread>
 
-#include <pthread.h>
+#include <poll.h>
 #include <sys/ioctl.h>
 #include <unistd.h>
+
+#include <climits>
 
 #include "host/record/clean_text.h"
 
@@ -17,6 +18,10 @@ namespace host {
 namespace {
 
 constexpr std::string_view kClearLine = "\r\x1b[K";
+
+// How long a reader may take nothing once the program is to stop, and how often that is looked at.
+constexpr std::chrono::seconds kLongestStall{1};
+constexpr int kStallCheck = 100;  // milliseconds
 
 std::string_view environment(const char* name) {
     const char* value = std::getenv(name);
@@ -69,31 +74,6 @@ Terminal& Terminal::shared() {
     return terminal;
 }
 
-void Terminal::endOnInterrupt() {
-    sigset_t signals;
-    sigemptyset(&signals);
-    sigaddset(&signals, SIGINT);
-    sigaddset(&signals, SIGTERM);
-    pthread_sigmask(SIG_BLOCK, &signals, nullptr);  // inherited by every thread started from now on
-    std::signal(SIGPIPE, SIG_IGN);                  // the write fails instead
-    std::signal(SIGXFSZ, SIG_IGN);                  // the same beyond a limit of file sizes
-    std::thread([this, signals] {
-        int signal = 0;
-        sigwait(&signals, &signal);
-        // A writer whose reader has stalled must not hold the program up for long.
-        const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(500);
-        bool held = _mutex.tryLock();
-        while (!held && std::chrono::steady_clock::now() < deadline) {
-            std::this_thread::sleep_for(std::chrono::milliseconds(5));
-            held = _mutex.tryLock();
-        }
-        if (_errorIsTerminal) {
-            writeWhole(STDERR_FILENO, kClearLine);
-        }
-        _exit(128 + signal);
-    }).detach();
-}
-
 bool Terminal::outputTakesColour(Colour asked) {
     return takesColour(STDOUT_FILENO, asked);
 }
@@ -109,10 +89,31 @@ void Terminal::complain(std::string_view problem) {
 bool Terminal::output(std::string_view text) {
     const platform::MutexLock lock(_mutex);
     if (_statusShown) {
-        writeWhole(STDERR_FILENO, kClearLine);
+        _write(STDERR_FILENO, kClearLine);
         _statusShown = false;
     }
-    return writeWhole(STDOUT_FILENO, text);
+    return _write(STDOUT_FILENO, text);
+}
+
+bool Terminal::_write(int file, std::string_view text) {
+    while (!text.empty()) {
+        const auto since = std::chrono::steady_clock::now();
+        pollfd writable{file, POLLOUT, 0};
+        while (!_isStalled && poll(&writable, 1, kStallCheck) == 0) {
+            _isStalled = _isHurried && std::chrono::steady_clock::now() - since > kLongestStall;
+        }
+        if (_isStalled) {
+            errno = ETIMEDOUT;
+            return false;
+        }
+        // A pipe that can be written to takes this much without waiting.
+        const std::string_view piece = text.substr(0, PIPE_BUF);
+        if (!writeWhole(file, piece)) {
+            return false;
+        }
+        text.remove_prefix(piece.size());
+    }
+    return true;
 }
 
 void Terminal::line(std::string_view text) {
@@ -121,7 +122,20 @@ void Terminal::line(std::string_view text) {
     whole += text;
     whole += '\n';
     _statusShown = false;
-    writeWhole(STDERR_FILENO, whole);
+    _write(STDERR_FILENO, whole);
+}
+
+void Terminal::leave(int status) {
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(500);
+    bool held = _mutex.tryLock();
+    while (!held && std::chrono::steady_clock::now() < deadline) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+        held = _mutex.tryLock();
+    }
+    if (_errorIsTerminal && !_isStalled) {
+        writeWhole(STDERR_FILENO, kClearLine);
+    }
+    _exit(status);
 }
 
 void Terminal::status(std::string_view text) {
@@ -131,7 +145,7 @@ void Terminal::status(std::string_view text) {
     }
     // One column stays free, because some terminals begin another line.
     const std::string_view shown = cutTo(text, widthOf(STDERR_FILENO) - 1);
-    writeWhole(STDERR_FILENO, std::string(kClearLine) + std::string(shown));
+    _write(STDERR_FILENO, std::string(kClearLine) + std::string(shown));
     _statusShown = !text.empty();
 }
 

@@ -6,6 +6,7 @@
 #ifndef ZR_HOST_ZRLAB_TERMINAL_H
 #define ZR_HOST_ZRLAB_TERMINAL_H
 
+#include <atomic>
 #include <string>
 #include <string_view>
 
@@ -26,10 +27,6 @@ class Terminal {
     // Reports a problem in one line on standard error: "zrlab: …".
     void complain(std::string_view problem);
 
-    // From now on an interrupt (Ctrl-C) or a request to terminate ends the program at once with exit
-    // status 128 plus the signal's number: 130 for an interrupt. Call before any thread is started.
-    void endOnInterrupt();
-
     // Whether standard output takes colour: as asked; Automatic means on a terminal, unless the
     // environment has a NO_COLOR that is not empty or TERM is "dumb".
     static bool outputTakesColour(Colour asked);
@@ -47,13 +44,25 @@ class Terminal {
     // width; only on a terminal. Empty text takes it away.
     void status(std::string_view text);
 
+    // The program is to stop: from now on a write fails when its reader takes nothing for a second, and so
+    // does every later one. Any thread, without waiting.
+    void hurry() { _isHurried = true; }
+
+    // Ends the program with this exit status, from any thread, without destroying anything. Waits a moment
+    // for a write in progress; one whose reader has stalled is cut.
+    [[noreturn]] void leave(int status);
+
     // Held while something is written that an interrupt must not cut.
     platform::Mutex& mutex() ZR_RETURNS_MUTEX(_mutex) { return _mutex; }
 
   private:
     Terminal();
 
+    bool _write(int file, std::string_view text) ZR_REQUIRES(_mutex);
+
     const bool _errorIsTerminal;
+    std::atomic<bool> _isHurried{false};
+    std::atomic<bool> _isStalled{false};
     platform::Mutex _mutex;
     bool _statusShown ZR_GUARDED_BY(_mutex) = false;
 };

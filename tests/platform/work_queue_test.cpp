@@ -16,6 +16,7 @@
 #include <gmock/gmock.h>
 
 #include "platform/log.h"
+#include "platform/run_tag.h"
 #include "tests/platform/threads.h"
 
 namespace {
@@ -60,6 +61,33 @@ TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
         ASSERT_EQ(items.size(), static_cast<std::size_t>(kItemsEach));
         EXPECT_TRUE(std::is_sorted(items.begin(), items.end()));
     }
+}
+
+// Work belongs to the run that asked for it, through items, delayed items and what they release.
+TEST(WorkQueue, GivesAnItemTheRunTagOfItsPoster) {
+    std::vector<platform::RunTag> tags;  // touched by items only
+    std::latch done(1);
+    const auto note = [&tags] { tags.push_back(platform::currentRunTag()); };
+    const auto atEnd = [&note](int*) { note(); };
+    {
+        WorkQueue queue("tags", Priority::UserInteractive);
+        const platform::RunTagScope seventh(7);
+        {
+            const platform::RunTagScope eighth(8);
+            queue.async([&note, last = std::shared_ptr<int>(nullptr, atEnd)] { note(); });
+        }
+        queue.async([&] {
+            note();
+            const platform::RunTagScope ninth(9);
+            queue.after(1ms, [&] {
+                note();
+                done.count_down();
+            });
+        });
+        done.wait();
+    }
+    EXPECT_THAT(tags, testing::ElementsAre(8, 8, 7, 9));
+    EXPECT_EQ(platform::currentRunTag(), 0U);
 }
 
 TEST(WorkQueue, ReleasesWhatAnItemCapturedBeforeTheNextStarts) {

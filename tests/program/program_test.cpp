@@ -281,6 +281,11 @@ TEST(Program, WritesAnyFormToStandardOutput) {
             zrlab({"run", "VantorMeterixDiagnostic", "--format", form, "--output", "-"}).output,
             StartsWith(start));
     }
+    const test::Outcome mixed =
+        zrlab({"run", "VantorMeterixDiagnostic", "KirraImageExperiment", "--set", "images=1",
+               "--set", "timeout=60", "--device", "counter-stuck", "--speed", "max"});
+    EXPECT_EQ(mixed.status, 1) << mixed.errors;
+    EXPECT_THAT(mixed.output, HasSubstr("\nFAIL  2 runs: 1 passed, 1 failed, 0 in error\n"));
     EXPECT_THAT(zrlab({"run", "VantorMeterixDiagnostic", "VantorMeterixDiagnostic"}).output,
                 HasSubstr("\n\nPASS  2 runs: 2 passed, 0 failed, 0 in error\n"));
 }
@@ -318,19 +323,92 @@ TEST(Program, EndsAtOnceWithATimeOutPending) {
     EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::minutes(5));
 }
 
-TEST(Program, AnInterruptEndsItAtOnceAndLeavesNoFile) {
-    const fs::path folder = newFolder();
-    for (const auto& [number, status] : {std::pair(SIGINT, 130), std::pair(SIGTERM, 143)}) {
-        test::Program program({ZR_PROGRAM, "run", "VantorFaultDiagnostic", "--set",
-                               "frameCount=1000000", "--set", "timeout=3600", "--log", "debug",
-                               "--output", (folder / "report").string()});
+// A run that would take hours, with a report in every form. Its standard error shows each frame.
+std::vector<std::string> endlessRun(const fs::path& folder) {
+    std::vector<std::string> arguments = {ZR_PROGRAM,
+                                          "run",
+                                          "VantorFaultDiagnostic",
+                                          "VantorMeterixDiagnostic",
+                                          "--set",
+                                          "frameCount=1000000",
+                                          "--set",
+                                          "timeout=3600",
+                                          "--log",
+                                          "debug"};
+    for (const char* ending : {"html", "json", "jsonl", "xml", "txt"}) {
+        arguments = with(arguments, {"--report", (folder / "report.").string() + ending});
+    }
+    return arguments;
+}
+
+std::string contentOf(const fs::path& file) {
+    std::ifstream in(file);
+    return {std::istreambuf_iterator<char>(in), {}};
+}
+
+TEST(Program, AnInterruptLosesNothing) {
+    for (const auto& [number, status] :
+         {std::pair(SIGINT, 130), std::pair(SIGTERM, 143), std::pair(SIGHUP, 129)}) {
+        const fs::path folder = newFolder();
+        test::Program program(endlessRun(folder));
         ASSERT_TRUE(program.waitForError("Received frame 2."));
         program.signal(number);
         const test::Outcome outcome = program.finish();
         EXPECT_EQ(outcome.status, status);
-        EXPECT_THAT(outcome.output, IsEmpty());
-        EXPECT_TRUE(fs::is_empty(folder));
+        EXPECT_THAT(outcome.output, AllOf(StartsWith("INTERRUPTED  VantorFaultDiagnostic"),
+                                          Not(HasSubstr("PASS"))));
+        const Json session = Json::parse(contentOf(folder / "report.json"));
+        EXPECT_EQ(session["verdict"], "INTERRUPTED");
+        ASSERT_EQ(session["runs"].size(), 1U);
+        EXPECT_EQ(session["runs"][0]["verdict"], "INTERRUPTED");
+        EXPECT_GE(session["runs"][0]["frames"].size(), 2U);
+        EXPECT_THAT(session["runs"][0]["failures"], IsEmpty());
+        for (const char* ending : {"html", "xml", "txt"}) {
+            EXPECT_THAT(contentOf((folder / "report.").string() + ending),
+                        HasSubstr("INTERRUPTED"));
+        }
+        EXPECT_THAT(contentOf(folder / "report.jsonl"), HasSubstr("\"testRunEnd\""));
+        EXPECT_EQ(std::distance(fs::directory_iterator(folder), fs::directory_iterator()), 5);
     }
+}
+
+// A second request does not wait for the run, and a program that is killed cannot: what was written as it
+// happened is there.
+TEST(Program, ASecondInterruptAndAKillKeepWhatWasWritten) {
+    for (const int last : {SIGTERM, SIGKILL}) {
+        const fs::path folder = newFolder();
+        test::Program program(endlessRun(folder));
+        ASSERT_TRUE(program.waitForError("Received frame 2."));
+        program.signal(SIGINT);
+        program.signal(last);
+        EXPECT_THAT(program.finish().status, testing::AnyOf(130, 143, -SIGKILL));
+        EXPECT_THAT(contentOf(folder / "report.jsonl.part"), HasSubstr("Received frame 1."));
+        EXPECT_FALSE(fs::exists(folder / "report.json"));
+    }
+}
+
+TEST(Program, ASignalThatIsIgnoredAtItsStartStaysSo) {
+    std::signal(SIGHUP, SIG_IGN);
+    test::Program program({ZR_PROGRAM, "run", "VantorFaultDiagnostic", "--set", "frameCount=20",
+                           "--set", "timeout=600", "--log", "debug"});
+    std::signal(SIGHUP, SIG_DFL);
+    ASSERT_TRUE(program.waitForError("Received frame 2."));
+    program.signal(SIGHUP);
+    EXPECT_EQ(program.finish().status, 0);
+}
+
+// The time-out of the first run is reached while the second one waits for images that do not come.
+TEST(Program, ALateLineStaysWithItsRun) {
+    const fs::path file = newFolder() / "report.json";
+    const test::Outcome outcome = zrlab(
+        {"run", "VantorFaultDiagnostic", "KirraImageExperiment", "--set", "frameCount=1", "--set",
+         "images=1000000", "--set", "timeout=3", "--log", "debug", "--report", file.string()});
+    EXPECT_THAT(outcome.errors, HasSubstr("\ndebug: late: Timeout has been reached.\n"));
+    EXPECT_THAT(outcome.errors, Not(HasSubstr("\nerror: Timeout")));
+    const Json runs = Json::parse(contentOf(file))["runs"];
+    EXPECT_EQ(runs[0]["log"].back()["message"], "Timeout has been reached.");
+    EXPECT_EQ(runs[0]["verdict"], "PASS");
+    EXPECT_THAT(runs[1]["log"].dump(), Not(HasSubstr("Timeout has been")));
 }
 
 }  // namespace

@@ -11,6 +11,9 @@
 #include <utility>
 #include <vector>
 
+#include <sys/resource.h>
+#include <unistd.h>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -37,7 +40,8 @@ class LogRecorder final : public platform::LogSink {
   public:
     void write(const platform::LogLine& line) override {
         const platform::MutexLock lock(_mutex);
-        _lines.push_back({line.level, std::string(line.message)});
+        const int nice = getpriority(PRIO_PROCESS, static_cast<id_t>(gettid()));
+        _lines.push_back({line.level, std::string(line.message), nice});
         while (!_held.empty() && line.message.starts_with(_held)) {
             _changed.wait(_mutex);
         }
@@ -74,10 +78,19 @@ class LogRecorder final : public platform::LogSink {
         return messages;
     }
 
+    // The niceness of the thread that logged the first line with this beginning.
+    int niceOf(std::string_view beginning) {
+        const platform::MutexLock lock(_mutex);
+        return std::find_if(_lines.begin(), _lines.end(),
+                            [&](const Line& line) { return line.message.starts_with(beginning); })
+            ->nice;
+    }
+
   private:
     struct Line {
         platform::LogLevel level;
         std::string message;
+        int nice;
     };
 
     platform::Mutex _mutex;
@@ -96,6 +109,7 @@ struct HandFedStream final : WLRylCaptureStream {
 
     platform::Value valueForProperty(std::string_view property,
                                      platform::ErrorSlot /*error*/) override {
+        asked.emplace_back(property);
         const platform::Value* value = values.find(property);
         return value != nullptr ? *value : platform::Value();
     }
@@ -110,11 +124,15 @@ struct HandFedStream final : WLRylCaptureStream {
         onStart();
         return true;
     }
-    bool stop(platform::ErrorSlot /*error*/) override { return true; }
+    bool stop(platform::ErrorSlot /*error*/) override {
+        asked.emplace_back("stop");
+        return true;
+    }
 
     std::function<void()> onStart = [] {};
     platform::MutableDictionary values;  // the properties
     std::vector<std::pair<std::string, platform::Value>> written;
+    std::vector<std::string> asked;  // the properties that were read, and "stop"
 };
 
 class FaultTest : public ::testing::Test {

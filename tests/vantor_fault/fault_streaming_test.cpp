@@ -106,6 +106,20 @@ TEST_F(FaultStreaming, MeasuresFramesErrorsAndTheRiseOfTheCounters) {
     EXPECT_TRUE(result->auxiliaryData().empty());
 }
 
+// The device resets its counters when it stops; receipt must not wait behind validation.
+TEST_F(FaultStreaming, ReadsTheErrorCountersBeforeItStopsAndReceivesBeforeItValidates) {
+    const auto stream = std::make_shared<test::HandFedStream>();
+    install({stream});
+    const auto experiment = make(1, 3600);
+    stream->onStart = [&] { frameHandler (*experiment)(buffer(), {}); };
+    EXPECT_NE(experiment->run(nullptr), nullptr);
+    ASSERT_GE(stream->asked.size(), 2U);
+    EXPECT_EQ(*(stream->asked.end() - 2), kRylCaptureStreamProperty_ErrorCounters);
+    EXPECT_EQ(stream->asked.back(), "stop");
+    EXPECT_LT(log->niceOf("Received frame 1."), 10);
+    EXPECT_GE(log->niceOf("Processing frame 1."), 10);
+}
+
 TEST_F(FaultStreaming, LogsEachStepOfAFrameThatFailed) {
     camera().stallAfterFrame = 2;
     at(2).set.set(kRylCaptureStreamMetadata_InfraredLightSource, 0);

@@ -14,6 +14,7 @@
 
 #include "devices/observed/observe.h"
 #include "devices/simulator/capture_service.h"
+#include "platform/run_tag.h"
 #include "tests/devices/observed/fake_capture.h"
 #include "tests/support/capture_witness.h"
 
@@ -170,6 +171,19 @@ TEST_F(ObservedCapture, ReportsFramesAndEventsOnceTheirHandlerReturned) {
     ASSERT_EQ(events.size(), 1U);
     EXPECT_EQ(std::tuple(events[0].code, events[0].time.value, events[0].info),
               std::tuple(-4, 3, 99));
+}
+
+TEST_F(ObservedCapture, CallsAHandlerForTheRunThatWroteIt) {
+    connect(fake);
+    std::vector<platform::RunTag> tags;
+    const auto note = [&tags](const auto&...) { tags.push_back(platform::currentRunTag()); };
+    {
+        const platform::RunTagScope scope(5);
+        ASSERT_TRUE(write(captureHandlers(note, note)));
+    }
+    fake->stream->deliverFrame(test::imageBuffer());
+    fake->stream->deliverEvent(1, MediaTime(), 2);
+    EXPECT_THAT(tags, ElementsAre(5, 5));
 }
 
 TEST_F(ObservedCapture, ReportsTheErrorsOfCallsAndHandsThemOn) {

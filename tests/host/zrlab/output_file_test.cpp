@@ -5,6 +5,7 @@
 #include <iterator>
 #include <string>
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -74,6 +75,55 @@ TEST_F(OutputFile, SaysWhatCannotBeWrittenAndTouchesNothing) {
     EXPECT_THAT([&] { host::requireWritable(_folder); },
                 isRefused("cannot write " + _folder.string() + ": Is a directory"));
     EXPECT_EQ(entries(), 0U);
+}
+
+// What was written is kept, beside the target, unless nothing was.
+TEST_F(OutputFile, WritesAsItComesIntoAPartFile) {
+    const fs::path file = _folder / "report";
+    const fs::path part = _folder / "report.part";
+    std::ofstream(file) << "before";
+    std::ofstream(part) << "of a program that was killed";
+    {
+        const auto report = host::openOutputFile(file, true);
+        EXPECT_EQ(read(part), "");
+        EXPECT_THAT([&] { host::openOutputFile(file, true); },
+                    ThrowsMessage<host::Problem>("cannot write " + file.string() +
+                                                 ": another program is writing " + part.string()));
+        report->append("one\n");
+        report->append("two\n");
+        EXPECT_EQ(read(part), "one\ntwo\n");
+        EXPECT_EQ(read(file), "before");
+        report->finish();
+        EXPECT_EQ(read(file), "one\ntwo\n");
+        EXPECT_EQ(entries(), 1U);
+    }
+    host::openOutputFile(file, true)->append("three\n");  // and never finished
+    EXPECT_EQ(read(part), "three\n");
+    EXPECT_EQ(read(file), "one\ntwo\n");
+    host::openOutputFile(file, true);
+    EXPECT_EQ(entries(), 1U);
+
+    fs::create_symlink(file, _folder / "link");
+    const auto linked = host::openOutputFile(_folder / "link", true);
+    linked->append("through a link");
+    linked->finish();
+    EXPECT_TRUE(fs::is_symlink(_folder / "link"));
+    EXPECT_EQ(read(file), "through a link");
+}
+
+// A pipe gets everything at the end.
+TEST_F(OutputFile, WritesToWhatIsNoFileAtTheEnd) {
+    const fs::path pipe = _folder / "pipe";
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    const int reader = open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    const auto report = host::openOutputFile(pipe, true);
+    char text[16];
+    report->append("whole");
+    EXPECT_EQ(::read(reader, text, sizeof text), 0);  // no writer yet
+    report->finish();
+    EXPECT_EQ(::read(reader, text, sizeof text), 5);
+    close(reader);
+    EXPECT_EQ(entries(), 1U);
 }
 
 }  // namespace

@@ -18,7 +18,6 @@
 #include "host/zrlab/device_choice.h"
 #include "input/nearest.h"
 #include "platform/log.h"
-#include "platform/run_loop.h"
 #include "platform/services.h"
 
 namespace host {
@@ -87,8 +86,7 @@ RunRecord runOnHealthy(const ZRLab& lab, const RunPlan& plan) {
     platform::setLogSink(recorder, platform::LogLevel::Error);
     devices::Device device = openDevice({.device = "healthy", .speed = "max", .modules = {}});
     platform::installServices(observed::observe(std::move(device.services), recorder));
-    platform::RunLoop::forThisThread();  // some experiments need one
-    return runOnce(lab, plan, 1, *recorder, {});
+    return runOnce({.lab = lab, .recorder = *recorder, .listeners = {}}, plan, 1).run;
 }
 
 std::string limitLines(const ZRLab& lab, const std::string& name) {

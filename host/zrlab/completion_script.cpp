@@ -37,7 +37,7 @@ _zrlab() {
         elif [[ $candidate == "$word"* ]]; then
             COMPREPLY+=("${candidate#"$before"}")
         fi
-    done < <("${1/#\~\//$HOME/}" complete "${words[@]/#\~\//$HOME/}" 2>/dev/null)
+    done < <("${1/#\~\//${HOME-}/}" complete "${words[@]/#\~\//${HOME-}/}" 2>/dev/null)
     [[ ${#COMPREPLY[@]} -eq 1 && ${COMPREPLY[0]} == *[=:] ]] && compopt -o nospace 2>/dev/null
     return 0
 }

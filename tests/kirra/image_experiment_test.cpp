@@ -103,14 +103,6 @@ TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
     }
 }
 
-TEST_F(ImageExperiment, HandsOnTheErrorOfTheSensor) {
-    const ErrorRef reported = test::sensorError("laser off");
-    sensor().errorAtReport = {.report = 3, .error = reported};
-    EXPECT_EQ(run(10, kGenerous), std::nullopt);
-    EXPECT_EQ(error, reported);  // the same object
-    EXPECT_EQ(journal(), joined(kOpening, joined(kClosing, kClosing)));
-}
-
 TEST_F(ImageExperiment, TimesOutAndDropsWhatCame) {
     sensor().maxReports = 2;
     EXPECT_EQ(run(3, 1), std::nullopt);

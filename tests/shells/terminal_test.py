@@ -11,6 +11,7 @@ import unittest
 import pexpect
 
 ZRLAB, BOARD = (pathlib.Path(argument).resolve() for argument in sys.argv[1:])
+PROGRESS = pathlib.Path(__file__).resolve().parents[2] / "tools" / "build_progress"
 
 # What is typed before a tab, and the line after it.
 COMPLETED = [
@@ -97,6 +98,20 @@ class StatusLine(unittest.TestCase):
             env=dict(os.environ, TERM="xterm"), dimensions=(24, 30), encoding="utf-8", timeout=60)
         lines = [line for line in program.read().split("\r\x1b[K") if " of 900" in line]
         self.assertEqual({len(line) for line in lines}, {29}, lines)
+
+
+class BuildProgress(unittest.TestCase):
+    def progress(self, *lines):
+        script = "".join(f"echo '{line}';" for line in lines) + "exit 3"
+        done = subprocess.run([PROGRESS, "building", "/dev/null", "bash", "-c", script],
+                              capture_output=True, text=True)
+        self.assertEqual((done.returncode, done.stdout), (3, ""))
+        return done.stderr.splitlines()
+
+    def test_shows_every_tenth_of_what_there_is_to_build(self):
+        self.assertEqual(self.progress(*(f"[{step}/40] Building {step}.o" for step in range(1, 41))),
+                         [f"building {percent:3} %" for percent in (2, *range(10, 101, 10))])
+        self.assertEqual(self.progress("[0/2] Re-checking globbed directories...", "no work to do"), [])
 
 
 unittest.main(argv=sys.argv[:1])

@@ -49,8 +49,6 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
              camera().stop = Fault::failing(test::serviceError("stuck"));
          },
          1, 206, "Frame 1 is not illuminated for unknown reason!"},
-        {"error counters of another kind", [&] { camera().errorCounters = 5; }, 2, 210,
-         "Failed to get error counters from zorvel."},
         {"neither stops nor counts",
          [&] {
              camera().stop = Fault::failing(nullptr);

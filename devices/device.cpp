@@ -6,7 +6,7 @@
 #include <stdexcept>
 
 #include "platform/module.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace devices {
 

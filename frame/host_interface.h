@@ -21,7 +21,7 @@
 #include <vector>
 
 #include "platform/error.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/string_map.h"
 #include "platform/value.h"
 

@@ -1,10 +1,8 @@
 #include "platform/log.h"
 
-#include <atomic>
-
 #include <syslog.h>
 
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace platform {
 
@@ -38,7 +36,7 @@ struct State {
     std::shared_ptr<LogSink> sink ZR_GUARDED_BY(mutex) = std::make_shared<SystemLogSink>();
     // Read before every line, without the mutex; a line that races with a change of the sink may go
     // by the old level or the new one.
-    std::atomic<LogLevel> minimum{LogLevel::Default};
+    Atomic<LogLevel> minimum{LogLevel::Default};
 };
 
 State& state() {

@@ -9,7 +9,7 @@
 #include <utility>
 
 #include "platform/deadline.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace platform {
 

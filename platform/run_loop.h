@@ -16,12 +16,13 @@
 #ifndef ZR_PLATFORM_RUN_LOOP_H
 #define ZR_PLATFORM_RUN_LOOP_H
 
-#include <atomic>
 #include <cstdint>
 #include <functional>
 #include <memory>
 #include <string_view>
 #include <vector>
+
+#include "platform/sync.h"
 
 namespace platform {
 
@@ -66,7 +67,7 @@ class RunLoopSource {
     class Wakers;
     std::function<void()> _callback;
     // Set by any thread, taken by the loop's.
-    std::atomic<bool> _signalled{false};
+    Atomic<bool> _signalled{false};
     std::unique_ptr<Wakers> _wakers;
 };
 

@@ -2,7 +2,7 @@
 
 #include <utility>
 
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/welkin/capture.h"
 #include "platform/welkin/hid.h"
 

@@ -1,11 +1,9 @@
 #include "platform/work_queue.h"
 
 #include <algorithm>
-#include <deque>
 #include <exception>
 #include <map>
 #include <optional>
-#include <thread>
 #include <utility>
 
 #include <pthread.h>
@@ -13,8 +11,9 @@
 #include <unistd.h>
 
 #include "platform/deadline.h"
-#include "platform/mutex.h"
+#include "platform/item_line.h"
 #include "platform/run_tag.h"
+#include "platform/sync.h"
 
 namespace platform {
 
@@ -29,24 +28,11 @@ constexpr int kBackgroundNice = 10;
 // How long a queue with due items waits for another attempt to start its thread.
 constexpr std::chrono::milliseconds kRetryDelay{10};
 
-// Runs `body` on a thread of its own that is not joined. An exception that leaves it ends the process
-// where it was thrown, so that the debugger shows the culprit.
-template <class Body>
-void startThread(Body body) {
-    std::thread([body = std::move(body)]() noexcept { body(); }).detach();
-}
-
 // Linux keeps 15 characters: the last ones, because labels that belong together begin alike.
 void nameThisThread(const std::string& name) {
     const std::size_t kept = std::min(name.size(), kThreadNameLength);
     pthread_setname_np(pthread_self(), name.c_str() + name.size() - kept);
 }
-
-// An item with what it takes over from the thread that queued it.
-struct Queued {
-    WorkQueue::Item item;
-    RunTag run;
-};
 
 }  // namespace
 
@@ -60,20 +46,19 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     const std::string label;
     const Priority priority;
 
-    void push(Queued item) {
-        // The thread waits only while there are no items. Once the lock is given up, the item may have
-        // run and dropped every other reference.
-        std::shared_ptr<State> waiting;
+    void push(Queued&& item) {
+        // Once the lock is given up, the item may have run and dropped every other reference.
+        std::shared_ptr<State> asleep;
         {
             const MutexLock lock(_mutex);
             _needThread();  // first: if none can be started, nothing was queued
-            if (_items.empty()) {
-                waiting = shared_from_this();
+            _items.add(std::move(item));
+            if (std::exchange(_isAsleep, false)) {
+                asleep = shared_from_this();
             }
-            _items.push_back(std::move(item));
         }
-        if (waiting != nullptr) {
-            waiting->_changed.notifyAll();
+        if (asleep != nullptr) {
+            asleep->_changed.notifyOne();
         }
     }
 
@@ -83,17 +68,18 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
         {
             const MutexLock lock(_mutex);
             if (item.has_value()) {
-                _items.push_back(std::move(*item));
+                _items.add(std::move(*item));
             }
             try {
-                if (!_items.empty()) {
+                if (!_items.isEmpty()) {
                     _needThread();
                 }
             } catch (const std::exception&) {
                 return false;
             }
+            _isAsleep = false;
         }
-        _changed.notifyAll();
+        _changed.notifyOne();
         return true;
     }
 
@@ -107,7 +93,7 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
             const MutexLock lock(_mutex);
             --_holds;
         }
-        _changed.notifyAll();
+        _changed.notifyOne();
     }
 
   private:
@@ -123,33 +109,35 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
         // Refused without the privilege to raise priorities; the thread then keeps the one it has.
         setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()),
                     priority == Priority::Background ? kBackgroundNice : kUserInteractiveNice);
-        while (std::optional<Queued> next = _next()) {
-            const RunTagScope scope(next->run);
-            next->item();
-            next.reset();  // what the item captured may log when it goes
+        ItemLine taken;
+        while (_takeAll(taken)) {
+            taken.run();
         }
     }
 
-    // The next item, as soon as there is one; nothing when the thread is to end. That is decided
-    // under the lock that saw the queue empty: an item that comes later starts another thread.
-    std::optional<Queued> _next() {
+    // Moves the items into `taken`, which is empty, as soon as there are any; false when the thread is to
+    // end. That is decided under the lock that saw the queue empty: an item that comes later starts
+    // another thread.
+    bool _takeAll(ItemLine& taken) {
         const MutexLock lock(_mutex);
-        while (_items.empty()) {
+        while (_items.isEmpty()) {
             if (_holds == 0) {
                 _hasThread = false;
-                return std::nullopt;
+                return false;
             }
+            _isAsleep = true;
             _changed.wait(_mutex);
         }
-        std::optional<Queued> item(std::move(_items.front()));
-        _items.pop_front();
-        return item;
+        _isAsleep = false;
+        taken.takeAll(_items);
+        return true;
     }
 
     Mutex _mutex;
     Condition _changed;
-    std::deque<Queued> _items ZR_GUARDED_BY(_mutex);
+    ItemLine _items ZR_GUARDED_BY(_mutex);
     bool _hasThread ZR_GUARDED_BY(_mutex) = false;
+    bool _isAsleep ZR_GUARDED_BY(_mutex) = false;  // and not woken yet
     std::size_t _holds ZR_GUARDED_BY(_mutex) = 0;
 };
 
@@ -259,11 +247,11 @@ WorkQueue::Priority WorkQueue::priority() const {
     return _state->priority;
 }
 
-void WorkQueue::async(Item item) {
+void WorkQueue::async(Item&& item) {
     _state->push({std::move(item), currentRunTag()});
 }
 
-void WorkQueue::after(std::chrono::duration<double> delay, Item item) {
+void WorkQueue::after(std::chrono::duration<double> delay, Item&& item) {
     if (delay.count() > 0) {
         Timer::shared().add(deadlineAfter(delay), _state, {std::move(item), currentRunTag()});
     } else {

@@ -26,17 +26,15 @@
 #ifndef ZR_VANTOR_FAULT_FAULT_EXPERIMENT_H
 #define ZR_VANTOR_FAULT_FAULT_EXPERIMENT_H
 
-#include <atomic>
 #include <cstdint>
 #include <memory>
 #include <optional>
-#include <semaphore>
 #include <string>
 #include <string_view>
 #include <utility>
 
 #include "frame/host_interface.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/welkin/capture.h"
 #include "platform/welkin/meterix.h"
 #include "platform/work_queue.h"
@@ -133,15 +131,15 @@ class ZRVantorFaultExperiment final : public ZRExperiment,
     // Held for the whole of a stop.
     platform::Mutex _stopMutex;
     // Set under the lock. Atomic because the receiving queue reads it without.
-    std::atomic<bool> _stop{false};
+    platform::Atomic<bool> _stop{false};
     // Counted by the receiving queue. Atomic because a frame that passed the test of `_stop` just
     // before the stop may be counted while the result is built.
-    std::atomic<std::uint64_t> _frameCount{0};
+    platform::Atomic<std::uint64_t> _frameCount{0};
 
     // The outcome: written once, by the stop, before the semaphore is signalled; read after the wait.
     platform::ErrorRef _error;
     std::optional<platform::Dictionary> _errorCounters;
-    std::counting_semaphore<> _done_semaphore{0};
+    platform::Semaphore _done_semaphore{0};
 
     platform::WorkQueue _receivingQueue;
     platform::WorkQueue _processingQueue;

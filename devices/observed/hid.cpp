@@ -6,7 +6,7 @@
 #include <utility>
 
 #include "devices/observed/wrapper_table.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/run_loop.h"
 #include "platform/run_tag.h"
 

@@ -7,7 +7,7 @@
 #include <memory>
 
 #include "platform/image_buffer.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace observed {
 

@@ -5,7 +5,7 @@
 #include <memory>
 #include <vector>
 
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace observed {
 

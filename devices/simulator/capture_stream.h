@@ -11,7 +11,7 @@
 #include <utility>
 
 #include "devices/simulator/capture_service.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/welkin/capture.h"
 
 namespace simulator {

@@ -12,7 +12,7 @@
 
 #include "devices/simulator/due_time.h"
 #include "devices/simulator/image_report.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/number.h"
 
 namespace simulator {

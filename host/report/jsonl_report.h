@@ -26,7 +26,7 @@
 
 #include "host/record/run_listener.h"
 #include "host/report/report_form.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace host {
 

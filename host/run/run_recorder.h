@@ -21,7 +21,7 @@
 #include "devices/observed/observer.h"
 #include "host/record/run_record.h"
 #include "platform/log.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/run_tag.h"
 
 namespace host {

@@ -11,7 +11,7 @@
 #include <utility>
 
 #include "host/run/judge.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "platform/run_loop.h"
 #include "platform/run_tag.h"
 

@@ -9,7 +9,7 @@
 #include "host/record/plugin_data.h"
 #include "host/record/run_plan.h"
 #include "host/run/run_recorder.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace host {
 

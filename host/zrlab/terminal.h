@@ -10,7 +10,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace host {
 

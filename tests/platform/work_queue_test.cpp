@@ -1,5 +1,6 @@
 #include "platform/work_queue.h"
 
+#include <array>
 #include <atomic>
 #include <cmath>
 #include <functional>
@@ -61,6 +62,27 @@ TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
         ASSERT_EQ(items.size(), static_cast<std::size_t>(kItemsEach));
         EXPECT_TRUE(std::is_sorted(items.begin(), items.end()));
     }
+}
+
+// What an item captured moves with it, whether it lies inside the item or not, and goes once.
+TEST(WorkQueue, RunsItemsOfEverySize) {
+    const auto life = std::make_shared<int>();
+    std::atomic<int> sum = 0;
+    std::latch done(3);
+    WorkQueue queue("sizes", Priority::Background);
+    const auto add = [&]<std::size_t Size>(std::array<char, Size> load) {
+        load.back() = 1;
+        queue.async([&, life, load, moveOnly = std::make_unique<int>(2)] {
+            sum += load.back() + *moveOnly;
+            done.count_down();
+        });
+    };
+    add(std::array<char, 1>());
+    add(std::array<char, 16>());
+    add(std::array<char, 4096>());
+    done.wait();
+    EXPECT_EQ(sum, 9);
+    EXPECT_TRUE(eventually([&] { return life.use_count() == 1; }));
 }
 
 // Work belongs to the run that asked for it, through items, delayed items and what they release.

@@ -9,7 +9,7 @@
 
 #include "devices/observed/observer.h"
 #include "platform/deadline.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 
 namespace test {
 

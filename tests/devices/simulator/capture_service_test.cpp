@@ -12,7 +12,7 @@
 #include "devices/observed/capture.h"
 #include "devices/simulator/due_time.h"
 #include "devices/simulator/frame_metadata.h"
-#include "platform/mutex.h"
+#include "platform/sync.h"
 #include "tests/devices/observed/fake_capture.h"
 #include "tests/support/capture_witness.h"
 

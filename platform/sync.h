@@ -1,13 +1,19 @@
-// A mutex whose uses clang's thread-safety analysis checks, its scoped lock and its condition.
+// What threads synchronize through: a mutex whose uses clang's thread-safety analysis checks, its scoped
+// lock and its condition, atomics, semaphores, and the start of a thread. The platform and the module use
+// nothing else, so that another header in place of this one sees, and can order, every step.
 //
 // Fields say which mutex guards them with ZR_GUARDED_BY; functions that need it held with
 // ZR_REQUIRES. Under other compilers the annotations expand to nothing.
-#ifndef ZR_PLATFORM_MUTEX_H
-#define ZR_PLATFORM_MUTEX_H
+#ifndef ZR_PLATFORM_SYNC_H
+#define ZR_PLATFORM_SYNC_H
 
+#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <mutex>
+#include <semaphore>
+#include <thread>
+#include <utility>
 
 #if defined(__clang__)
 #define ZR_THREAD_ANNOTATION(x) __attribute__((x))
@@ -68,6 +74,7 @@ class Condition {
             _condition.wait_until(held.lock, deadline);
         }
     }
+    void notifyOne() { _condition.notify_one(); }
     void notifyAll() { _condition.notify_all(); }
 
   private:
@@ -79,6 +86,19 @@ class Condition {
     };
     std::condition_variable _condition;
 };
+
+template <class T>
+using Atomic = std::atomic<T>;
+
+using Semaphore = std::counting_semaphore<>;
+
+// Runs `body` on a thread of its own that is not joined. An exception that leaves it ends the process
+// where it was thrown, so that the debugger shows the culprit. Throws std::system_error when no thread
+// can be started.
+template <class Body>
+void startThread(Body body) {
+    std::thread([body = std::move(body)]() mutable noexcept { body(); }).detach();
+}
 
 }  // namespace platform
 

@@ -1,0 +1,85 @@
+// ItemLine: the items of a work queue, first to last.
+#ifndef ZR_PLATFORM_ITEM_LINE_H
+#define ZR_PLATFORM_ITEM_LINE_H
+
+#include <array>
+#include <cstddef>
+#include <memory>
+#include <utility>
+
+#include "platform/run_tag.h"
+#include "platform/work_item.h"
+
+namespace platform {
+
+// An item with what it takes over from the thread that queued it.
+struct Queued {
+    WorkItem item;
+    RunTag run = 0;
+};
+
+// Keeps items in chunks, which it uses again, so that a line that is no longer than it has been allocates
+// nothing, and a long one moves no item twice. One thread at a time.
+class ItemLine {
+  public:
+    ItemLine() = default;
+    ItemLine(const ItemLine&) = delete;
+    ItemLine& operator=(const ItemLine&) = delete;
+    // One by one: a long chain would not fit the stack.
+    ~ItemLine() {
+        while (_first != nullptr) {
+            _first = std::move(_first->next);
+        }
+    }
+
+    bool isEmpty() const { return _first == nullptr; }
+
+    void add(Queued&& item) {
+        if (_last == nullptr || _last->count == kItems) {
+            std::unique_ptr<Chunk>& place = _last == nullptr ? _first : _last->next;
+            place = _spare != nullptr ? std::exchange(_spare, nullptr) : std::make_unique<Chunk>();
+            _last = place.get();
+        }
+        _last->items[_last->count++] = std::move(item);
+    }
+
+    // Takes the items of the other line and gives it its spare room. This line must be empty.
+    void takeAll(ItemLine& other) {
+        std::swap(_first, other._first);
+        std::swap(_last, other._last);
+        std::swap(_spare, other._spare);
+    }
+
+    // Runs each item, under its tag, and lets go of what it captured before the next one starts. The line
+    // is empty then.
+    void run() {
+        while (_first != nullptr) {
+            for (std::size_t at = 0; at < _first->count; ++at) {
+                auto& [item, run] = _first->items[at];
+                const RunTagScope scope(run);
+                item();
+                item = WorkItem();
+            }
+            _first->count = 0;
+            std::unique_ptr<Chunk> done = std::exchange(_first, std::move(_first->next));
+            _spare = std::move(done);
+        }
+        _last = nullptr;
+    }
+
+  private:
+    static constexpr std::size_t kItems = 32;
+    struct Chunk {
+        std::array<Queued, kItems> items;
+        std::size_t count = 0;
+        std::unique_ptr<Chunk> next;
+    };
+
+    std::unique_ptr<Chunk> _first;
+    Chunk* _last = nullptr;
+    std::unique_ptr<Chunk> _spare;
+};
+
+}  // namespace platform
+
+#endif

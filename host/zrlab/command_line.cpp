@@ -97,15 +97,14 @@ std::string formLines() {
     return lines;
 }
 
-// Which of `names` was meant by a word, or where they are listed.
+// Which of `names` was meant by a word, or where the commands or options behind `path` are listed.
 std::string meantBy(const std::string& word,
                     const std::vector<std::string>& names,
-                    const CLI::App& command) {
+                    const std::string& path) {
     const std::string meant = input::didYouMean(word, names);
-    const bool isTop = command.get_parent() == nullptr;
-    return !meant.empty() ? meant
-           : isTop        ? "; zrlab --help lists them"
-                          : "; zrlab " + command.get_name() + " --help lists them";
+    return !meant.empty()
+               ? meant
+               : fmt::format("; zrlab {}{}--help lists them", path, path.empty() ? "" : " ");
 }
 
 std::vector<std::string> optionNames(const CLI::App& command) {
@@ -118,7 +117,7 @@ std::vector<std::string> optionNames(const CLI::App& command) {
 
 // What is wrong with an option that the command has.
 std::string wrongUse(const CLI::App& command, const CLI::ParseError& error) {
-    const std::string text = error.what();
+    std::string text = error.what();
     if (error.get_exit_code() != static_cast<int>(CLI::ExitCodes::ArgumentMismatch)) {
         return text;
     }
@@ -192,7 +191,7 @@ CommandLine::CommandLine()
         ->type_name("bash|zsh")
         ->check(oneOf({"bash", "zsh"}));
     completion->footer(
-        "Examples:\n  source <(zrlab completion bash)\n"
+        "Examples:\n  source <(zrlab completion bash)\n  source <(zrlab completion zsh)\n"
         "  zrlab completion zsh > \"${fpath[1]}/_zrlab\"");
 
     CLI::App* manual = _app.add_subcommand("manual", "Print the manual page");
@@ -300,15 +299,14 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
             std::isdigit(static_cast<unsigned char>(argument[1])) == 0) {
             const std::string option = argument.substr(0, argument.find('='));
             if (given->get_option_no_throw(option) == nullptr) {
-                return in("unknown option " + option +
-                          meantBy(option, optionNames(*given), *given));
+                return in("unknown option " + option + meantBy(option, optionNames(*given), path));
             }
         } else if (const CLI::App* inner = subcommandOf(*given, argument)) {
             given = inner;
             path += (path.empty() ? "" : " ") + argument;
         } else if (!given->get_subcommands({}).empty()) {
             return in("unknown command \"" + argument + "\"" +
-                      meantBy(argument, commandNames(*given), *given));
+                      meantBy(argument, commandNames(*given), path));
         }
     }
     if (given == &_app) {

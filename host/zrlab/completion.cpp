@@ -212,7 +212,7 @@ class Answer {
         std::string_view placeholder;
         void (Answer::*offer)();
     };
-    static const Source kSources[6];
+    static const Source kSources[7];
 
     const Line& _line;
     const std::string _prefix;
@@ -220,9 +220,13 @@ class Answer {
 };
 
 const Answer::Source Answer::kSources[] = {
-    {"NAME", &Answer::_offerNames},     {"COMMAND", &Answer::_offerCommands},
-    {"DEVICE", &Answer::_offerDevices}, {"PARAM=VALUE", &Answer::_offerParameters},
-    {"FILE", &Answer::_offerAnyFile},   {"PATH", &Answer::_offerAnyFile},
+    {"NAME", &Answer::_offerNames},
+    {"COMMAND", &Answer::_offerCommands},
+    {"DEVICE", &Answer::_offerDevices},
+    {"WHAT", &Answer::_offerDevices},
+    {"PARAM=VALUE", &Answer::_offerParameters},
+    {"FILE", &Answer::_offerAnyFile},
+    {"PATH", &Answer::_offerAnyFile},
 };
 
 }  // namespace

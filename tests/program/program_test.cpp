@@ -297,6 +297,7 @@ TEST(Program, RepeatsAndCountsOrStopsAtTheFirstFailure) {
     EXPECT_EQ(repeat["runs"], 20);
     EXPECT_EQ(repeat["passed"], 20);
     EXPECT_EQ(repeat["results"].size(), 64U);
+    EXPECT_EQ(Json::parse(repeated.output)["runs"][0]["run"], 20);  // the last
 
     const test::Outcome most = zrlab(
         {"run", "VantorMeterixDiagnostic", "--until-fail", "--repeat", "3", "--format", "json"});
@@ -307,11 +308,9 @@ TEST(Program, RepeatsAndCountsOrStopsAtTheFirstFailure) {
     EXPECT_EQ(stopped.status, 1);
     const Json stoppedRepeat = Json::parse(stopped.output)["repeats"][0];
     EXPECT_EQ(stoppedRepeat["runs"], 1);
-    EXPECT_EQ(
-        stoppedRepeat["notPassed"],
-        Json::array({{{"run", 1},
-                      {"verdict", "FAIL"},
-                      {"why", "Number Xel INT_FAULT_CC is 3 events, Max Reports: 0 … 0 events"}}}));
+    ASSERT_EQ(stoppedRepeat["notPassed"].size(), 1U);
+    EXPECT_EQ(stoppedRepeat["notPassed"][0]["why"],
+              "Number Xel INT_FAULT_CC is 3 events, Max Reports: 0 … 0 events");
 }
 
 // A time-out of an hour is pending when the run is over: the program must not wait for it.

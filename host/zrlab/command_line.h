@@ -28,7 +28,6 @@ class CommandLine {
 
     const CLI::App& app() const { return _app; }
 
-
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe
     bool limits = false;                // of describe

@@ -12,8 +12,8 @@
 
 #include "devices/simulator/due_time.h"
 #include "devices/simulator/image_report.h"
-#include "platform/sync.h"
 #include "platform/number.h"
+#include "platform/sync.h"
 
 namespace simulator {
 

@@ -22,8 +22,8 @@
 #include "host/record/frame_gap.h"
 #include "host/record/run_record.h"
 #include "platform/log.h"
-#include "platform/sync.h"
 #include "platform/run_tag.h"
+#include "platform/sync.h"
 
 namespace host {
 

@@ -11,9 +11,9 @@
 #include <utility>
 
 #include "host/run/judge.h"
-#include "platform/sync.h"
 #include "platform/run_loop.h"
 #include "platform/run_tag.h"
+#include "platform/sync.h"
 
 namespace host {
 

@@ -59,8 +59,9 @@ devices::Kind kindOf(const std::string& device, const std::string& option = "") 
         }
         names.push_back(kind.name);
     }
+    const std::string meant = input::didYouMean(name, names);
     throw Problem(kExitUsage, option + device + ": unknown kind of device \"" + name + "\"" +
-                                  input::didYouMean(name, names));
+                                  (meant.empty() ? "; zrlab devices --kinds lists them" : meant));
 }
 
 // What the device is asked for by: the part behind its kind.

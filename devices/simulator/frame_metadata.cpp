@@ -14,6 +14,10 @@ namespace {
 constexpr double kWarmUpSeconds = 60;
 constexpr std::string_view kNoDictionary = "corrupt";
 
+// The sensor's own count, which also counts the frames that are lost on the way. The plug-in does not
+// read it; the bench finds lost frames by it.
+constexpr std::string_view kFrameNumber = "FrameNumber";
+
 // A number in [0, 1) that depends on nothing else.
 double chance(std::uint64_t seed, std::uint64_t frame) {
     const std::uint64_t bits = mixBits(seed + frame * kSplitMixStep);
@@ -43,6 +47,7 @@ platform::Value frameMetadata(const StreamProfile& profile, std::uint64_t frame,
         metadata.set(kRylCaptureStreamMetadata_InfraredLightSource,
                      profile.lightSources[(frame - 1) % profile.lightSources.size()]);
     }
+    metadata.set(kFrameNumber, frame);
     const double warmth = 1.0 - std::exp(-seconds / kWarmUpSeconds);
     for (const auto& [key, rise] : profile.warming) {
         if (const platform::Value* cold = metadata.find(key)) {

@@ -77,7 +77,8 @@ TEST_F(CaptureService, DeliversLitFramesAtTheirTimeAndWarmsUp) {
         EXPECT_DOUBLE_EQ(frame.time.seconds(), static_cast<double>(number) / 50);
         const double due = static_cast<double>(number) / 50 + frameDelay(camera(), number);
         EXPECT_GE(std::chrono::duration<double>(frame.delivered - started).count(), due / speed);
-        EXPECT_EQ(frame.metadata.size(), 18U);
+        EXPECT_EQ(frame.metadata.size(), 19U);
+        EXPECT_EQ(frame.metadata["FrameNumber"], Value(number));
         EXPECT_EQ(frame.metadata[kLight], Value(number % 2 == 1 ? 1 : 2));
     }
     EXPECT_GT(frames.back().metadata.number("DIETemperatureActive").asDouble(),

@@ -91,7 +91,7 @@ class Sequence {
     // Ends the thread of a run that was given up, when the plug-in comes back after all.
     struct GivenUp {};
 
-    // Changes the record and tells the listeners about it.
+    // Changes the record, or calls the listeners with it.
     template <class Change>
     void _edit(Change&& change) {
         const platform::MutexLock lock(_mutex);
@@ -102,7 +102,7 @@ class Sequence {
     }
 
     template <class Call>
-    void _tell(Call&& call) ZR_REQUIRES(_mutex) {
+    void _report(Call&& call) ZR_REQUIRES(_mutex) {
         for (const auto& listener : _bench.listeners) {
             call(*listener, std::as_const(_run));
         }
@@ -112,7 +112,7 @@ class Sequence {
 
     void _parts() {
         _edit([this](RunRecord&) ZR_REQUIRES(_mutex) {
-            _tell([](RunListener& listener, const RunRecord& run) { listener.runStarted(run); });
+            _report([](RunListener& listener, const RunRecord& run) { listener.runStarted(run); });
         });
         ZRExperimentResultRef result;
         _part(Part::Experiment, [&] { result = _experiment(); });
@@ -127,7 +127,7 @@ class Sequence {
         _bench.recorder.end(_run);
         _run.seconds = secondsSince(_start);
         _run.verdict = _isToStop() ? Verdict::Interrupted : verdictOf(_run);
-        _tell([](RunListener& listener, const RunRecord& run) { listener.runEnded(run); });
+        _report([](RunListener& listener, const RunRecord& run) { listener.runEnded(run); });
     }
 
     template <class Body>
@@ -135,7 +135,7 @@ class Sequence {
         const Clock::time_point start = Clock::now();
         _edit([&](RunRecord& record) ZR_REQUIRES(_mutex) {
             _secondsOf(part, record) = 0;
-            _tell([part](RunListener& listener, const RunRecord& run) {
+            _report([part](RunListener& listener, const RunRecord& run) {
                 listener.partStarted(run, part);
             });
         });
@@ -143,7 +143,7 @@ class Sequence {
         _edit([&](RunRecord& record) ZR_REQUIRES(_mutex) {
             _secondsOf(part, record) = secondsSince(start);
             _bench.recorder.takeFrames(record);
-            _tell([part](RunListener& listener, const RunRecord& run) {
+            _report([part](RunListener& listener, const RunRecord& run) {
                 listener.partEnded(run, part);
             });
         });

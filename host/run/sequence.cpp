@@ -11,9 +11,9 @@
 #include <utility>
 
 #include "host/run/judge.h"
-#include "platform/sync.h"
 #include "platform/run_loop.h"
 #include "platform/run_tag.h"
+#include "platform/sync.h"
 
 namespace host {
 
@@ -218,11 +218,12 @@ class Sequence {
         }
         for (const auto& [name, measurement] : result->measurements()) {
             if (measurement == nullptr) {
-                _fail(kPart, kStepRun, "the measurement \"" + name + "\" is null");
+                _fail(kPart, kStepRun, "the measurement \"" + std::string(name) + "\" is null");
                 return nullptr;
             }
             _edit([&, &key = name, &one = measurement](RunRecord& run) {
-                run.measurements.push_back({key, one->doubleValue(), one->unit().symbol()});
+                run.measurements.push_back(
+                    {std::string(key), one->doubleValue(), one->unit().symbol()});
             });
         }
         _edit([&](RunRecord& run) {

@@ -98,7 +98,9 @@ TEST_F(ImageExperiment, KeepsTheKindsOfTheNumbers) {
     sensor().firstTimestamp = 4294967295;
     const std::optional<List> images = run(1, kGenerous);
     ASSERT_TRUE(images.has_value() && images->size() == 1);
-    const Dictionary& image = *(*images)[0].dictionary();
+    const platform::Value first = (*images)[0];
+    ASSERT_NE(first.dictionary(), nullptr);
+    const Dictionary& image = *first.dictionary();
     EXPECT_EQ(image.size(), 5U);
     EXPECT_EQ(image.number("frameID"), Number(std::uint32_t{1}));
     EXPECT_EQ(image.number("timestampInMilliseconds"), Number(std::uint32_t{4294967295}));

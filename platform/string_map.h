@@ -36,8 +36,9 @@ class StringMap {
     StringMap(const StringMap& other) : StringMap() {
         reserve(other._size, other._liveKeysSize());
         for (std::size_t at = 0; at < other._size; ++at) {
-            _append(other._keyOf(other._block.entries[at]), T(other._block.entries[at].value));
+            _place(other._keyOf(other._block.entries[at]), T(other._block.entries[at].value));
         }
+        _enterAll(other._block);
     }
     StringMap(StringMap&& other) noexcept { _swap(other); }
     StringMap& operator=(StringMap other) noexcept {
@@ -103,6 +104,7 @@ class StringMap {
   private:
     static constexpr std::size_t kFirstCapacity = 8;
     static constexpr std::size_t kUsualKeySize = 24;
+    static constexpr std::size_t kSmall = 64;
 
     // An entry; its key is in the block's keys.
     struct Stored {
@@ -168,19 +170,30 @@ class StringMap {
 
     // `key` is not in the map. It may be a view of a key that was.
     void _append(const StringKey& key, T&& value) {
-        const std::string_view text = key.text();
+        const std::size_t keySize = key.text().size();
         Block before;
-        if (_size == _block.capacity || text.size() > _block.keysCapacity - _keysSize) {
-            before = _moveTo(
-                _size < _block.capacity ? _block.capacity : std::max(kFirstCapacity, 2 * _size),
-                2 * (_liveKeysSize() + text.size()));
+        if (_size == _block.capacity || keySize > _block.keysCapacity - _keysSize) {
+            const std::size_t capacity =
+                _size < _block.capacity ? _block.capacity : _nextCapacity();
+            before = _moveTo(capacity,
+                             std::max(2 * (_liveKeysSize() + keySize), capacity * kUsualKeySize));
         }
-        std::copy_n(text.data(), text.size(), _block.keys + _keysSize);
-        ::new (static_cast<void*>(_block.entries + _size))
-            Stored{std::move(value), _keysSize, text.size()};
-        _keysSize += text.size();
-        ++_size;
+        _place(key.text(), std::move(value));
         _enter(key.hash(), _size);
+    }
+
+    // A small map quadruples: a dictionary of some thirty keys moves its entries once.
+    std::size_t _nextCapacity() const {
+        return std::max(kFirstCapacity, (_size < kSmall ? 4 : 2) * _size);
+    }
+
+    // Stores an entry that has room, but does not enter it in the index.
+    void _place(std::string_view key, T&& value) {
+        std::copy_n(key.data(), key.size(), _block.keys + _keysSize);
+        ::new (static_cast<void*>(_block.entries + _size))
+            Stored{std::move(value), _keysSize, key.size()};
+        _keysSize += key.size();
+        ++_size;
     }
 
     void _enter(std::uint32_t hash, std::size_t next) {
@@ -189,6 +202,15 @@ class StringMap {
             ++at;
         }
         _block.slots[at & (_block.slotCount - 1)] = {hash, static_cast<std::uint32_t>(next)};
+    }
+
+    // Enters what another block's index holds; the entries lie in the same places.
+    void _enterAll(const Block& other) {
+        for (std::size_t at = 0; at < other.slotCount; ++at) {
+            if (other.slots[at].next != 0) {
+                _enter(other.slots[at].hash, other.slots[at].next);
+            }
+        }
     }
 
     // Makes the index anew.
@@ -210,19 +232,17 @@ class StringMap {
     // Moves the entries, and the keys that are still used, to a block of that size. Returns the old one.
     Block _moveTo(std::size_t capacity, std::size_t keysCapacity) {
         static_assert(std::is_nothrow_move_constructible_v<T>);
-        Block block(capacity, keysCapacity);
-        std::swap(block, _block);
+        Block old(capacity, keysCapacity);
+        std::swap(old, _block);
         _keysSize = 0;
-        for (std::size_t at = 0; at < _size; ++at) {
-            Stored& old = block.entries[at];
-            std::copy_n(block.keys + old.keyAt, old.keySize, _block.keys + _keysSize);
-            ::new (static_cast<void*>(_block.entries + at))
-                Stored{std::move(old.value), _keysSize, old.keySize};
-            std::destroy_at(&old);
-            _keysSize += _block.entries[at].keySize;
+        const std::size_t count = std::exchange(_size, 0);
+        for (std::size_t at = 0; at < count; ++at) {
+            Stored& stored = old.entries[at];
+            _place({old.keys + stored.keyAt, stored.keySize}, std::move(stored.value));
+            std::destroy_at(&stored);
         }
-        _index();
-        return block;
+        _enterAll(old);
+        return old;
     }
 
     void _swap(StringMap& other) noexcept {

@@ -23,7 +23,7 @@
 namespace devices {
 
 // The version of this header. It rises with every change after which a module must be built again.
-inline constexpr int kInterfaceVersion = 1;
+inline constexpr int kInterfaceVersion = 2;
 
 // A device, ready to run on. It lives as long as one of its services, streams or sensors is held.
 struct Device {
@@ -67,6 +67,15 @@ struct Kind {
     // asked for wrongly (no such device, a description that cannot be read), another one when the device
     // itself fails.
     std::function<Device(const Request&)> open = {};
+
+    // The description of the device that is asked for by Request::what: text that ends with a line end, in a
+    // form of the kind's own. Kept in a file, it describes the same device to the kind. Empty when devices of
+    // the kind have no such form. Throws as open() does.
+    std::function<std::string(const std::string& what)> show = {};
+
+    // What is wrong with a description, one line for each problem that names the culprit; none when open() can
+    // make the device that it describes. Empty when devices of the kind have no descriptions.
+    std::function<std::vector<std::string>(const std::string& what)> check = {};
 };
 
 namespace detail {

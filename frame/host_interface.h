@@ -21,8 +21,8 @@
 #include <vector>
 
 #include "platform/error.h"
-#include "platform/sync.h"
 #include "platform/string_map.h"
+#include "platform/sync.h"
 #include "platform/value.h"
 
 // Error domains. Opaque strings.

@@ -55,6 +55,12 @@ class ParserWatch {
         return true;
     }
 
+    // Of the value that the parser gave up at.
+    std::string nextPointer() {
+        _beginValue();
+        return _pointer();
+    }
+
   private:
     struct Level {
         bool isArray;
@@ -102,6 +108,14 @@ Json parseJson(const std::string& text) {
         return Json::parse(text, [&watch](int /*depth*/, Json::parse_event_t event, Json& parsed) {
             return watch(event, parsed);
         });
+    } catch (const Json::out_of_range& exception) {
+        // "...number overflow parsing '1e400'": the parser says this of no other value.
+        std::string_view number = exception.what();
+        number.remove_prefix(std::min(number.find('\'') + 1, number.size()));
+        const std::string reason =
+            std::string(number.substr(0, number.find('\''))) + " is too large for a number";
+        const std::string pointer = watch.nextPointer();
+        throw DocumentProblem(pointer.empty() ? reason : pointer + ": " + reason);
     } catch (const Json::exception& exception) {
         throw DocumentProblem(parserReason(exception.what()));
     }
@@ -112,11 +126,21 @@ void JsonNode::fail(const std::string& reason) const {
 }
 
 JsonNode JsonNode::operator[](const std::string& key) const {
-    return {_json->at(key), _pointer + "/" + escaped(key)};
+    return {_json->at(key), *_problems, _pointer + "/" + escaped(key)};
 }
 
 JsonNode JsonNode::operator[](std::size_t index) const {
-    return {_json->at(index), _pointer + "/" + std::to_string(index)};
+    return {_json->at(index), *_problems, _pointer + "/" + std::to_string(index)};
+}
+
+void JsonNode::requireKeys(std::initializer_list<std::string_view> keys,
+                           const std::string& reason) const {
+    _require(isObject(), "not an object");
+    for (const std::string_view key : keys) {
+        if (!_json->contains(key)) {
+            fail(reason);
+        }
+    }
 }
 
 bool JsonNode::asBool() const {
@@ -154,10 +178,9 @@ void failUnknownName(const JsonNode& value,
                      std::string_view name,
                      const std::vector<std::string>& known,
                      const std::string& kind,
-                     std::string_view key) {
+                     const std::string& howNew) {
     const std::string meant = didYouMean(name, known);
-    value.fail("unknown " + kind +
-               (meant.empty() ? " (a new one needs \"" + std::string(key) + "\")" : meant));
+    value.fail("unknown " + kind + (meant.empty() ? " (" + howNew + ")" : meant));
 }
 
 }  // namespace input

@@ -39,7 +39,7 @@ std::size_t edits(std::string_view a, std::string_view b) {
 
 std::string nearest(std::string_view given, const std::vector<std::string>& names) {
     std::string best;
-    std::size_t fewest = given.size() / 3 + 1;
+    std::size_t fewest = std::max(given.size() / 3, std::size_t{1}) + 1;
     for (const std::string& name : names) {
         const std::size_t count = edits(given, name);
         if (count < fewest) {
@@ -47,7 +47,13 @@ std::string nearest(std::string_view given, const std::vector<std::string>& name
             best = name;
         }
     }
-    return best;
+    if (!best.empty() || given.size() < 3) {
+        return best;
+    }
+    const auto begun = std::find_if(names.begin(), names.end(), [given](const std::string& name) {
+        return edits(given, std::string_view(name).substr(0, given.size())) == 0;
+    });
+    return begun != names.end() ? *begun : "";
 }
 
 std::string didYouMean(std::string_view given, const std::vector<std::string>& names) {

@@ -9,7 +9,8 @@
 namespace input {
 
 // The name with the fewest edits (insert, delete, replace, swap; case does not count) from `given`, when
-// they are few enough to be a slip: at most a third of its length. Empty otherwise.
+// they are few enough to be a slip: one, or at most a third of its length. Otherwise the first name that
+// begins with it, if it has three characters. Else empty.
 std::string nearest(std::string_view given, const std::vector<std::string>& names);
 
 // "; did you mean NAME?", or nothing when no name is near.

@@ -1,6 +1,7 @@
 #!/usr/bin/python3
 """Runs every diagnostic and experiment on every device of the gallery: the verdict and its reason must be
-the expected ones, the exit status must follow, and the standard report must satisfy its schemas.
+the expected ones, the exit status must follow, and the standard report must satisfy its schemas. Expected is
+what expected-outcomes.json says, and PASS for what it does not mention.
 
 check_gallery.py ZRLAB OUTPUT-FOLDER
 """
@@ -53,7 +54,7 @@ def run(zrlab, folder, device, name):
         outcome = outcome_of(json.loads(done.stdout))
     except (ValueError, KeyError):
         return f"{where}: no report; exit status {done.returncode}: {done.stderr.strip()}"
-    expected = json.loads(EXPECTED.read_text())[device][name]
+    expected = json.loads(EXPECTED.read_text())[device].get(name, "PASS")
     if outcome != expected:
         return f"{where}: {outcome}, expected {expected}"
     if done.returncode != STATUS[outcome.split(":")[0]]:
@@ -69,8 +70,11 @@ def main():
     devices = subprocess.run(
         [zrlab, "devices", "--names"], capture_output=True, text=True, check=True
     ).stdout.split()
-    unknown = set(devices) ^ set(json.loads(EXPECTED.read_text()))
+    outcomes = json.loads(EXPECTED.read_text())
+    unknown = set(devices) ^ set(outcomes)
     problems = [f"{device}: not in both the gallery and {EXPECTED.name}" for device in sorted(unknown)]
+    problems += [f"{EXPECTED.name}: {device}: there is no run \"{name}\""
+                 for device, runs in outcomes.items() for name in runs if name not in RUNS]
     jobs = [(device, name) for device in devices if device not in unknown for name in RUNS]
     # Most of a run is waiting for a time-out, so more run at once than there are processors.
     with concurrent.futures.ThreadPoolExecutor(6) as pool:

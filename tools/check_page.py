@@ -8,6 +8,7 @@ With --screenshot each page is drawn into the folder: NAME.png, NAME.dark.png an
 """
 
 import argparse
+import html
 import html.parser
 import pathlib
 import re
@@ -20,11 +21,25 @@ CHROMIUM = [
     "--no-first-run", "--disable-background-networking", "--disable-component-update",
     "--disable-sync", "--hide-scrollbars",
 ]
+NARROW = 400  # pixels: a telephone
 VIEWS = {
     "": ["--window-size=1280,3400"],
     ".dark": ["--window-size=1280,3400", "--blink-settings=preferredColorScheme=0"],
-    ".narrow": ["--window-size=500,3200"],
+    ".narrow": [f"--window-size={NARROW},3600"],
 }
+# Reads the page in a frame as wide as a telephone, and says what reaches beyond it.
+NARROW_READER = """<iframe src="{uri}" width="{width}" height="900" style="border: 0"></iframe>
+<pre id="found"></pre>
+<script>
+addEventListener("load", () => {{
+  const page = document.querySelector("iframe").contentDocument;
+  const cut = [...page.querySelectorAll("h1, h2, h3, p, dd, tbody th, tbody td, figure")]
+      .filter(one => one.getBoundingClientRect().right > {width} && one.offsetParent);
+  const wide = page.documentElement.scrollWidth > {width} ? ["the page"] : [];
+  document.querySelector("#found").textContent =
+      "read " + [...wide, ...cut.map(one => one.textContent.slice(0, 60))].join("|");
+}});
+</script>"""
 LANDMARKS = ("header", "main", "footer")
 VOID = {"meta", "br", "hr", "img", "input", "link"}
 
@@ -39,6 +54,19 @@ def browse(page, *flags):
     return done.stdout.decode()
 
 
+def cut_off(page):
+    """What does not fit on a narrow screen."""
+    with tempfile.NamedTemporaryFile(suffix=".html", mode="w") as reader:
+        reader.write(NARROW_READER.format(uri=page.resolve().as_uri(), width=NARROW))
+        reader.flush()
+        read = browse(pathlib.Path(reader.name), "--allow-file-access-from-files",
+                      "--window-size=800,1000", "--virtual-time-budget=10000", "--dump-dom")
+    found = re.search(r'<pre id="found">read (.*?)</pre>', read, re.DOTALL)
+    if found is None:
+        return ["nothing: the page could not be read"]
+    return [html.unescape(one) for one in found[1].split("|") if one]
+
+
 class Page(html.parser.HTMLParser):
     """Collects the structure of a page and the problems with it."""
 
@@ -46,6 +74,7 @@ class Page(html.parser.HTMLParser):
         super().__init__(convert_charrefs=True)
         self.problems = []
         self.open = []
+        self.named = None  # the id of the element that was opened last
         self.headings = []
         self.ids = []
         self.referenced = []
@@ -53,13 +82,21 @@ class Page(html.parser.HTMLParser):
         self.text = []
         self.tables = []
         self.figures = []
+        self.landmarks = []  # of each its element, and its name or the id of the element that names it
+        self.names = {}  # texts of the elements that have an id
 
     def handle_starttag(self, tag, attributes):
         attributes = dict(attributes)
         self.seen.add(tag)
         if tag not in VOID:
             self.open.append(tag)
-        self.ids += [attributes["id"]] if "id" in attributes else []
+        if "id" in attributes:
+            self.ids.append(attributes["id"])
+            self.names[attributes["id"]] = ""
+            self.named = attributes["id"]
+        name = attributes.get("aria-label") or attributes.get("aria-labelledby")
+        if tag == "nav" or tag == "section" and name or attributes.get("role") == "region":
+            self.landmarks.append((tag, name))
         for name in ("aria-labelledby", "aria-describedby"):
             self.referenced += attributes.get(name, "").split()
         for name in ("src", "href", "xlink:href", "action", "data"):
@@ -92,6 +129,7 @@ class Page(html.parser.HTMLParser):
     def handle_endtag(self, tag):
         if tag in VOID:
             return
+        self.named = None
         if not self.open or self.open.pop() != tag:
             self.problems.append(f"</{tag}> closes nothing")
 
@@ -101,6 +139,8 @@ class Page(html.parser.HTMLParser):
                 self.problems.append("the style sheet loads something")
         else:
             self.text.append(data)
+            if self.named:
+                self.names[self.named] += data
 
 
 def problems_of(written, read, must_contain):
@@ -115,7 +155,7 @@ def problems_of(written, read, must_contain):
     text = re.sub(r"\s+", " ", "".join(drawn.text))
     wanted = [*must_contain, "How this was made"]
     found += [f"the text \"{one}\" is missing" for one in wanted if one not in text]
-    if not re.search(r"\b(PASS|FAIL|ERROR)\b", "".join(drawn.text[:40])):
+    if not re.search(r"\b(PASS|FAIL|ERROR|INTERRUPTED)\b", "".join(drawn.text[:40])):
         found.append("the verdict is not at the start")
     found += [f"there is no <{tag}>" for tag in LANDMARKS if tag not in drawn.seen]
     if drawn.headings.count(1) != 1 or drawn.headings[:1] != [1]:
@@ -127,6 +167,9 @@ def problems_of(written, read, must_contain):
               for table in drawn.tables if table != {"caption", "thead", "tbody"}]
     found += ["a figure lacks its caption, title or description"
               for figure in drawn.figures if figure != {"figcaption", "title", "desc"}]
+    landmarks = [(tag, drawn.names.get(name, name)) for tag, name in drawn.landmarks]
+    found += [f"two landmarks <{tag}> have the name {name}"
+              for tag, name in sorted(set(landmarks), key=str) if landmarks.count((tag, name)) > 1]
     twice = {one for one in drawn.ids if drawn.ids.count(one) > 1}
     found += [f"the id {one} is there twice" for one in sorted(twice)]
     found += [f"the id {one} is referred to and missing"
@@ -148,6 +191,9 @@ def main():
         read = browse(page, "--dump-dom")
         for problem in problems_of(page.read_text(), read, given.must_contain):
             print(f"{page}: {problem}")
+            failed = True
+        for what in cut_off(page):
+            print(f"{page}: cut off at a width of {NARROW}: {what}")
             failed = True
         if given.screenshot:
             given.screenshot.mkdir(parents=True, exist_ok=True)

@@ -63,6 +63,7 @@ class Output:
         self.open = set()
         self.known = set()
         self.hardware = set()
+        self.series = {}  # of each open series its step and how many elements it has
         self.met = []  # of the measurements with validators since the last diagnosis
 
     def demand(self, holds, reason):
@@ -107,10 +108,13 @@ class Output:
             self.known.add(step)
             self.open.add(step)
         self.demand(step in self.open, f"step {step} is not open")
+        self.read_series(step, content)
         if "testStepEnd" in content:
+            left = sorted(series for series, (of, _) in self.series.items() if of == step)
+            self.demand(not left, f"step {step} ends with open series: {left}")
             self.open.remove(step)
             self.failed_step |= content["testStepEnd"]["status"] == "ERROR"
-        for kind in ("measurement", "diagnosis"):
+        for kind in ("measurement", "measurementSeriesStart", "diagnosis"):
             named = content.get(kind, {}).get("hardwareInfoId")
             self.demand(named is None or named in self.hardware, f"unknown hardware {named}")
         if content.get("measurement", {}).get("validators"):
@@ -120,6 +124,24 @@ class Output:
             self.demand(verdict != "PASS" or all(self.met), "PASS although a validator is not met")
             self.demand(verdict != "FAIL" or not all(self.met), "FAIL although all validators are met")
             self.met = []
+
+    def read_series(self, step, content):
+        for kind in ("measurementSeriesStart", "measurementSeriesElement", "measurementSeriesEnd"):
+            if kind not in content:
+                continue
+            series = content[kind]["measurementSeriesId"]
+            if kind == "measurementSeriesStart":
+                self.demand(series not in self.series, f"series {series} starts twice")
+                self.series[series] = (step, 0)
+                continue
+            of, count = self.series.get(series, (None, 0))
+            self.demand(of == step, f"series {series} is not open in step {step}")
+            if kind == "measurementSeriesElement":
+                self.demand(content[kind]["index"] == count, f"series {series} has no element {count}")
+                self.series[series] = (step, count + 1)
+            else:
+                self.demand(content[kind]["totalCount"] == count, f"series {series} has {count} elements")
+                del self.series[series]
 
     def finish(self):
         self.demand(self.started, "the run never starts")

@@ -6,9 +6,9 @@
 #include <utility>
 
 #include "devices/observed/wrapper_table.h"
-#include "platform/sync.h"
 #include "platform/run_loop.h"
 #include "platform/run_tag.h"
+#include "platform/sync.h"
 
 namespace observed {
 

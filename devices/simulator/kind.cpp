@@ -7,6 +7,7 @@
 
 #include "devices/simulator/device.h"
 #include "devices/simulator/profile/reader.h"
+#include "devices/simulator/profile/writer.h"
 
 namespace simulator {
 
@@ -20,17 +21,36 @@ std::vector<devices::Entry> listGallery() {
     return entries;
 }
 
-devices::Device openProfile(const devices::Request& request) {
-    std::string problem;
-    const std::optional<DeviceProfile> profile =
-        loadProfile(request.what.empty() ? "healthy" : request.what, problem);
+// The usual device when nothing is asked for.
+std::optional<DeviceProfile> load(const std::string& what, std::vector<std::string>& problems) {
+    return loadProfile(what.empty() ? "healthy" : what, problems);
+}
+
+DeviceProfile loadOrThrow(const std::string& what) {
+    std::vector<std::string> problems;
+    std::optional<DeviceProfile> profile = load(what, problems);
     if (!profile.has_value()) {
-        throw std::invalid_argument(problem);
+        throw std::invalid_argument(problems.front());
     }
-    return {.name = profile->name,
-            .summary = profile->summary,
+    return *std::move(profile);
+}
+
+devices::Device openProfile(const devices::Request& request) {
+    const DeviceProfile profile = loadOrThrow(request.what);
+    return {.name = profile.name,
+            .summary = profile.summary,
             .facts = {{"platform", "simulated device"}},
-            .services = makeDevice(*profile, request.speed)};
+            .services = makeDevice(profile, request.speed)};
+}
+
+std::string showProfile(const std::string& what) {
+    return profileText(loadOrThrow(what));
+}
+
+std::vector<std::string> checkProfile(const std::string& what) {
+    std::vector<std::string> problems;
+    load(what, problems);
+    return problems;
 }
 
 }  // namespace
@@ -41,7 +61,9 @@ devices::Kind kind() {
             .takesSpeed = true,
             .hasFaults = true,
             .list = listGallery,
-            .open = openProfile};
+            .open = openProfile,
+            .show = showProfile,
+            .check = checkProfile};
 }
 
 }  // namespace simulator

@@ -26,6 +26,10 @@ inline constexpr CountParameter kCountParameters[] = {{"frameCount", Counted::Fr
 // The parameter of an experiment that limits its time, in seconds.
 inline constexpr std::string_view kTimeoutParameter = "timeout";
 
+// The entry of a frame's metadata that a device may add: the sensor's own number of the frame. The
+// plug-in does not read it.
+inline constexpr std::string_view kSensorFrameNumber = "FrameNumber";
+
 // The entries of a frame's metadata that are drawn.
 inline constexpr std::string_view kLightSource = kRylCaptureStreamMetadata_InfraredLightSource;
 

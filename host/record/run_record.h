@@ -5,11 +5,13 @@
 #ifndef ZR_HOST_RECORD_RUN_RECORD_H
 #define ZR_HOST_RECORD_RUN_RECORD_H
 
+#include <algorithm>
 #include <array>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -97,8 +99,10 @@ struct LogRecord {
 // A frame that the device delivered, with what a report draws of it.
 struct FrameRecord {
     std::uint64_t number;  // as received: 1 for the first, frames lost on the way not counted
-    double presentation;   // seconds on the device's clock
-    double delivered;      // seconds of real time since the run began
+    // The sensor's own count, which a lost frame advances too; absent when the metadata has none.
+    std::optional<std::int64_t> sensorNumber;
+    double presentation;  // seconds on the device's clock
+    double delivered;     // seconds of real time since the run began
     std::optional<double> lightSource;
     // As the metadata carries them, in the order of kTemperatures.
     std::array<std::optional<double>, kTemperatureCount> temperatures;
@@ -118,9 +122,13 @@ struct RunRecord {
     std::vector<MeasurementRecord> measurements;  // of the experiment, by name
     platform::Dictionary auxiliaryData;           // of the experiment
     std::vector<ResultRecord> results;            // of the analysis, in its order
-    std::vector<FailureRecord> failures;          // empty unless the verdict is Error
+    std::vector<FailureRecord> failures;          // empty when the verdict is about results
     std::vector<LogRecord> log;                   // lines of the run, in the order they came
-    std::vector<FrameRecord> frames;              // kept only when a report draws them
+    std::uint64_t framesDelivered = 0;
+    // By the sensor's numbers; absent when no frame had one.
+    std::optional<std::uint64_t> framesLost;
+    std::uint64_t imagesDelivered = 0;
+    std::vector<FrameRecord> frames;  // kept only when a report draws them
     Verdict verdict = Verdict::Error;
 };
 
@@ -136,11 +144,20 @@ struct ResultStatistics {
     double maximum = 0;
 };
 
-// A repetition that did not pass, and why in one line.
+// A repetition that did not pass.
 struct Repetition {
-    std::uint64_t number;
+    std::uint64_t number;  // from 1
     Verdict verdict;
-    std::string why;
+    double seconds;
+    std::string why;                      // in one line
+    std::vector<ResultRecord> outside;    // its results outside their limits
+    std::vector<FailureRecord> failures;  // its failed steps
+};
+
+// What is kept of every repetition, also of one that passed.
+struct RepetitionOutcome {
+    Verdict verdict;
+    double seconds;
 };
 
 // The repetitions of one diagnostic or experiment.
@@ -151,11 +168,17 @@ struct RepeatRecord {
     std::uint64_t failed = 0;
     std::uint64_t errors = 0;
     std::uint64_t interrupted = 0;  // the last one, when the program was asked to stop during it
-    double seconds = 0;  // of all runs
+    double seconds = 0;             // of all runs
     std::vector<ResultStatistics> results;
     std::vector<Repetition> notPassed;  // the first kMostRepetitions of them
+    // The first kMostOutcomes repetitions, in their order. With the bound on those that did not pass,
+    // a series of any length takes a few megabytes at most.
+    std::vector<RepetitionOutcome> outcomes;
+
+    std::uint64_t notPassedCount() const { return runs - passed; }
 };
 inline constexpr std::size_t kMostRepetitions = 100;
+inline constexpr std::size_t kMostOutcomes = 1000;
 
 // Everything that one call of the program did.
 struct SessionRecord {
@@ -176,6 +199,15 @@ struct SessionRecord {
     // One entry per name when runs were repeated; empty otherwise.
     std::vector<RepeatRecord> repeats;
     Verdict verdict = Verdict::Passed;  // the worst of all runs, repetitions included
+
+    // The names that were planned and not started.
+    std::span<const RunPlan> notStarted() const {
+        return std::span(planned).subspan(std::min(runs.size(), planned.size()));
+    }
+    // The figures of the run at that place; null when it was not repeated.
+    const RepeatRecord* repeatOf(std::size_t at) const {
+        return at < repeats.size() ? &repeats[at] : nullptr;
+    }
 };
 
 }  // namespace host

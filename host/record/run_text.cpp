@@ -1,7 +1,9 @@
 #include "host/record/run_text.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
+#include <cstdint>
 
 #include <fmt/format.h>
 
@@ -22,6 +24,51 @@ std::string_view verdictText(Verdict verdict) {
             break;
     }
     return "INTERRUPTED";
+}
+
+std::string_view verdictName(Verdict verdict) {
+    static constexpr std::string_view kNames[] = {"pass", "fail", "error", "interrupted"};
+    return kNames[static_cast<std::size_t>(verdict)];
+}
+
+namespace {
+
+std::string countsText(std::uint64_t passed,
+                       std::uint64_t failed,
+                       std::uint64_t errors,
+                       std::uint64_t interrupted,
+                       std::uint64_t notStarted) {
+    std::string text = fmt::format("{} passed, {} failed, {} in error", passed, failed, errors);
+    text += interrupted > 0 ? fmt::format(", {} interrupted", interrupted) : "";
+    return text + (notStarted > 0 ? fmt::format(", {} not started", notStarted) : "");
+}
+
+// How far an interrupted run came: "37 of 90 frames". Empty when nothing is known of it.
+std::string progressText(const RunRecord& run) {
+    for (const CountParameter& count : kCountParameters) {
+        const platform::Number wanted = run.plan.experiment.parameter(count.parameter);
+        if (wanted.isPresent()) {
+            return fmt::format(
+                "{} of {} {}",
+                count.counted == Counted::Frames ? run.framesDelivered : run.imagesDelivered,
+                wanted.text(), count.plural);
+        }
+    }
+    return "";
+}
+
+}  // namespace
+
+std::string countsText(const RepeatRecord& repeat) {
+    return countsText(repeat.passed, repeat.failed, repeat.errors, repeat.interrupted, 0);
+}
+
+std::string countsText(const SessionRecord& session) {
+    std::array<std::uint64_t, 4> counts{};
+    for (const RunRecord& run : session.runs) {
+        ++counts[static_cast<std::size_t>(run.verdict)];
+    }
+    return countsText(counts[0], counts[1], counts[2], counts[3], session.notStarted().size());
 }
 
 std::string_view partText(Part part) {
@@ -81,7 +128,8 @@ std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view 
 
 std::string headline(const RunRecord& run) {
     if (run.verdict == Verdict::Interrupted) {
-        return "stopped before its end";
+        const std::string progress = progressText(run);
+        return progress.empty() ? "stopped before its end" : "stopped after " + progress;
     }
     if (run.verdict == Verdict::Error) {
         return "did not complete";
@@ -102,6 +150,20 @@ std::string headline(const RunRecord& run) {
                        : fmt::format("all {} limits met", limited);
 }
 
+std::string interruptionText(const SessionRecord& session) {
+    if (!session.runs.empty()) {
+        const RunRecord& last = session.runs.back();
+        if (last.verdict == Verdict::Interrupted) {
+            return last.plan.name + " " + headline(last);
+        }
+        const RepeatRecord* repeat = session.repeatOf(session.runs.size() - 1);
+        if (repeat != nullptr && repeat->interrupted > 0) {
+            return fmt::format("{} stopped in run {}", last.plan.name, repeat->runs);
+        }
+    }
+    return "stopped between two runs";
+}
+
 std::string whyText(const RunRecord& run) {
     if (!run.failures.empty()) {
         return plainLine(failureText(run.failures.front()));
@@ -113,7 +175,7 @@ std::string whyText(const RunRecord& run) {
                                          limitLine(result.limit, result.unit)));
         }
     }
-    return "";
+    return run.verdict == Verdict::Interrupted ? headline(run) : "";
 }
 
 const PartPlan& partOf(const RunRecord& run, Part part) {
@@ -149,6 +211,31 @@ std::string causeText(const FailureRecord& failure, std::string_view separator) 
 std::string_view levelText(platform::LogLevel level) {
     static constexpr std::string_view kTexts[] = {"debug", "default", "error"};
     return kTexts[static_cast<std::size_t>(level)];
+}
+
+std::string levelText(const LogRecord& line) {
+    return std::string(levelText(line.level)) + (line.late ? ", late" : "");
+}
+
+std::string framesText(const RunRecord& run) {
+    if (run.framesDelivered == 0) {
+        return "";
+    }
+    std::string text = plural(run.framesDelivered, "frame", "frames") + " delivered";
+    if (run.framesLost.has_value()) {
+        text += fmt::format(", {} lost", *run.framesLost);
+    }
+    return text;
+}
+
+bool isNumberedApart(const FrameRecord& frame) {
+    return frame.sensorNumber.has_value() &&
+           static_cast<std::uint64_t>(*frame.sensorNumber) != frame.number;
+}
+
+std::string frameText(const FrameRecord& frame) {
+    return fmt::format("frame {}", frame.number) +
+           (isNumberedApart(frame) ? fmt::format(" (the sensor's {})", *frame.sensorNumber) : "");
 }
 
 }  // namespace host

@@ -14,6 +14,14 @@ namespace host {
 // "PASS", "FAIL", "ERROR", "INTERRUPTED".
 std::string_view verdictText(Verdict verdict);
 
+// The verdict as part of a name: "pass", "fail", "error", "interrupted".
+std::string_view verdictName(Verdict verdict);
+
+// How many runs ended how, and how many names were not started. Counts that are seldom needed are left
+// out when zero: "3 passed, 1 failed, 0 in error, 1 interrupted, 2 not started".
+std::string countsText(const RepeatRecord& repeat);
+std::string countsText(const SessionRecord& session);
+
 // "experiment", "analysis".
 std::string_view partText(Part part);
 
@@ -37,11 +45,15 @@ std::string valueText(double value, std::string_view unit);
 // "Max Reports: 0 … 0 events", "no limit".
 std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view unit);
 
-// The outcome of the run in a few words: "2 of 64 limits not met".
+// The outcome of the run in a few words: "2 of 64 limits not met", "stopped after 37 of 90 frames".
 std::string headline(const RunRecord& run);
 
+// What an interrupted session was stopped in: "NAME stopped after 37 of 90 frames", "NAME stopped in run
+// 8", "stopped between two runs".
+std::string interruptionText(const SessionRecord& session);
+
 // Why the run did not pass, in one line that cannot control a terminal: its first failure, or its first
-// result outside its limit. Empty when it passed.
+// result outside its limit, or that it was stopped. Empty when it passed.
 std::string whyText(const RunRecord& run);
 
 // The part of the run's plan; an experiment on its own has no analysis.
@@ -60,6 +72,20 @@ std::string causeText(const FailureRecord& failure, std::string_view separator);
 
 // "debug", "default", "error".
 std::string_view levelText(platform::LogLevel level);
+
+// The line's level, and whether it came late: "error", "error, late".
+std::string levelText(const LogRecord& line);
+
+// "90 frames delivered, 3 lost"; without the second when the sensor's numbers are not known.
+// Empty when the run delivered no frames.
+std::string framesText(const RunRecord& run);
+
+// Whether the sensor's number of the frame is another than the received one.
+bool isNumberedApart(const FrameRecord& frame);
+
+// The frame by its received number, and by the sensor's where that differs: "frame 41 (the sensor's
+// 44)".
+std::string frameText(const FrameRecord& frame);
 
 }  // namespace host
 

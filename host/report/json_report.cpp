@@ -96,6 +96,55 @@ Json arrayOf(const Records& records, Convert&& convert) {
     return array;
 }
 
+Json failuresOf(const std::vector<FailureRecord>& failures) {
+    return arrayOf(failures, [](const FailureRecord& failure) {
+        return Json{{"part", partText(failure.part)},
+                    {"step", failure.step},
+                    {"message", failureText(failure)},
+                    {"error", jsonOf(failure.error)}};
+    });
+}
+
+Json resultsOf(const std::vector<ResultRecord>& results) {
+    return arrayOf(results, [](const ResultRecord& result) {
+        return Json{{"name", result.name},
+                    {"value", jsonOf(result.value)},
+                    {"unit", result.unit},
+                    {"judgement", judgementText(result.judgement)},
+                    {"limit", jsonOf(result.limit)}};
+    });
+}
+
+template <class Value>
+Json jsonOf(const std::optional<Value>& value) {
+    return value.has_value() ? Json(*value) : Json();
+}
+
+Json jsonOf(const FrameRecord& frame) {
+    Json temperatures = Json::object();
+    for (std::size_t at = 0; at < kTemperatureCount; ++at) {
+        if (frame.temperatures[at].has_value()) {
+            temperatures[std::string(kTemperatures[at].key)] = jsonOf(*frame.temperatures[at]);
+        }
+    }
+    return {{"number", frame.number},
+            {"sensorNumber", jsonOf(frame.sensorNumber)},
+            {"presentation", jsonOf(frame.presentation)},
+            {"delivered", jsonOf(frame.delivered)},
+            {"lightSource", frame.lightSource.has_value() ? jsonOf(*frame.lightSource) : Json()},
+            {"temperatures", std::move(temperatures)}};
+}
+
+Json jsonOf(const LogRecord& line) {
+    Json object{{"time", line.time.timestamp()},
+                {"level", levelText(line.level)},
+                {"message", line.message}};
+    if (line.late) {
+        object["late"] = true;
+    }
+    return object;
+}
+
 Json jsonOf(const RunRecord& run) {
     Json object{{"name", run.plan.name},
                 {"summary", run.plan.summary},
@@ -107,19 +156,8 @@ Json jsonOf(const RunRecord& run) {
                 {"analysis", run.analysisSeconds.has_value()
                                  ? jsonOf(*run.plan.analysis, *run.analysisSeconds)
                                  : Json()}};
-    object["failures"] = arrayOf(run.failures, [](const FailureRecord& failure) {
-        return Json{{"part", partText(failure.part)},
-                    {"step", failure.step},
-                    {"message", failureText(failure)},
-                    {"error", jsonOf(failure.error)}};
-    });
-    object["results"] = arrayOf(run.results, [](const ResultRecord& result) {
-        return Json{{"name", result.name},
-                    {"value", jsonOf(result.value)},
-                    {"unit", result.unit},
-                    {"judgement", judgementText(result.judgement)},
-                    {"limit", jsonOf(result.limit)}};
-    });
+    object["failures"] = failuresOf(run.failures);
+    object["results"] = resultsOf(run.results);
     object["measurements"] = arrayOf(run.measurements, [](const MeasurementRecord& measurement) {
         return Json{{"name", measurement.name},
                     {"value", jsonOf(measurement.value)},
@@ -128,34 +166,19 @@ Json jsonOf(const RunRecord& run) {
     const platform::Value auxiliary(run.auxiliaryData);
     object["auxiliaryData"] = jsonOf(auxiliary);
     object["auxiliaryDataKinds"] = kindsOf(auxiliary);
-    object["frames"] = arrayOf(run.frames, [](const FrameRecord& frame) {
-        Json temperatures = Json::object();
-        for (std::size_t at = 0; at < kTemperatureCount; ++at) {
-            if (frame.temperatures[at].has_value()) {
-                temperatures[std::string(kTemperatures[at].key)] = jsonOf(*frame.temperatures[at]);
-            }
-        }
-        return Json{
-            {"number", frame.number},
-            {"presentation", jsonOf(frame.presentation)},
-            {"delivered", jsonOf(frame.delivered)},
-            {"lightSource", frame.lightSource.has_value() ? jsonOf(*frame.lightSource) : Json()},
-            {"temperatures", std::move(temperatures)}};
-    });
-    object["log"] = arrayOf(run.log, [](const LogRecord& line) {
-        return Json{{"time", line.time.timestamp()},
-                    {"level", levelText(line.level)},
-                    {"message", line.message}};
-    });
+    object["framesDelivered"] = run.framesDelivered;
+    object["framesLost"] = jsonOf(run.framesLost);
+    object["imagesDelivered"] = run.imagesDelivered;
+    object["frames"] = arrayOf(run.frames, [](const FrameRecord& frame) { return jsonOf(frame); });
+    object["log"] = arrayOf(run.log, [](const LogRecord& line) { return jsonOf(line); });
     return object;
 }
 
 Json jsonOf(const RepeatRecord& repeat) {
-    Json object{{"name", repeat.name},
-                {"runs", repeat.runs},
-                {"passed", repeat.passed},
-                {"failed", repeat.failed},
-                {"errors", repeat.errors}};
+    Json object{{"name", repeat.name},      {"runs", repeat.runs},
+                {"passed", repeat.passed},  {"failed", repeat.failed},
+                {"errors", repeat.errors},  {"interrupted", repeat.interrupted},
+                {"seconds", repeat.seconds}};
     object["results"] = arrayOf(repeat.results, [](const ResultStatistics& result) {
         return Json{{"name", result.name},
                     {"unit", result.unit},
@@ -167,7 +190,15 @@ Json jsonOf(const RepeatRecord& repeat) {
                     {"limit", jsonOf(result.limit)}};
     });
     object["notPassed"] = arrayOf(repeat.notPassed, [](const Repetition& one) {
-        return Json{{"run", one.number}, {"verdict", verdictText(one.verdict)}, {"why", one.why}};
+        return Json{{"run", one.number},
+                    {"verdict", verdictText(one.verdict)},
+                    {"seconds", one.seconds},
+                    {"why", one.why},
+                    {"failures", failuresOf(one.failures)},
+                    {"outside", resultsOf(one.outside)}};
+    });
+    object["outcomes"] = arrayOf(repeat.outcomes, [](const RepetitionOutcome& one) {
+        return Json{{"verdict", verdictText(one.verdict)}, {"seconds", one.seconds}};
     });
     return object;
 }
@@ -193,6 +224,8 @@ std::string jsonReport(const SessionRecord& session) {
                   {"seconds", session.seconds},
                   {"verdict", verdictText(session.verdict)}};
     document["runs"] = arrayOf(session.runs, [](const RunRecord& run) { return jsonOf(run); });
+    document["notStarted"] =
+        arrayOf(session.notStarted(), [](const RunPlan& plan) { return Json(plan.name); });
     document["repeats"] =
         arrayOf(session.repeats, [](const RepeatRecord& repeat) { return jsonOf(repeat); });
     // Text that is not UTF-8 (it may come from a device) must not stop the report.

@@ -1,6 +1,9 @@
 #include "host/report/jsonl_report.h"
 
+#include <chrono>
+#include <functional>
 #include <optional>
+#include <vector>
 
 #include <fmt/format.h>
 #include <nlohmann/json.hpp>
@@ -96,14 +99,9 @@ Json validatorsOf(const LimitRecord& limit) {
 }
 
 Json diagnosisOf(const RunRecord& run) {
-    struct Row {
-        const char* suffix;
-        const char* type;
-    };
-    static constexpr Row kRows[] = {{"pass", "PASS"}, {"fail", "FAIL"}, {"error", "UNKNOWN"}};
-    const Row& row = kRows[static_cast<std::size_t>(run.verdict)];
-    return {{"verdict", run.plan.name + "-" + row.suffix},
-            {"type", row.type},
+    static constexpr std::string_view kTypes[] = {"PASS", "FAIL", "UNKNOWN", "UNKNOWN"};
+    return {{"verdict", fmt::format("{}-{}", run.plan.name, verdictName(run.verdict))},
+            {"type", kTypes[static_cast<std::size_t>(run.verdict)]},
             {"message", headline(run)},
             {"hardwareInfoId", kHardwareId}};
 }
@@ -115,6 +113,48 @@ std::string_view severityText(platform::LogLevel level) {
 
 std::string_view statusText(bool failed) {
     return failed ? "ERROR" : "COMPLETE";
+}
+
+Json errorOf(const std::string& symptom, const std::string& message) {
+    return {{"symptom", symptom},
+            {"message", message},
+            {"softwareInfoIds", Json::array({kSoftwareId})}};
+}
+
+// When the frame was delivered.
+platform::Date timeOf(const FrameRecord& frame, const RunRecord& run) {
+    const std::chrono::duration<double> sinceStart(frame.delivered);
+    return platform::Date(
+        run.started.moment() +
+        std::chrono::duration_cast<std::chrono::system_clock::duration>(sinceStart));
+}
+
+// A quantity of the frames that is written as a series; `value` is absent where a frame lacks it.
+struct FrameSeries {
+    std::string name;
+    std::string unit;  // empty when nothing specifies it
+    std::function<std::optional<double>(const FrameRecord& frame, const FrameRecord* before)> value;
+};
+
+std::vector<FrameSeries> frameSeries() {
+    const auto interval = [](double FrameRecord::*clock) {
+        return [clock](const FrameRecord& frame, const FrameRecord* before) {
+            return before != nullptr ? std::optional((frame.*clock - before->*clock) * 1000)
+                                     : std::nullopt;
+        };
+    };
+    std::vector<FrameSeries> all = {
+        {"frame interval, device's clock", "ms", interval(&FrameRecord::presentation)},
+        {"frame interval, arrival", "ms", interval(&FrameRecord::delivered)},
+        {"light source", "",
+         [](const FrameRecord& frame, const FrameRecord*) { return frame.lightSource; }}};
+    for (std::size_t at = 0; at < kTemperatureCount; ++at) {
+        all.push_back({std::string(kTemperatures[at].key), "",
+                       [at](const FrameRecord& frame, const FrameRecord*) {
+                           return frame.temperatures[at];
+                       }});
+    }
+    return all;
 }
 
 }  // namespace
@@ -136,19 +176,33 @@ void JsonlReport::runStarted(const RunRecord& /*run*/) {
 void JsonlReport::partStarted(const RunRecord& run, Part part) {
     const platform::MutexLock lock(_mutex);
     _closeStep();
+    _part = part;
     _step = fmt::format("{}-{}-{}-{}", _steps++, run.plan.name, run.number, partText(part));
     _writeStep("testStepStart", {{"name", partOf(run, part).name}});
 }
 
 void JsonlReport::logged(const LogRecord& line) {
     const platform::MutexLock lock(_mutex);
-    if (!_ended) {
-        _writeHere("log", {{"severity", severityText(line.level)}, {"message", line.message}});
+    if (_ended) {
+        return;
+    }
+    Json content{{"severity", severityText(line.level)}, {"message", line.message}};
+    if (line.late) {
+        // Not into the step that is open, which belongs to another run.
+        content["message"] = "late: " + line.message;
+        _writeRun("log", std::move(content));
+    } else {
+        _writeHere("log", std::move(content));
     }
 }
 
 void JsonlReport::partEnded(const RunRecord& run, Part part) {
     const platform::MutexLock lock(_mutex);
+    _writePart(run, part);
+}
+
+void JsonlReport::_writePart(const RunRecord& run, Part part) {
+    _part.reset();
     if (part == Part::Experiment) {
         for (const MeasurementRecord& one : run.measurements) {
             _writeStep("measurement", measurementOf(one.name, one.value, one.unit));
@@ -164,6 +218,7 @@ void JsonlReport::partEnded(const RunRecord& run, Part part) {
                              content.is_object() ? std::move(content) : Json{{"value", content}}}});
             }
         }
+        _writeFrames(run);
     } else {
         for (const ResultRecord& one : run.results) {
             Json measurement = measurementOf(one.name, one.value, one.unit);
@@ -179,7 +234,12 @@ void JsonlReport::partEnded(const RunRecord& run, Part part) {
 
 void JsonlReport::runEnded(const RunRecord& run) {
     const platform::MutexLock lock(_mutex);
-    if (run.plan.isDiagnostic()) {
+    // A part that was given up has not ended; what it had found until then is in the record.
+    if (_part.has_value()) {
+        _writePart(run, *_part);
+    }
+    _stepFailed = _stepFailed || run.verdict == Verdict::Interrupted;
+    if (run.plan.isDiagnostic() && !_step.empty()) {
         _writeStep("diagnosis", diagnosisOf(run));
     }
     _closeStep();
@@ -188,9 +248,20 @@ void JsonlReport::runEnded(const RunRecord& run) {
 }
 
 void JsonlReport::sessionEnded(const SessionRecord& session) {
-    static constexpr std::string_view kResults[] = {"PASS", "FAIL", "NOT_APPLICABLE"};
+    static constexpr std::string_view kResults[] = {"PASS", "FAIL", "NOT_APPLICABLE",
+                                                    "NOT_APPLICABLE"};
     const platform::MutexLock lock(_mutex);
-    _writeRun("testRunEnd", {{"status", statusText(session.verdict == Verdict::Error)},
+    for (const RunPlan& plan : session.notStarted()) {
+        _step = fmt::format("{}-{}-not-started", _steps++, plan.name);
+        _writeStep("testStepStart", {{"name", plan.experiment.name}});
+        _writeStep("log", {{"severity", "INFO"}, {"message", "not started"}});
+        _writeStep("testStepEnd", {{"status", "SKIP"}});
+        _step.clear();
+    }
+    if (session.verdict == Verdict::Interrupted) {
+        _writeRun("error", errorOf("interrupted", interruptionText(session)));
+    }
+    _writeRun("testRunEnd", {{"status", statusText(session.verdict >= Verdict::Error)},
                              {"result", kResults[static_cast<std::size_t>(session.verdict)]}});
     _ended = true;
 }
@@ -229,9 +300,51 @@ void JsonlReport::_writeHere(std::string_view kind, Json content) {
 void JsonlReport::_writeFailures(const RunRecord& run) {
     for (; _failuresWritten < run.failures.size(); ++_failuresWritten) {
         const FailureRecord& failure = run.failures[_failuresWritten];
-        _writeHere("error", {{"symptom", symptomText(failure, "-")},
-                             {"message", placeText(failure, run) + ": " + causeText(failure, "; ")},
-                             {"softwareInfoIds", Json::array({kSoftwareId})}});
+        _writeHere("error", errorOf(symptomText(failure, "-"),
+                                    placeText(failure, run) + ": " + causeText(failure, "; ")));
+    }
+}
+
+void JsonlReport::_writeFrames(const RunRecord& run) {
+    if (run.framesDelivered > 0) {
+        Json content{{"delivered", run.framesDelivered}};
+        if (run.framesLost.has_value()) {
+            content["lost"] = *run.framesLost;
+        }
+        _writeStep("extension", {{"name", "frames"}, {"content", std::move(content)}});
+    }
+    for (const FrameSeries& one : frameSeries()) {
+        const std::string id = fmt::format("series-{}", _series++);
+        std::uint64_t count = 0;
+        const FrameRecord* before = nullptr;
+        for (const FrameRecord& frame : run.frames) {
+            const std::optional<double> value = one.value(frame, before);
+            before = &frame;
+            if (!value.has_value()) {
+                continue;
+            }
+            if (count == 0) {
+                Json start{{"name", one.name}, {"measurementSeriesId", id}};
+                if (!one.unit.empty()) {
+                    start["unit"] = one.unit;
+                }
+                start["hardwareInfoId"] = kHardwareId;
+                _writeStep("measurementSeriesStart", std::move(start));
+            }
+            Json element{{"index", count++},
+                         {"value", jsonOf(*value)},
+                         {"timestamp", timeOf(frame, run).timestamp()},
+                         {"measurementSeriesId", id},
+                         {"metadata", {{"frame", frame.number}}}};
+            if (isNumberedApart(frame)) {
+                element["metadata"]["sensorFrame"] = *frame.sensorNumber;
+            }
+            _writeStep("measurementSeriesElement", std::move(element));
+        }
+        if (count > 0) {
+            _writeStep("measurementSeriesEnd",
+                       {{"measurementSeriesId", id}, {"totalCount", count}});
+        }
     }
 }
 

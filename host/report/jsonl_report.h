@@ -6,11 +6,16 @@
 //   testRunStart   the planned runs with their parameters, the device as the unit under test
 //   measurement    in an experiment's step what it measured; in an analysis's step each judged result
 //                  with its limit as validators, which carry the limit's name
-//   extension      one for each element of a list in the experiment's auxiliary data ("images")
+//   measurementSeries…  in the experiment's step one series per quantity of the frames that the page draws
+//   extension      one for each element of a list in the experiment's auxiliary data ("images"); one with
+//                  the counts of frames delivered and lost ("frames")
 //   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
-//                  causes as message
-//   diagnosis      one per diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error"
-//   log            in the step that is open, between steps in the run
+//                  causes as message; "interrupted" in the run when the program was asked to stop
+//   diagnosis      one per diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error",
+//                  "NAME-interrupted"
+//   log            in the step that is open; in the run between steps, and for a line that came when its
+//                  run had ended
+// A name that was not started has one step, which ends with the status SKIP.
 // Numbers are written as host/report/json_value.h says.
 #ifndef ZR_HOST_REPORT_JSONL_REPORT_H
 #define ZR_HOST_REPORT_JSONL_REPORT_H
@@ -18,6 +23,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -53,6 +59,9 @@ class JsonlReport final : public RunListener {
     void _writeStep(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
     // In the step that is open, else in the run.
     void _writeHere(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
+    // What the part has found, and its failures.
+    void _writePart(const RunRecord& run, Part part) ZR_REQUIRES(_mutex);
+    void _writeFrames(const RunRecord& run) ZR_REQUIRES(_mutex);
     void _writeFailures(const RunRecord& run) ZR_REQUIRES(_mutex);
     void _closeStep() ZR_REQUIRES(_mutex);
 
@@ -61,10 +70,13 @@ class JsonlReport final : public RunListener {
     platform::Mutex _mutex;
     std::uint64_t _sequenceNumber ZR_GUARDED_BY(_mutex) = 0;
     std::uint64_t _steps ZR_GUARDED_BY(_mutex) = 0;
+    std::uint64_t _series ZR_GUARDED_BY(_mutex) = 0;
     // The step that is open; empty when none is. It stays open until the next one begins or the
     // verdict is known: a diagnosis can only be written in a step.
     std::string _step ZR_GUARDED_BY(_mutex);
     bool _stepFailed ZR_GUARDED_BY(_mutex) = false;
+    // The part that has started and not ended.
+    std::optional<Part> _part ZR_GUARDED_BY(_mutex);
     std::size_t _failuresWritten ZR_GUARDED_BY(_mutex) = 0;
     bool _ended ZR_GUARDED_BY(_mutex) = false;
 };

@@ -1,8 +1,12 @@
 #include "host/report/junit_report.h"
 
+#include <algorithm>
+#include <cstddef>
 #include <cstdint>
+#include <set>
 #include <sstream>
 #include <string_view>
+#include <vector>
 
 #include <fmt/format.h>
 #include <pugixml.hpp>
@@ -18,6 +22,7 @@ struct Counts {
     std::uint64_t tests = 0;
     std::uint64_t failures = 0;
     std::uint64_t errors = 0;
+    std::uint64_t skipped = 0;
 };
 
 void setAttribute(pugi::xml_node node, const char* name, std::string_view value) {
@@ -38,19 +43,59 @@ void setCounts(pugi::xml_node node, const Counts& counts) {
     node.append_attribute("errors").set_value(counts.errors);
 }
 
+// "DEVICE.NAME": a CI system takes the dots for levels and splits at blanks, so the device has neither.
+std::string classNameOf(const SessionRecord& session, std::string_view name) {
+    std::string device = session.deviceName;
+    std::replace_if(
+        device.begin(), device.end(), [](unsigned char c) { return c == '.' || c <= ' '; }, '_');
+    return fmt::format("{}.{}", device, name);
+}
+
+// The names of the results that a run of this name has in the session.
+std::vector<std::string_view> resultNames(const SessionRecord& session, std::string_view name) {
+    std::vector<std::string_view> names;
+    const auto add = [&names](const auto& results) {
+        for (const auto& result : results) {
+            if (std::find(names.begin(), names.end(), result.name) == names.end()) {
+                names.push_back(result.name);
+            }
+        }
+    };
+    for (std::size_t at = 0; at < session.runs.size(); ++at) {
+        if (session.runs[at].plan.name == name) {
+            const RepeatRecord* repeat = session.repeatOf(at);
+            add(session.runs[at].results);
+            if (repeat != nullptr) {
+                add(repeat->results);
+            }
+        }
+    }
+    return names;
+}
+
 // Writes the suite of one run.
 class Suite {
   public:
-    Suite(pugi::xml_node node, const SessionRecord& session, const RunRecord& run)
-        : _node(node), _session(session), _run(run) {}
+    Suite(pugi::xml_node node,
+          const SessionRecord& session,
+          const RunRecord& run,
+          const RepeatRecord* repeat)
+        : _node(node)
+        , _session(session)
+        , _run(run)
+        , _repeat(repeat)
+        , _className(classNameOf(session, run.plan.name)) {}
 
-    Counts write(const RepeatRecord* repeat) {
+    Counts write() {
         setAttribute(_node, "name", _run.plan.name);
         setAttribute(_node, "timestamp", _run.started.timestamp());
-        setSeconds(_node, repeat != nullptr ? repeat->seconds : _run.seconds);
+        setSeconds(_node, _repeat != nullptr ? _repeat->seconds : _run.seconds);
         _properties = _node.append_child("properties");
-        _property("device", _session.deviceName);
+        _property("verdict", verdictText(_run.verdict));
+        _property("version", _session.version);
         _property("commandLine", _session.commandLine);
+        _property("device", _session.deviceName);
+        _property("deviceSummary", _session.deviceSummary);
         for (const auto& [name, text] : _session.deviceFacts) {
             _property("device." + name, text);
         }
@@ -58,27 +103,41 @@ class Suite {
         if (_run.analysisSeconds.has_value()) {
             _parameters(Part::Analysis);
         }
+        if (_run.framesDelivered > 0) {
+            _property("frames", framesText(_run));
+        }
+        // The results repeat the measurements.
+        for (const MeasurementRecord& one : _run.measurements) {
+            if (_run.results.empty()) {
+                _property("measurement." + one.name, valueText(one.value, one.unit));
+            }
+        }
         for (const FailureRecord& failure : _run.failures) {
             _failedStep(failure);
         }
-        if (repeat != nullptr) {
-            _repetitions(*repeat);
+        if (_run.verdict == Verdict::Interrupted) {
+            _error(_case("run"), "interrupted", headline(_run), headline(_run));
+        }
+        if (_repeat != nullptr) {
+            _repetitions();
         } else {
             _singleRun();
+        }
+        if (_run.verdict >= Verdict::Error) {
+            _missingResults();
         }
         if (_counts.tests == 0) {
             setSeconds(_case("run"), _run.experimentSeconds);
         }
         std::string log;
         for (const LogRecord& line : _run.log) {
-            log += fmt::format("{} {}: {}\n", line.time.timestamp(), levelText(line.level),
-                               line.message);
+            log += fmt::format("{} {}: {}\n", line.time.timestamp(), levelText(line), line.message);
         }
         if (!log.empty()) {
             setText(_node, "system-out", log);
         }
         setCounts(_node, _counts);
-        _node.append_attribute("skipped").set_value(0);
+        _node.append_attribute("skipped").set_value(_counts.skipped);
         return _counts;
     }
 
@@ -99,7 +158,8 @@ class Suite {
         ++_counts.tests;
         pugi::xml_node node = _node.append_child("testcase");
         setAttribute(node, "name", name);
-        setAttribute(node, "classname", _run.plan.name);
+        setAttribute(node, "classname", _className);
+        _cases.insert(std::string(name));
         return node;
     }
 
@@ -144,18 +204,26 @@ class Suite {
                                 limitLine(result.limit, result.unit)),
                     result.judgement == Judgement::Outside);
         }
-        if (!_run.plan.isDiagnostic()) {
-            for (const MeasurementRecord& one : _run.measurements) {
-                _property("measurement." + one.name, valueText(one.value, one.unit));
+    }
+
+    // The results that another run of the session shows to belong to this one, which has not got as far.
+    void _missingResults() {
+        for (const std::string_view name : resultNames(_session, _run.plan.name)) {
+            if (_cases.count(std::string(name)) == 0) {
+                ++_counts.skipped;
+                setAttribute(_case(name).append_child("skipped"), "message",
+                             "not known: the run " + headline(_run));
             }
         }
     }
 
-    void _repetitions(const RepeatRecord& repeat) {
+    void _repetitions() {
+        const RepeatRecord& repeat = *_repeat;
         _property("runs", std::to_string(repeat.runs));
         _property("passed", std::to_string(repeat.passed));
         _property("failed", std::to_string(repeat.failed));
         _property("errors", std::to_string(repeat.errors));
+        _property("interrupted", std::to_string(repeat.interrupted));
         _property("run shown", std::to_string(_run.number));
         // A failed step of the run that is shown has a case of its own.
         if (repeat.errors > 0 && _run.failures.empty()) {
@@ -177,9 +245,30 @@ class Suite {
     pugi::xml_node _node;
     const SessionRecord& _session;
     const RunRecord& _run;
+    const RepeatRecord* const _repeat;  // null when the run was not repeated
+    const std::string _className;
     pugi::xml_node _properties;
+    std::set<std::string> _cases;
     Counts _counts;
 };
+
+// A suite of one case without a run: `outcome` is "skipped" or "error".
+void writeSuite(pugi::xml_node suite,
+                std::string_view name,
+                const std::string& className,
+                const char* outcome,
+                std::string_view message) {
+    const bool isError = std::string_view(outcome) == "error";
+    setAttribute(suite, "name", name);
+    pugi::xml_node node = suite.append_child("testcase");
+    setAttribute(node, "name", "run");
+    setAttribute(node, "classname", className);
+    pugi::xml_node finding = node.append_child(outcome);
+    setAttribute(finding, "type", isError ? "interrupted" : "not started");
+    setAttribute(finding, "message", message);
+    setCounts(suite, {.tests = 1, .errors = isError ? 1U : 0U});
+    suite.append_attribute("skipped").set_value(isError ? 0 : 1);
+}
 
 }  // namespace
 
@@ -193,12 +282,26 @@ std::string junitReport(const SessionRecord& session) {
     setSeconds(root, session.seconds);
     Counts total;
     for (std::size_t at = 0; at < session.runs.size(); ++at) {
-        const RepeatRecord* repeat = at < session.repeats.size() ? &session.repeats[at] : nullptr;
         const Counts counts =
-            Suite(root.append_child("testsuite"), session, session.runs[at]).write(repeat);
+            Suite(root.append_child("testsuite"), session, session.runs[at], session.repeatOf(at))
+                .write();
         total.tests += counts.tests;
         total.failures += counts.failures;
         total.errors += counts.errors;
+    }
+    for (const RunPlan& plan : session.notStarted()) {
+        writeSuite(root.append_child("testsuite"), plan.name, classNameOf(session, plan.name),
+                   "skipped", "not started");
+        ++total.tests;
+    }
+    // When no run that is shown was interrupted, the session has the error.
+    const bool isShown =
+        !session.runs.empty() && session.runs.back().verdict == Verdict::Interrupted;
+    if (session.verdict == Verdict::Interrupted && !isShown) {
+        writeSuite(root.append_child("testsuite"), "session", classNameOf(session, "session"),
+                   "error", interruptionText(session));
+        ++total.tests;
+        ++total.errors;
     }
     setCounts(root, total);
     std::ostringstream out;

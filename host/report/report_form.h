@@ -20,6 +20,8 @@ using ReportSink = std::function<void(std::string_view text)>;
 struct TextStyle {
     bool colour = false;   // escape sequences of a terminal
     bool verbose = false;  // show what is folded otherwise
+    // Begin with the device, the time, the version and the command line: for a report that is kept.
+    bool heading = false;
 };
 
 // Makes a report that writes to `sink`.

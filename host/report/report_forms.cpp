@@ -28,7 +28,7 @@ std::span<const ReportForm> reportForms() {
     static constexpr ReportForm kForms[] = {
         {"text", ".txt", true, false, openTextReport},
         {"json", ".json", false, true, openJsonReport},
-        {"jsonl", ".jsonl", true, false, openJsonlReport},
+        {"jsonl", ".jsonl", true, true, openJsonlReport},
         {"junit", ".xml", false, false, openJunitReport},
         {"html", ".html", false, true, openHtmlReport},
     };

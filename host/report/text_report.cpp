@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <iterator>
 #include <limits>
+#include <span>
 #include <utility>
 #include <vector>
 
@@ -28,16 +29,9 @@ class Writer {
     explicit Writer(const TextStyle& style) : _style(style) {}
 
     std::string verdict(Verdict verdict) const {
-        switch (verdict) {
-            case Verdict::Passed:
-                return _painted("1;32", verdictText(verdict));
-            case Verdict::Failed:
-                return _painted("1;31", verdictText(verdict));
-            case Verdict::Error:
-            case Verdict::Interrupted:
-                break;
-        }
-        return _painted("1;35", verdictText(verdict));
+        // Green, red, magenta, magenta.
+        static constexpr std::string_view kColours[] = {"1;32", "1;31", "1;35", "1;35"};
+        return _painted(kColours[static_cast<std::size_t>(verdict)], verdictText(verdict));
     }
     std::string bad(std::string_view text) const { return _painted("31", text); }
     std::string strong(std::string_view text) const { return _painted("1", text); }
@@ -182,6 +176,14 @@ std::string body(const RunRecord& run, const Writer& writer) {
             out += writer.faintLine("  as measured by the experiment");
         }
         out += measurementRows(run.measurements);
+    } else if (run.results.empty() && !run.measurements.empty()) {
+        // It did not come to its results: these are what it has found.
+        out += writer.faintLine(
+            fmt::format("    {} of the experiment, --verbose lists them",
+                        plural(run.measurements.size(), "measurement", "measurements")));
+    }
+    if (run.framesLost.value_or(0) > 0) {
+        out += fmt::format("  {} {}\n", writer.bad("!"), framesText(run));
     }
     const platform::List* images = imagesOf(run.auxiliaryData);
     if (images != nullptr) {
@@ -191,9 +193,25 @@ std::string body(const RunRecord& run, const Writer& writer) {
     return out;
 }
 
+std::string headingOf(const SessionRecord& session) {
+    std::string out = fmt::format("zrlab {}, {}\n{}\ndevice {}: {}\n", session.version,
+                                  session.started.text(), plainLine(session.commandLine),
+                                  plainLine(session.deviceName), plainLine(session.deviceSummary));
+    for (const auto& [name, text] : session.deviceFacts) {
+        out += fmt::format("  {}: {}\n", plainLine(name), plainLine(text));
+    }
+    return out;
+}
+
 class TextReport final : public RunListener {
   public:
     TextReport(ReportSink sink, const TextStyle& style) : _sink(std::move(sink)), _style(style) {}
+
+    void sessionStarted(const SessionRecord& session) override {
+        if (_style.heading) {
+            _sink(headingOf(session) + "\n");
+        }
+    }
 
     void nameEnded(const SessionRecord& session) override {
         const RunRecord& run = session.runs.back();
@@ -207,16 +225,18 @@ class TextReport final : public RunListener {
 
     // What came of all names, when there are several.
     void sessionEnded(const SessionRecord& session) override {
-        if (session.runs.size() > 1) {
-            std::size_t counts[] = {0, 0, 0};
-            for (const RunRecord& run : session.runs) {
-                ++counts[static_cast<std::size_t>(run.verdict)];
-            }
-            const Writer writer(_style);
-            _sink(fmt::format(
-                "\n{}  {}: {} passed, {} failed, {} in error\n", writer.verdict(session.verdict),
-                plural(session.runs.size(), "run", "runs"), counts[0], counts[1], counts[2]));
+        const std::span<const RunPlan> notStarted = session.notStarted();
+        if (session.runs.size() + notStarted.size() < 2 && !session.runs.empty()) {
+            return;
         }
+        const Writer writer(_style);
+        std::string text = fmt::format(
+            "{}{}  {}: {}\n", session.runs.empty() ? "" : "\n", writer.verdict(session.verdict),
+            plural(session.runs.size(), "run", "runs"), countsText(session));
+        for (const RunPlan& plan : notStarted) {
+            text += writer.faintLine(fmt::format("      not started: {}", plan.name));
+        }
+        _sink(text);
     }
 
   private:
@@ -256,19 +276,18 @@ std::string textLine(const RunRecord& run, const TextStyle& style) {
 
 std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
     const Writer writer(style);
-    std::string out = fmt::format("{}  {}: {} passed, {} failed, {} in error\n",
-                                  writer.strong(repeat.name), plural(repeat.runs, "run", "runs"),
-                                  repeat.passed, repeat.failed, repeat.errors);
+    std::string out = fmt::format("{}  {}: {}\n", writer.strong(repeat.name),
+                                  plural(repeat.runs, "run", "runs"), countsText(repeat));
     const std::size_t listed =
         style.verbose ? repeat.notPassed.size() : std::min(repeat.notPassed.size(), kRunsListed);
     for (std::size_t at = 0; at < listed; ++at) {
         const Repetition& one = repeat.notPassed[at];
         out += fmt::format("  {:>6}  {}  {}\n", one.number, writer.verdict(one.verdict), one.why);
     }
-    if (repeat.failed + repeat.errors > listed) {
+    if (repeat.notPassedCount() > listed) {
         out += writer.faintLine(
             fmt::format("      …  {} did not pass",
-                        plural(repeat.failed + repeat.errors - listed, "more run", "more runs")));
+                        plural(repeat.notPassedCount() - listed, "more run", "more runs")));
     }
     std::vector<ResultStatistics> shown;
     std::copy_if(repeat.results.begin(), repeat.results.end(), std::back_inserter(shown),

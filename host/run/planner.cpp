@@ -2,11 +2,14 @@
 
 #include <algorithm>
 #include <charconv>
+#include <cmath>
 #include <cstdint>
 #include <system_error>
+#include <utility>
 
 #include <fmt/format.h>
 
+#include "host/record/plugin_data.h"
 #include "host/record/problem.h"
 #include "host/record/run_text.h"
 #include "input/nearest.h"
@@ -50,7 +53,10 @@ std::string unknownText(const ZRLab& lab, const std::string& name) {
         }
         return text;
     }
-    const std::string meant = input::didYouMean(name, runnableNames(lab));
+    std::string meant = input::didYouMean(name, runnableNames(lab));
+    if (meant.empty() && name.find('=') != std::string::npos) {
+        meant = "; did you mean --set " + name + "?";
+    }
     return "unknown diagnostic or experiment \"" + name + "\"" +
            (meant.empty() ? "; zrlab list shows them" : meant);
 }
@@ -90,7 +96,53 @@ std::optional<platform::Number> valueFor(const std::string& parameter,
     return value;
 }
 
+// What a parameter of this name holds, and whether the value fits. Parts read counts as integers of 64 bits
+// or as floating-point numbers: up to 2^53 they all read the same.
+struct Meaning {
+    bool (*isFitting)(double value);
+    std::string_view text;
+};
+constexpr Meaning kCount = {
+    [](double value) { return value >= 0 && value <= 0x1p53 && value == std::trunc(value); },
+    "a whole number from 0 to 9007199254740992"};
+constexpr Meaning kSeconds = {[](double value) { return value >= 0; },
+                              "a number of seconds from 0"};
+
+const Meaning* meaningOf(std::string_view parameter) {
+    for (const CountParameter& count : kCountParameters) {
+        if (count.parameter == parameter) {
+            return &kCount;
+        }
+    }
+    return parameter == kTimeoutParameter ? &kSeconds : nullptr;
+}
+
 }  // namespace
+
+std::vector<std::string> valueWarnings(const std::vector<RunPlan>& plans) {
+    std::vector<std::string> warnings;
+    const auto look = [&warnings](const PartPlan& part) {
+        for (const auto& [parameter, value] : part.parameters) {
+            const Meaning* meaning = meaningOf(parameter);
+            if (meaning == nullptr || meaning->isFitting(value.asDouble())) {
+                continue;
+            }
+            std::string warning =
+                fmt::format("warning: {} {} is not {}; the run may use another value", parameter,
+                            value.text(), meaning->text);
+            if (std::find(warnings.begin(), warnings.end(), warning) == warnings.end()) {
+                warnings.push_back(std::move(warning));
+            }
+        }
+    };
+    for (const RunPlan& plan : plans) {
+        look(plan.experiment);
+        if (plan.analysis.has_value()) {
+            look(*plan.analysis);
+        }
+    }
+    return warnings;
+}
 
 std::optional<ZRDescription> describePart(const ZRLab& lab, Part part, std::string_view name) {
     if (part == Part::Experiment) {
@@ -175,9 +227,10 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
                                           ? "no " + std::string(partText(*settings[i].part))
                                           : "none of the parts";
             std::erase(declared, settings[i].name);  // of another part
-            throw Problem(kExitUsage, whose + " to be run declares a parameter \"" +
-                                          settings[i].name + "\"" +
-                                          input::didYouMean(settings[i].name, declared));
+            const std::string meant = input::didYouMean(settings[i].name, declared);
+            throw Problem(kExitUsage,
+                          whose + " to be run declares a parameter \"" + settings[i].name + "\"" +
+                              (meant.empty() ? "; zrlab describe NAME shows them" : meant));
         }
     }
     if (!missing.empty()) {

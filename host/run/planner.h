@@ -33,6 +33,11 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
                               const std::vector<std::string>& names,
                               const std::vector<ParameterSetting>& settings);
 
+// The values that a part cannot take as they are given, one line for each: a count that is not a whole
+// number from 0 to 2^53, a time-out that is not a number of seconds from 0 (infinity means never). Which
+// parameters these are is known by their names (host/record/plugin_data.h).
+std::vector<std::string> valueWarnings(const std::vector<RunPlan>& plans);
+
 // The description that a new instance of the part gives; nothing when the name is not registered.
 std::optional<ZRDescription> describePart(const ZRLab& lab, Part part, std::string_view name);
 

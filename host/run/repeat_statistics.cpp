@@ -1,6 +1,8 @@
 #include "host/run/repeat_statistics.h"
 
+#include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <limits>
 #include <utility>
 
@@ -51,8 +53,15 @@ void RepeatStatistics::add(const RunRecord& run) {
             ++_record.interrupted;
             break;
     }
+    if (_record.outcomes.size() < kMostOutcomes) {
+        _record.outcomes.push_back({run.verdict, run.seconds});
+    }
     if (run.verdict != Verdict::Passed && _record.notPassed.size() < kMostRepetitions) {
-        _record.notPassed.push_back({run.number, run.verdict, whyText(run)});
+        Repetition one{run.number, run.verdict, run.seconds, whyText(run), {}, run.failures};
+        std::copy_if(
+            run.results.begin(), run.results.end(), std::back_inserter(one.outside),
+            [](const ResultRecord& result) { return result.judgement == Judgement::Outside; });
+        _record.notPassed.push_back(std::move(one));
     }
     for (const ResultRecord& result : run.results) {
         ResultStatistics one;

@@ -33,11 +33,26 @@ platform::RunTag RunRecorder::begin() {
     const platform::MutexLock lock(_mutex);
     _began = std::chrono::steady_clock::now();
     _frames.clear();
+    _lostFrames = {};
     _current = ++_last;
     return _last;
 }
 
+void RunRecorder::takeFrames(RunRecord& run) {
+    const platform::MutexLock lock(_mutex);
+    run.framesDelivered = _frameCount;
+    run.framesLost = _lostFrames.count();
+    run.imagesDelivered = _imageCount;
+    std::vector<FrameRecord> frames = std::exchange(_frames, {});
+    if (run.frames.empty()) {
+        run.frames = std::move(frames);  // there may be very many
+    } else {
+        run.frames.insert(run.frames.end(), frames.begin(), frames.end());
+    }
+}
+
 void RunRecorder::end(RunRecord& run) {
+    takeFrames(run);
     const platform::MutexLock lock(_mutex);
     _current = 0;
     run.tag = _last;
@@ -47,7 +62,6 @@ void RunRecorder::end(RunRecord& run) {
                            std::to_string(_linesLeftOut) + " further lines left out."});
         _linesLeftOut = 0;
     }
-    run.frames = std::exchange(_frames, {});
     for (std::string& what : _misuses) {
         run.failures.push_back({.part = Part::Experiment,
                                 .step = kStepDevice,
@@ -85,20 +99,28 @@ void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
         return;
     }
     ++_frameCount;
-    if (!_keepFrames) {
-        return;
-    }
+    const platform::Number* sensorNumber = frame.metadata[kSensorFrameNumber].number();
     FrameRecord record{.number = frame.number,
+                       .sensorNumber = sensorNumber != nullptr
+                                           ? std::optional(sensorNumber->as<std::int64_t>())
+                                           : std::nullopt,
                        .presentation = frame.time.seconds(),
                        .delivered = 0,
-                       .lightSource = numberOf(frame.metadata, kLightSource),
+                       .lightSource = std::nullopt,
                        .temperatures = {}};
-    std::transform(
-        std::begin(kTemperatures), std::end(kTemperatures), record.temperatures.begin(),
-        [&frame](const TemperatureEntry& entry) { return numberOf(frame.metadata, entry.key); });
+    if (_keepFrames) {
+        record.lightSource = numberOf(frame.metadata, kLightSource);
+        std::transform(std::begin(kTemperatures), std::end(kTemperatures),
+                       record.temperatures.begin(), [&frame](const TemperatureEntry& entry) {
+                           return numberOf(frame.metadata, entry.key);
+                       });
+    }
     const platform::MutexLock lock(_mutex);
-    record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
-    _frames.push_back(record);
+    _lostFrames.before(record.sensorNumber);
+    if (_keepFrames) {
+        record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
+        _frames.push_back(record);
+    }
 }
 
 void RunRecorder::imageDelivered(std::uint64_t /*number*/) {

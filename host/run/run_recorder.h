@@ -19,10 +19,11 @@
 #include <vector>
 
 #include "devices/observed/observer.h"
+#include "host/record/frame_gap.h"
 #include "host/record/run_record.h"
 #include "platform/log.h"
-#include "platform/sync.h"
 #include "platform/run_tag.h"
+#include "platform/sync.h"
 
 namespace host {
 
@@ -34,6 +35,8 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
 
     // Begins a run. The thread that drives it sets the tag.
     platform::RunTag begin();
+    // Moves the frames recorded so far into the run's record: what was delivered, lost and kept.
+    void takeFrames(RunRecord& run);
     // Ends the run: moves what was recorded into its record.
     void end(RunRecord& run);
 
@@ -68,6 +71,7 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     std::vector<LogRecord> _log ZR_GUARDED_BY(_mutex);
     std::uint64_t _linesLeftOut ZR_GUARDED_BY(_mutex) = 0;
     std::vector<std::pair<platform::RunTag, LogRecord>> _lateLines ZR_GUARDED_BY(_mutex);
+    LostFrames _lostFrames ZR_GUARDED_BY(_mutex);
     std::vector<FrameRecord> _frames ZR_GUARDED_BY(_mutex);
     std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);
 };

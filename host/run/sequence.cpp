@@ -142,6 +142,7 @@ class Sequence {
         body();
         _edit([&](RunRecord& record) ZR_REQUIRES(_mutex) {
             _secondsOf(part, record) = secondsSince(start);
+            _bench.recorder.takeFrames(record);
             _tell([part](RunListener& listener, const RunRecord& run) {
                 listener.partEnded(run, part);
             });

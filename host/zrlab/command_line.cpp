@@ -1,9 +1,13 @@
 #include "host/zrlab/command_line.h"
 
+#include <algorithm>
 #include <cctype>
+#include <charconv>
 #include <cstdint>
 #include <sstream>
 #include <string_view>
+#include <system_error>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -16,10 +20,40 @@ namespace host {
 
 namespace {
 
-// One of these words. Its own description stays out of the help: the type's name lists the words.
+std::string joined(const std::vector<std::string>& words, std::string_view between) {
+    return fmt::format("{}", fmt::join(words, between));
+}
+
+// One of these words.
 CLI::Validator oneOf(std::vector<std::string> words) {
-    CLI::Validator validator = CLI::IsMember(std::move(words));
-    return validator.description("");
+    return {[words = std::move(words)](const std::string& given) {
+                const bool isOne = std::find(words.begin(), words.end(), given) != words.end();
+                return isOne ? ""
+                             : fmt::format("\"{}\" is not one of {}", given, joined(words, ", "));
+            },
+            ""};
+}
+
+// Such as a variable of a script that was not set.
+CLI::Validator notEmpty() {
+    return {[](const std::string& given) {
+                return given.empty() ? std::string("the value is empty") : std::string();
+            },
+            ""};
+}
+
+CLI::Validator wholeNumber(std::uint64_t least, std::uint64_t most) {
+    return {[least, most](const std::string& given) {
+                std::uint64_t value = 0;
+                const char* end = given.data() + given.size();
+                const auto [stop, problem] = std::from_chars(given.data(), end, value);
+                const bool fits =
+                    problem == std::errc() && stop == end && value >= least && value <= most;
+                return fits ? ""
+                            : fmt::format("\"{}\" is not a whole number from {} to {}", given,
+                                          least, most);
+            },
+            ""};
 }
 
 constexpr std::string_view kRunExamples = R"(Examples:
@@ -52,10 +86,6 @@ constexpr const char* kExamples = R"(Examples:
   zrlab devices
   zrlab help run)";
 
-std::string joined(const std::vector<std::string>& words, std::string_view between) {
-    return fmt::format("{}", fmt::join(words, between));
-}
-
 // The forms of a report as the help shows them.
 std::string formLines() {
     std::string lines = "Forms of a report:\n";
@@ -67,7 +97,57 @@ std::string formLines() {
     return lines;
 }
 
+// Which of `names` was meant by a word, or where the commands or options behind `path` are listed.
+std::string meantBy(const std::string& word,
+                    const std::vector<std::string>& names,
+                    const std::string& path) {
+    const std::string meant = input::didYouMean(word, names);
+    return !meant.empty()
+               ? meant
+               : fmt::format("; zrlab {}{}--help lists them", path, path.empty() ? "" : " ");
+}
+
+std::vector<std::string> optionNames(const CLI::App& command) {
+    std::vector<std::string> names;
+    for (const CLI::Option* option : command.get_options()) {
+        names.push_back(option->get_name());
+    }
+    return names;
+}
+
+// What is wrong with an option that the command has.
+std::string wrongUse(const CLI::App& command, const CLI::ParseError& error) {
+    std::string text = error.what();
+    if (error.get_exit_code() != static_cast<int>(CLI::ExitCodes::ArgumentMismatch)) {
+        return text;
+    }
+    const std::string name = text.substr(0, text.find_first_of(": "));
+    const CLI::Option* option = command.get_option_no_throw(name);
+    return option == nullptr
+               ? "--" + name + " does not take a value"  // CLI11 leaves the hyphens out
+           : text.find("received") != std::string::npos
+               ? name + " is given more than once"
+               : name + " needs a value: " + option->get_type_name();
+}
+
 }  // namespace
+
+std::vector<std::string> commandNames(const CLI::App& app) {
+    std::vector<std::string> names;
+    for (const CLI::App* command : app.get_subcommands({})) {
+        names.push_back(command->get_name());
+    }
+    return names;
+}
+
+const CLI::App* subcommandOf(const CLI::App& app, const std::string& name) {
+    for (const CLI::App* command : app.get_subcommands({})) {
+        if (command->get_name() == name) {
+            return command;
+        }
+    }
+    return nullptr;
+}
 
 CommandLine::CommandLine()
     : plugin(defaultPlugin())
@@ -79,13 +159,18 @@ CommandLine::CommandLine()
     _app.set_version_flag("--version", "zrlab " ZR_VERSION, "Print the version and exit");
     _app.set_help_flag("-h,--help", "Print this help and exit");
     CLI::App* list = _app.add_subcommand("list", "List experiments, analyses and diagnostics");
-    list->add_flag("--names", namesOnly, "Only the names that can be run, one per line");
+    list->add_flag("--names", namesOnly, "Only the names that can be run, one per line")
+        ->disable_flag_override();
     _addPlugin(*list);
 
     CLI::App* describe =
         _app.add_subcommand("describe", "Show what a name is for and which parameters it takes");
     describe->add_option("NAME", subjects, "An experiment, an analysis or a diagnostic")
-        ->required();
+        ->required()
+        ->type_name("");
+    describe->add_flag("--limits", limits,
+                       "Also show results and limits: runs the name once, on a simulated device\n"
+                       "without faults, every required parameter 1 and the time-out 30 s");
     _addPlugin(*describe);
 
     _addRun();
@@ -96,8 +181,21 @@ CommandLine::CommandLine()
         ->excludes(names);
     _addDeviceModule(*devices);
 
+    CLI::App* device = _app.add_subcommand(
+        "device", "Show what a device is made of, or check the description of one");
+    device->add_option("ACTION", action, "Show a device, or check descriptions")
+        ->required()
+        ->type_name("show|check")
+        ->check(oneOf({"show", "check"}));
+    device->add_option("WHAT", subjects, "A device that \"zrlab devices\" lists, a file, KIND:WHAT")
+        ->required();
+    _addDeviceModule(*device);
+    device->footer(
+        "Examples:\n  zrlab device show counter-stuck > mine.json\n"
+        "  zrlab device check ./mine.json");
+
     CLI::App* help = _app.add_subcommand("help", "Show the help of a command");
-    help->add_option("COMMAND", helpTopic, "The command to explain");
+    help->add_option("COMMAND", helpTopic, "The command to explain")->type_name("");
 
     CLI::App* completion =
         _app.add_subcommand("completion", "Print a completion script for a shell");
@@ -106,7 +204,7 @@ CommandLine::CommandLine()
         ->type_name("bash|zsh")
         ->check(oneOf({"bash", "zsh"}));
     completion->footer(
-        "Examples:\n  source <(zrlab completion bash)\n"
+        "Examples:\n  source <(zrlab completion bash)\n  source <(zrlab completion zsh)\n"
         "  zrlab completion zsh > \"${fpath[1]}/_zrlab\"");
 
     CLI::App* manual = _app.add_subcommand("manual", "Print the manual page");
@@ -118,7 +216,8 @@ CommandLine::CommandLine()
 void CommandLine::_addPlugin(CLI::App& command) {
     command
         .add_option("--plugin", plugin, "Load this module instead of the one beside the program")
-        ->type_name("PATH");
+        ->type_name("PATH")
+        ->check(notEmpty());
 }
 
 void CommandLine::_addDeviceModule(CLI::App& command) {
@@ -126,6 +225,7 @@ void CommandLine::_addDeviceModule(CLI::App& command) {
         .add_option("--device-module", session.device.modules,
                     "Load kinds of devices from this module")
         ->type_name("FILE")
+        ->check(notEmpty())
         ->take_all()
         ->allow_extra_args(false);
 }
@@ -133,23 +233,29 @@ void CommandLine::_addDeviceModule(CLI::App& command) {
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
-        ->required();
-    run.add_option("--set", session.settings,
-                   "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
-                   "analysis:PARAM=VALUE\ngives it to one part only")
+        ->required()
+        ->type_name("");
+    run.add_option(
+           "--set", session.settings,
+           "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
+           "analysis:PARAM=VALUE\ngives it to one part only. VALUE is a number, true or false;\n"
+           "a count that is not whole or a negative time-out gets a warning")
         ->type_name("PARAM=VALUE")
+        ->check(notEmpty())
         ->take_all()
         ->allow_extra_args(false);
     run.add_option("--device", session.device.device,
                    "The device: one that \"zrlab devices\" lists, a file of a simulated one, or\n"
                    "KIND:WHAT for another kind")
-        ->type_name("NAME|FILE|KIND:WHAT")
+        ->type_name("DEVICE|FILE|KIND:WHAT")
+        ->check(notEmpty())
         ->capture_default_str();
     _addDeviceModule(run);
     run.add_option("--speed", session.device.speed,
                    "Simulated seconds per real second: 0.001 to 100, or max;\ntime-outs stay those "
                    "of real time")
         ->type_name("FACTOR|max")
+        ->check(notEmpty())
         ->default_str("1");
     const std::vector<std::string> formats = reportFormNames();
     run.add_option("--format", session.format, "Form of the report")
@@ -159,25 +265,22 @@ void CommandLine::_addRun() {
     run.add_option("--output", session.output,
                    "Write the report to this file, whole or not at all;\n- is standard output")
         ->type_name("FILE")
-        ->check(CLI::Validator(
-            [](const std::string& file) {
-                return file.empty() ? std::string("the name of the file is empty") : std::string();
-            },
-            ""));
+        ->check(notEmpty());
     run.add_option(
            "--report", session.reports,
            "Write a further report; its ending gives the form:\n" + joined(reportEndings(), ", "))
         ->type_name("FILE")
+        ->check(notEmpty())
         ->take_all()
         ->allow_extra_args(false);
     run.add_option("--repeat", session.repeat, "Run each name this many times and show the spread")
         ->type_name("N")
-        ->check(CLI::Validator(CLI::Range(std::uint64_t{1}, std::uint64_t{1'000'000'000}))
-                    .description(""));
+        ->check(wholeNumber(1, 1'000'000'000));
     run.add_flag("--until-fail", session.untilFail,
                  "Repeat until a run does not pass; with --repeat at most N times")
         ->disable_flag_override();
-    run.add_flag("-v,--verbose", session.verbose, "Show what the text report folds");
+    run.add_flag("-v,--verbose", session.verbose, "Show what the text report folds")
+        ->disable_flag_override();
     run.add_option("--color", "Colour in the text report")
         ->type_name("auto|always|never")
         ->default_str("auto")
@@ -198,41 +301,35 @@ void CommandLine::_addRun() {
 std::string CommandLine::_explain(const CLI::ParseError& error,
                                   int count,
                                   const char* const* arguments) {
-    const CLI::App* given = nullptr;
-    for (int at = 1; at < count; ++at) {
+    const CLI::App* given = &_app;
+    std::string path;  // the commands so far
+    const auto in = [&path](const std::string& problem) {
+        return path.empty() ? problem : path + ": " + problem;
+    };
+    for (int at = 1; at < count && arguments[at] != std::string_view("--"); ++at) {
         const std::string argument = arguments[at];
-        if (given == nullptr && argument.starts_with("-")) {
-            if (_app.get_option_no_throw(argument) == nullptr) {
-                return "unknown option " + argument +
-                       input::didYouMean(argument, {"--help", "--version"});
-            }
-        } else if (given == nullptr) {
-            given = find(argument);
-            if (given == nullptr) {
-                return "unknown command \"" + argument + "\"" +
-                       input::didYouMean(argument, commandNames());
-            }
-        } else if (argument.size() > 1 && argument[0] == '-' &&
-                   std::isdigit(static_cast<unsigned char>(argument[1])) == 0) {
+        if (argument.size() > 1 && argument[0] == '-' &&
+            std::isdigit(static_cast<unsigned char>(argument[1])) == 0) {
             const std::string option = argument.substr(0, argument.find('='));
             if (given->get_option_no_throw(option) == nullptr) {
-                std::vector<std::string> options;
-                for (const CLI::Option* one : given->get_options()) {
-                    options.push_back(one->get_name());
-                }
-                return given->get_name() + ": unknown option " + option +
-                       input::didYouMean(option, options);
+                return in("unknown option " + option + meantBy(option, optionNames(*given), path));
             }
+        } else if (const CLI::App* inner = subcommandOf(*given, argument)) {
+            given = inner;
+            path += (path.empty() ? "" : " ") + argument;
+        } else if (!given->get_subcommands({}).empty()) {
+            return in("unknown command \"" + argument + "\"" +
+                      meantBy(argument, commandNames(*given), path));
         }
     }
-    if (given == nullptr) {
+    if (given == &_app) {
         return "no command given; zrlab --help lists them";
     }
-    std::string text = error.what();
-    for (char& c : text) {
-        c = c == '\n' ? ' ' : c;
+    if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ExtrasError)) {
+        return in(
+            fmt::format("unexpected argument \"{}\"", fmt::join(_app.remaining(true), "\" \"")));
     }
-    return given->get_name() + ": " + text;
+    return in(wrongUse(*given, error));
 }
 
 std::optional<std::string> CommandLine::read(int count, const char* const* arguments) {
@@ -250,23 +347,6 @@ std::optional<std::string> CommandLine::read(int count, const char* const* argum
         throw Problem(kExitUsage, _explain(error, count, arguments));
     }
     return std::nullopt;
-}
-
-std::vector<std::string> CommandLine::commandNames() const {
-    std::vector<std::string> names;
-    for (const CLI::App* command : _app.get_subcommands({})) {
-        names.push_back(command->get_name());
-    }
-    return names;
-}
-
-const CLI::App* CommandLine::find(const std::string& command) const {
-    for (const CLI::App* known : _app.get_subcommands({})) {
-        if (known->get_name() == command) {
-            return known;
-        }
-    }
-    return nullptr;
 }
 
 std::string CommandLine::command() const {

@@ -1,5 +1,5 @@
 // The program's command line: its commands, their options, and the texts that explain them. Help,
-// the manual page and the shell completions are all made from this one description.
+// the manual page and completions are all made from this one description.
 #ifndef ZR_HOST_ZRLAB_COMMAND_LINE_H
 #define ZR_HOST_ZRLAB_COMMAND_LINE_H
 
@@ -28,12 +28,10 @@ class CommandLine {
 
     const CLI::App& app() const { return _app; }
 
-    std::vector<std::string> commandNames() const;
-    // The command of that name, or null.
-    const CLI::App* find(const std::string& command) const;
-
     std::string plugin;                 // the module to load
-    std::vector<std::string> subjects;  // of describe
+    std::vector<std::string> subjects;  // of describe and device
+    std::string action;                 // of device
+    bool limits = false;                // of describe
     bool namesOnly = false;             // of list and devices
     bool kindsOnly = false;             // of devices
     std::string helpTopic;              // of help
@@ -49,11 +47,14 @@ class CommandLine {
     CLI::App _app;
 };
 
+// The commands directly below `app`.
+std::vector<std::string> commandNames(const CLI::App& app);
+
+// The command of that name directly below `app`, or null.
+const CLI::App* subcommandOf(const CLI::App& app, const std::string& name);
+
 // A page for man(1) in its own markup.
 std::string manualPage(const CLI::App& app, const std::string& version);
-
-// A completion script for "bash" or "zsh"; empty for any other shell.
-std::string completionScript(const CLI::App& app, const std::string& shell);
 
 }  // namespace host
 

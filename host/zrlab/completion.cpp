@@ -1,104 +1,272 @@
-#include <string>
+#include "host/zrlab/completion.h"
 
-#include "host/zrlab/command_line.h"
+#include <algorithm>
+#include <cctype>
+#include <exception>
+#include <set>
+
+#include "frame/host_interface.h"
+#include "host/record/clean_text.h"
+#include "host/record/run_text.h"
+#include "host/run/module_loader.h"
+#include "host/run/planner.h"
+#include "host/zrlab/device_choice.h"
 
 namespace host {
 
 namespace {
 
-std::string optionNames(const CLI::App& command) {
-    std::string names;
-    for (const CLI::Option* option : command.get_options()) {
-        if (!option->get_positional()) {
-            names += (names.empty() ? "" : " ") + option->get_name();
-        }
-    }
-    return names;
-}
+// The words before the one at the cursor.
+struct Line {
+    const CLI::App* command;               // the innermost so far
+    const CLI::Option* waiting = nullptr;  // an option whose value comes next
+    std::vector<std::string> positionals;  // of the command
+    std::string plugin;                    // the last --plugin
+    std::vector<std::string> deviceModules;
 
-// An option whose values are known is written with all of them as its type: auto|always|never.
-std::string optionValues(const CLI::App& command) {
-    std::string cases;
-    for (const CLI::Option* option : command.get_options()) {
-        std::string values = option->get_type_name();
-        const bool named = values.find_first_of("ABCDEFGHIJKLMNOPQRSTUVWXYZ") == std::string::npos;
-        if (option->get_positional() || !named || values.find('|') == std::string::npos) {
-            continue;
+    void read(const std::string& word) {
+        if (waiting != nullptr) {
+            _readValue(*waiting, word);
+            waiting = nullptr;
+        } else if (word.starts_with("-")) {
+            const std::size_t equals = word.find('=');
+            const CLI::Option* option = command->get_option_no_throw(word.substr(0, equals));
+            if (option == nullptr || option->get_items_expected_max() == 0) {
+                return;
+            }
+            if (equals == std::string::npos) {
+                waiting = option;
+            } else {
+                _readValue(*option, word.substr(equals + 1));
+            }
+        } else if (const CLI::App* inner = subcommandOf(*command, word)) {
+            command = inner;
+        } else {
+            positionals.push_back(word);
         }
-        for (char& c : values) {
-            c = c == '|' ? ' ' : c;
-        }
-        cases += "        " + option->get_name() + ") words=\"" + values + "\";;\n";
     }
-    return cases;
-}
 
-// One function serves both shells: it works out the words that can stand at the cursor.
-std::string wordsFunction(const CLI::App& app) {
-    std::string commands;
-    std::string perCommand;
-    std::string values;
-    for (const CLI::App* command : app.get_subcommands({})) {
-        commands += (commands.empty() ? "" : " ") + command->get_name();
-        perCommand +=
-            "        " + command->get_name() + ") words=\"" + optionNames(*command) + "\";;\n";
-        values += optionValues(*command);
+  private:
+    void _readValue(const CLI::Option& option, const std::string& value) {
+        if (option.get_name() == "--plugin") {
+            plugin = value;
+        } else if (option.get_name() == "--device-module") {
+            deviceModules.push_back(value);
+        }
     }
-    return "# Words that can follow: $1 the command so far, $2 the word before the cursor, $3 the "
-           "word at\n"
-           "# it, $4 the program.\n"
-           "_zrlab_words() {\n"
-           "    local words=\"\"\n"
-           "    case \"$2\" in\n" +
-           values +
-           "        --device) words=\"$(\"$4\" devices --names 2>/dev/null) $(compgen -f -- \"$3\" "
-           "2>/dev/null)\";;\n"
-           "        --set|--speed|--repeat) ;;\n"
-           "        --output|--report|--plugin|--device-module) words=\"$(compgen -f -- \"$3\" "
-           "2>/dev/null)\";;\n"
-           "        completion) words=\"bash zsh\";;\n"
-           "        help|zrlab) words=\"" +
-           commands +
-           "\";;\n"
-           "        *) case \"$1\" in\n" +
-           perCommand +
-           "        esac\n"
-           "        case \"$1\" in\n"
-           "        run|describe) words=\"$words $(\"$4\" list --names 2>/dev/null)\";;\n"
-           "        esac;;\n"
-           "    esac\n"
-           "    printf '%s\\n' $words\n"
-           "}\n";
-}
+};
+
+class Answer {
+  public:
+    // `value` is what has been typed; `prefix` stands before it in the same word: "--format=".
+    Answer(const Line& line, std::string prefix, std::string value)
+        : _line(line), _prefix(std::move(prefix)), _value(std::move(value)) {}
+
+    void offerOptions() {
+        for (const CLI::Option* option : _line.command->get_options()) {
+            if (!option->get_positional()) {
+                _offer(option->get_name(), option->get_description());
+            }
+        }
+    }
+
+    // Commands, or else what the next positional argument can be, or else options.
+    void offerArguments() {
+        offerCommands(*_line.command);
+        const auto positionals = _line.command->get_options(
+            [](const CLI::Option* option) { return option->get_positional(); });
+        if (!positionals.empty() && (positionals.back()->get_items_expected_max() > 1 ||
+                                     _line.positionals.size() < positionals.size())) {
+            const std::size_t at = std::min(_line.positionals.size(), positionals.size() - 1);
+            _offerSource(positionals[at]->get_name());
+            offerValues(*positionals[at]);
+        }
+        if (text.empty()) {
+            offerOptions();
+        }
+    }
+
+    // An option's type holds what its values can be: words as they stand, and placeholders.
+    void offerValues(const CLI::Option& option) {
+        const std::string type = option.get_type_name();
+        for (std::size_t at = 0; at < type.size();) {
+            const std::size_t end = std::min(type.find('|', at), type.size());
+            const std::string one = type.substr(at, end - at);
+            if (std::islower(static_cast<unsigned char>(one.front())) != 0) {
+                _offer(one);
+            } else {
+                _offerSource(one);
+            }
+            at = end + 1;
+        }
+    }
+
+    void offerCommands(const CLI::App& app) {
+        for (const CLI::App* command : app.get_subcommands({})) {
+            _offer(command->get_name(), command->get_description());
+        }
+    }
+
+    std::string text;
+
+  private:
+    void _offer(const std::string& word, const std::string& description = "") {
+        text += _prefix + word;
+        const std::size_t length = description.find_first_of(";\n");  // a longer one's first part
+        if (!description.empty()) {
+            text += "\t" + plainLine(description.substr(0, length));
+        }
+        text += "\n";
+    }
+
+    void _offerSource(const std::string& placeholder) {
+        for (const auto& [name, offer] : kSources) {
+            if (name == placeholder) {
+                (this->*offer)();
+            }
+        }
+    }
+
+    const ZRLab& _lab() const {
+        loadModule(_line.plugin);
+        return ZRLab::defaultLab();
+    }
+
+    void _offerNames() {
+        const ZRLab& lab = _lab();
+        for (const auto& diagnostic : lab.diagnostics()) {
+            _offer(diagnostic.name, diagnostic.summary);
+        }
+        const auto offer = [&](Part kind, const std::vector<std::string>& names) {
+            for (const std::string& name : names) {
+                const auto description = describePart(lab, kind, name);
+                _offer(name, description.has_value() ? description->summary() : "");
+            }
+        };
+        offer(Part::Experiment, lab.experimentNames());
+        if (_line.command->get_name() == "describe") {
+            offer(Part::Analysis, lab.analysisNames());
+        }
+    }
+
+    void _offerCommands() { offerCommands(*_line.command->get_parent()); }
+
+    // The parameters of the names on the line; of all names when there is none yet.
+    void _offerParameters() {
+        const ZRLab& lab = _lab();
+        std::set<std::string> offered;
+        const auto offer = [&](Part kind, const std::string& part) {
+            const auto description = describePart(lab, kind, part);
+            if (!description.has_value()) {
+                return;
+            }
+            for (const auto& [name, parameter] : description->parameters()) {
+                for (const std::string& word :
+                     {name + "=", std::string(partText(kind)) + ":" + name + "="}) {
+                    if (offered.insert(word).second) {
+                        _offer(word, parameter.summary());
+                    }
+                }
+            }
+        };
+        for (const std::string& name :
+             _line.positionals.empty() ? runnableNames(lab) : _line.positionals) {
+            const auto diagnostic = lab.diagnosticNamed(name);
+            offer(Part::Experiment, diagnostic.has_value() ? diagnostic->experimentName : name);
+            if (diagnostic.has_value()) {
+                offer(Part::Analysis, diagnostic->analysisName);
+            }
+        }
+    }
+
+    void _offerDevices() {
+        loadDeviceModules(_line.deviceModules);
+        DeviceChoice choice;
+        choice.device = _value;
+        const std::string kindPrefix =
+            _value.substr(0, _value.size() - deviceArgument(choice).size());
+        for (const devices::Kind& kind : devices::kinds()) {
+            const std::string withKind = kind.name + ":";
+            _offer(withKind, kind.summary);
+            // Devices of the first kind need no kind.
+            const bool isBare =
+                withKind != kindPrefix && kind.name == devices::kinds().front().name;
+            for (const devices::Entry& device :
+                 kind.list ? kind.list() : std::vector<devices::Entry>()) {
+                _offer((isBare ? "" : withKind) + device.name, device.summary);
+            }
+        }
+        _offerFiles(kindPrefix);
+    }
+
+    void _offerAnyFile() { _offerFiles(""); }
+
+    // Files behind one prefix only: the first one that is offered.
+    void _offerFiles(const std::string& prefix) {
+        if (text.find(":files") == std::string::npos) {
+            text += ":files\t" + _prefix + prefix + "\n";
+        }
+    }
+
+    struct Source {
+        std::string_view placeholder;
+        void (Answer::*offer)();
+    };
+    static const Source kSources[7];
+
+    const Line& _line;
+    const std::string _prefix;
+    const std::string _value;
+};
+
+const Answer::Source Answer::kSources[] = {
+    {"NAME", &Answer::_offerNames},
+    {"COMMAND", &Answer::_offerCommands},
+    {"DEVICE", &Answer::_offerDevices},
+    {"WHAT", &Answer::_offerDevices},
+    {"PARAM=VALUE", &Answer::_offerParameters},
+    {"FILE", &Answer::_offerAnyFile},
+    {"PATH", &Answer::_offerAnyFile},
+};
 
 }  // namespace
 
-std::string completionScript(const CLI::App& app, const std::string& shell) {
-    if (shell == "bash") {
-        return "# Completion of zrlab for bash.\n" + wordsFunction(app) +
-               "_zrlab() {\n"
-               "    local word=\"${COMP_WORDS[COMP_CWORD]}\" last=\"${COMP_WORDS[COMP_CWORD-1]}\"\n"
-               "    if [ \"$COMP_CWORD\" -eq 1 ]; then last=zrlab; fi\n"
-               "    COMPREPLY=($(compgen -W \"$(_zrlab_words \"${COMP_WORDS[1]}\" \"$last\" "
-               "\"$word\" \"$1\")\" -- \"$word\"))\n"
-               "}\n"
-               "complete -F _zrlab zrlab ./zrlab\n";
+std::string completions(const CommandLine& commandLine, std::vector<std::string> words) {
+    std::string value;
+    if (!words.empty()) {
+        value = std::move(words.back());
+        words.pop_back();
     }
-    if (shell == "zsh") {
-        return "#compdef zrlab\n# Completion of zrlab for zsh.\n" + wordsFunction(app) +
-               "_zrlab() {\n"
-               "    local last=\"${words[CURRENT-1]}\"\n"
-               "    case \"$last\" in\n"
-               "        --output|--report|--plugin|--device-module) _files; return;;\n"
-               "    esac\n"
-               "    [ \"$CURRENT\" -eq 2 ] && last=zrlab\n"
-               "    compadd -- ${(f)\"$(_zrlab_words \"${words[2]}\" \"$last\" \"\" "
-               "\"${words[1]}\" | tr ' ' "
-               "'\\n')\"}\n"
-               "}\n"
-               "_zrlab \"$@\"\n";
+    Line line{.command = &commandLine.app(),
+              .positionals = {},
+              .plugin = commandLine.plugin,
+              .deviceModules = {}};
+    for (const std::string& word : words) {
+        line.read(word);
     }
-    return "";
+    std::string prefix;
+    if (line.waiting == nullptr && value.starts_with("--") &&
+        value.find('=') != std::string::npos) {
+        prefix = value.substr(0, value.find('=') + 1);
+        value.erase(0, prefix.size());
+        line.read(prefix.substr(0, prefix.size() - 1));
+        if (line.waiting == nullptr) {
+            return "";
+        }
+    }
+    Answer answer(line, std::move(prefix), value);
+    try {
+        if (line.waiting != nullptr) {
+            answer.offerValues(*line.waiting);
+        } else if (value.starts_with("-")) {
+            answer.offerOptions();
+        } else {
+            answer.offerArguments();
+        }
+    } catch (const std::exception&) {
+        // A module cannot be loaded or throws: what it would offer is not known.
+    }
+    return std::move(answer.text);
 }
 
 }  // namespace host

@@ -44,13 +44,14 @@ std::size_t kindLength(std::string_view device) {
     return length != std::string_view::npos && device[length] == ':' ? length : 0;
 }
 
-devices::Kind kindOf(const DeviceChoice& choice) {
+// `option` is what comes before the device on the command line.
+devices::Kind kindOf(const std::string& device, const std::string& option = "") {
     const std::vector<devices::Kind> kinds = devices::kinds();
-    const std::size_t length = kindLength(choice.device);
+    const std::size_t length = kindLength(device);
     if (length == 0) {
         return kinds.front();
     }
-    const std::string name = choice.device.substr(0, length);
+    const std::string name = device.substr(0, length);
     std::vector<std::string> names;
     for (const devices::Kind& kind : kinds) {
         if (kind.name == name) {
@@ -58,8 +59,15 @@ devices::Kind kindOf(const DeviceChoice& choice) {
         }
         names.push_back(kind.name);
     }
-    throw Problem(kExitUsage, "--device " + choice.device + ": unknown kind of device \"" + name +
-                                  "\"" + input::didYouMean(name, names));
+    const std::string meant = input::didYouMean(name, names);
+    throw Problem(kExitUsage, option + device + ": unknown kind of device \"" + name + "\"" +
+                                  (meant.empty() ? "; zrlab devices --kinds lists them" : meant));
+}
+
+// What the device is asked for by: the part behind its kind.
+std::string argumentOf(const std::string& device) {
+    const std::size_t length = kindLength(device);
+    return length == 0 ? device : device.substr(length + 1);
 }
 
 // Where to look for a device's name, unless one is near enough to have been suggested or a file was meant.
@@ -72,6 +80,31 @@ std::string whereListed(const devices::Kind& kind, const std::string& name) {
     }
     return !names.empty() && input::nearest(name, names).empty() ? "; zrlab devices lists them"
                                                                  : "";
+}
+
+// The answer of a kind; what it throws instead becomes a Problem.
+template <class Ask>
+auto answer(const devices::Kind& kind, const std::string& what, const Ask& ask) {
+    try {
+        return ask();
+    } catch (const std::invalid_argument& problem) {
+        throw Problem(kExitUsage, problem.what() + whereListed(kind, what));
+    } catch (const std::exception& problem) {
+        throw Problem(kExitError, problem.what());
+    }
+}
+
+// An operation that a kind need not have; `done` is what cannot be done without it.
+template <class Operation>
+const Operation& require(const Operation& operation,
+                         const devices::Kind& kind,
+                         const std::string& device,
+                         const std::string& done) {
+    if (!operation) {
+        throw Problem(kExitUsage,
+                      device + ": devices of the kind \"" + kind.name + "\" cannot be " + done);
+    }
+    return operation;
 }
 
 }  // namespace
@@ -93,24 +126,30 @@ void loadDeviceModules(const std::vector<std::string>& files) {
 }
 
 std::string deviceArgument(const DeviceChoice& choice) {
-    const std::size_t length = kindLength(choice.device);
-    return length == 0 ? choice.device : choice.device.substr(length + 1);
+    return argumentOf(choice.device);
 }
 
 devices::Device openDevice(const DeviceChoice& choice) {
-    const devices::Kind kind = kindOf(choice);
+    const devices::Kind kind = kindOf(choice.device, "--device ");
     if (choice.speed.has_value() && !kind.takesSpeed) {
         throw Problem(kExitUsage, "--speed " + *choice.speed + ": devices of the kind \"" +
                                       kind.name + "\" do not take a speed");
     }
     const double speed = choice.speed.has_value() ? readSpeed(*choice.speed) : 1;
-    try {
-        return kind.open({.what = deviceArgument(choice), .speed = speed});
-    } catch (const std::invalid_argument& problem) {
-        throw Problem(kExitUsage, problem.what() + whereListed(kind, deviceArgument(choice)));
-    } catch (const std::exception& problem) {
-        throw Problem(kExitError, problem.what());
-    }
+    const std::string what = argumentOf(choice.device);
+    return answer(kind, what, [&] { return kind.open({.what = what, .speed = speed}); });
+}
+
+std::string showDevice(const std::string& device) {
+    const devices::Kind kind = kindOf(device);
+    const auto& show = require(kind.show, kind, device, "shown");
+    const std::string what = argumentOf(device);
+    return answer(kind, what, [&] { return show(what); });
+}
+
+std::vector<std::string> checkDevice(const std::string& device) {
+    const devices::Kind kind = kindOf(device);
+    return require(kind.check, kind, device, "checked")(argumentOf(device));
 }
 
 std::vector<devices::Entry> listDevices() {

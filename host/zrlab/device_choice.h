@@ -33,6 +33,14 @@ std::string deviceArgument(const DeviceChoice& choice);
 // wrong or that the kind does not take; kExitError about a device that fails.
 devices::Device openDevice(const DeviceChoice& choice);
 
+// The description of a device, as its kind shows it. Throws a Problem as openDevice() does, and kExitUsage
+// when the kind does not show its devices.
+std::string showDevice(const std::string& device);
+
+// What is wrong with a description of a device, one line for each problem; none when it is valid. Throws a
+// Problem (kExitUsage) about an unknown kind, and about one that has no descriptions.
+std::vector<std::string> checkDevice(const std::string& device);
+
 // The devices that the registered kinds list, by kind. The simulator's, which come first, go without
 // their kind.
 std::vector<devices::Entry> listDevices();

@@ -2,16 +2,19 @@
 #include <algorithm>
 #include <exception>
 #include <string>
+#include <string_view>
 
 #include <fmt/format.h>
 
 #include "frame/host_interface.h"
 #include "host/record/problem.h"
-#include "host/record/run_text.h"
 #include "host/run/module_loader.h"
 #include "host/run/planner.h"
 #include "host/zrlab/command_line.h"
+#include "host/zrlab/completion.h"
+#include "host/zrlab/describe.h"
 #include "host/zrlab/device_choice.h"
+#include "host/zrlab/device_command.h"
 #include "host/zrlab/interrupt.h"
 #include "host/zrlab/session.h"
 #include "host/zrlab/terminal.h"
@@ -21,30 +24,15 @@ namespace host {
 
 namespace {
 
-int print(const std::string& text) {
+// The command of the completion scripts. It is not a part of the command line: the words behind it can
+// be anything.
+constexpr std::string_view kComplete = "complete";
+
+int print(std::string_view text) {
     if (!Terminal::shared().output(text)) {
         throw Problem(kExitError, "cannot write standard output");
     }
     return kExitPassed;
-}
-
-std::string parameterLines(const ZRDescription& description) {
-    std::string out;
-    for (const auto& [name, parameter] : description.parameters()) {
-        out += fmt::format("    {:<12}  {}  {}\n", name,
-                           parameter.required() ? "required" : "optional", parameter.summary());
-    }
-    return out.empty() ? "    no parameters\n" : out;
-}
-
-// A part as a paragraph; nothing when no such part is registered.
-std::string partParagraph(Part part, const std::string& name) {
-    const auto description = describePart(ZRLab::defaultLab(), part, name);
-    if (!description.has_value()) {
-        return "";
-    }
-    return fmt::format("{} {}\n  {}\n{}", partText(part), name, description->summary(),
-                       parameterLines(*description));
 }
 
 int list(bool namesOnly) {
@@ -56,46 +44,7 @@ int list(bool namesOnly) {
         }
         return print(out);
     }
-    const auto section = [&lab](Part part, const std::vector<std::string>& names) {
-        std::string out;
-        for (const std::string& name : names) {
-            const auto description = describePart(lab, part, name);
-            out += fmt::format("  {:<26}  {}\n", name,
-                               description.has_value() ? description->summary() : "");
-        }
-        return out;
-    };
-    std::string out = "Experiments\n" + section(Part::Experiment, lab.experimentNames());
-    out += "\nAnalyses\n" + section(Part::Analysis, lab.analysisNames());
-    out += "\nDiagnostics\n";
-    for (const auto& diagnostic : lab.diagnostics()) {
-        out += fmt::format("  {:<26}  {}\n", diagnostic.name, diagnostic.summary);
-    }
-    return print(out);
-}
-
-int describe(const std::vector<std::string>& names) {
-    const ZRLab& lab = ZRLab::defaultLab();
-    std::string out;
-    for (const std::string& name : names) {
-        std::string text;
-        if (const auto diagnostic = lab.diagnosticNamed(name)) {
-            text = fmt::format("diagnostic {}\n  {}\n\n{}\n{}", name, diagnostic->summary,
-                               partParagraph(Part::Experiment, diagnostic->experimentName),
-                               partParagraph(Part::Analysis, diagnostic->analysisName));
-        } else {
-            text = partParagraph(Part::Experiment, name) + partParagraph(Part::Analysis, name);
-        }
-        if (text.empty()) {
-            std::vector<std::string> known = runnableNames(lab);
-            const auto analyses = lab.analysisNames();
-            known.insert(known.end(), analyses.begin(), analyses.end());
-            throw Problem(kExitUsage, "unknown experiment, analysis or diagnostic \"" + name +
-                                          "\"" + input::didYouMean(name, known));
-        }
-        out += (out.empty() ? "" : "\n") + text;
-    }
-    return print(out);
+    return print(listText(lab));
 }
 
 int deviceKinds() {
@@ -128,10 +77,11 @@ int help(const std::string& topic) {
     if (topic.empty()) {
         return print(commandLine.app().help());
     }
-    const CLI::App* command = commandLine.find(topic);
+    const CLI::App* command = subcommandOf(commandLine.app(), topic);
     if (command == nullptr) {
+        const std::string meant = input::didYouMean(topic, commandNames(commandLine.app()));
         throw Problem(kExitUsage, "help: unknown command \"" + topic + "\"" +
-                                      input::didYouMean(topic, commandLine.commandNames()));
+                                      (meant.empty() ? "; zrlab --help lists them" : meant));
     }
     return print(command->help(commandLine.app().get_name()));
 }
@@ -149,7 +99,7 @@ int withPlugin(const CommandLine& commandLine) {
         return list(commandLine.namesOnly);
     }
     if (command == "describe") {
-        return describe(commandLine.subjects);
+        return print(describeText(ZRLab::defaultLab(), commandLine.subjects, commandLine.limits));
     }
     loadDeviceModules(commandLine.session.device.modules);
     return runSession(commandLine.session);
@@ -158,20 +108,29 @@ int withPlugin(const CommandLine& commandLine) {
 int run(int count, const char* const* arguments) {
     interrupt::watch();
     CommandLine commandLine;
+    registerBuiltInKinds();
+    if (count > 1 && arguments[1] == kComplete) {
+        return print(completions(commandLine, {arguments + 2, arguments + count}));
+    }
     if (const auto answer = commandLine.read(count, arguments)) {
         return print(*answer);
     }
-    registerBuiltInKinds();
     const std::string command = commandLine.command();
     if (command == "devices") {
         loadDeviceModules(commandLine.session.device.modules);
         return commandLine.kindsOnly ? deviceKinds() : listedDevices(commandLine.namesOnly);
     }
+    if (command == "device") {
+        loadDeviceModules(commandLine.session.device.modules);
+        const DeviceAnswer answer = deviceCommand(commandLine.action, commandLine.subjects);
+        print(answer.text);
+        return answer.status;
+    }
     if (command == "help") {
         return help(commandLine.helpTopic);
     }
     if (command == "completion") {
-        return print(completionScript(commandLine.app(), commandLine.shell));
+        return print(completionScript(commandLine.shell));
     }
     if (command == "manual") {
         return print(manualPage(commandLine.app(), commandLine.session.version));

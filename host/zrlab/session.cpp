@@ -90,6 +90,9 @@ class Session {
     }
 
     int run() {
+        for (const std::string& warning : valueWarnings(_record.planned)) {
+            Terminal::shared().complain(warning);
+        }
         const auto start = std::chrono::steady_clock::now();
         _stop = interrupt::deferFirst();
         _tell([this](RunListener& report) { report.sessionStarted(_record); });

@@ -52,7 +52,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
         file.content = openOutputFile(file.path, file.form->streams);
         _listeners.push_back(file.form->open(
             [content = file.content](std::string_view text) { content->append(text); },
-            {.colour = false, .verbose = options.verbose}));
+            {.colour = false, .verbose = options.verbose, .heading = true}));
     }
 }
 

@@ -12,7 +12,6 @@
 
 namespace {
 
-using platform::Dictionary;
 using platform::ErrorRef;
 using platform::List;
 using platform::Number;
@@ -93,24 +92,6 @@ TEST_F(ImageExperiment, CapturesTheImagesInOrder) {
     }
 }
 
-TEST_F(ImageExperiment, KeepsTheKindsOfTheNumbers) {
-    sensor().startTemperature = 36.5;
-    sensor().firstTimestamp = 4294967295;
-    const std::optional<List> images = run(1, kGenerous);
-    ASSERT_TRUE(images.has_value() && images->size() == 1);
-    const platform::Value first = (*images)[0];
-    ASSERT_NE(first.dictionary(), nullptr);
-    const Dictionary& image = *first.dictionary();
-    EXPECT_EQ(image.size(), 5U);
-    EXPECT_EQ(image.number("frameID"), Number(std::uint32_t{1}));
-    EXPECT_EQ(image.number("timestampInMilliseconds"), Number(std::uint32_t{4294967295}));
-    EXPECT_EQ(image.number("tmonDataInC"), Number(36.5F));
-    for (const std::string_view key : {"dScanI", "dScanQ"}) {
-        ASSERT_NE(image[key].list(), nullptr);
-        EXPECT_EQ(image[key].list()->size(), 48U);
-    }
-}
-
 // A run loop without sources has finished: what came until then is the result, were it nothing.
 TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
     for (const std::uint64_t report : {1U, 4U}) {
@@ -120,14 +101,6 @@ TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
         EXPECT_EQ(images->size(), report - 1);
         EXPECT_EQ(journal(), joined(kOpening, kClosing));
     }
-}
-
-TEST_F(ImageExperiment, HandsOnTheErrorOfTheSensor) {
-    const ErrorRef reported = test::sensorError("laser off");
-    sensor().errorAtReport = {.report = 3, .error = reported};
-    EXPECT_EQ(run(10, kGenerous), std::nullopt);
-    EXPECT_EQ(error, reported);  // the same object
-    EXPECT_EQ(journal(), joined(kOpening, joined(kClosing, kClosing)));
 }
 
 TEST_F(ImageExperiment, TimesOutAndDropsWhatCame) {

@@ -6,6 +6,7 @@ check_page_test.py GOOD.html
 
 import pathlib
 import sys
+import tempfile
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[2] / "tools"))
 import check_page
@@ -21,6 +22,8 @@ BROKEN = [
     ("<main ", '<main onclick="f()" ', "a script in onclick"),
     ("</main>", '<img src="http://example.org/x.png"></main>', "<img> refers to http://example.org"),
     ("</style>", "a { background: url(x.png) }</style>", "the style sheet loads something"),
+    ("</main>", '<nav aria-label="Sections of FaultDiagnostic"></nav></main>',
+     "two landmarks <nav> have the name Sections of FaultDiagnostic"),
     ('id="run-1-2"', 'id="run-1-1"', "the id run-1-1 is there twice"),
     ('id="results"', "", "the id results is referred to and missing"),
     ('role="img" aria-labelledby', "aria-labelledby", "no name for screen readers"),
@@ -41,7 +44,12 @@ def main():
             missed.append(f"{old} -> {new}: expected \"{expected}\", found {found}")
     if not check_page.problems_of(good, good.replace("<h2 ", "<h3 "), []):
         missed.append("a page that the browser repaired was accepted")
-    print("\n".join(missed) or f"{len(BROKEN) + 2} pages judged as they should be")
+    with tempfile.NamedTemporaryFile(suffix=".html", mode="w") as wide:
+        wide.write(good.replace("</main>", '<p style="width: 30rem">too wide</p></main>'))
+        wide.flush()
+        if "too wide" not in check_page.cut_off(pathlib.Path(wide.name)):
+            missed.append("a paragraph that is cut off was accepted")
+    print("\n".join(missed) or f"{len(BROKEN) + 3} pages judged as they should be")
     return 1 if missed else 0
 
 

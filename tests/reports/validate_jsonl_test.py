@@ -22,6 +22,14 @@ GOOD = [
                        {"type": "GREATER_THAN_OR_EQUAL", "value": 3}]}}},
     {"testStepArtifact": {"testStepId": "0", "diagnosis": {"verdict": "n-pass", "type": "PASS"}}},
     {"testStepArtifact": {"testStepId": "0", "testStepEnd": {"status": "COMPLETE"}}},
+    {"testStepArtifact": {"testStepId": "1", "testStepStart": {"name": "s"}}},
+    {"testStepArtifact": {"testStepId": "1", "measurementSeriesStart": {
+        "name": "m", "measurementSeriesId": "a", "hardwareInfoId": "h"}}},
+    {"testStepArtifact": {"testStepId": "1", "measurementSeriesElement": {
+        "index": 0, "value": 3, "timestamp": "2026-11-24T17:34:07.125Z", "measurementSeriesId": "a"}}},
+    {"testStepArtifact": {"testStepId": "1", "measurementSeriesEnd": {
+        "measurementSeriesId": "a", "totalCount": 1}}},
+    {"testStepArtifact": {"testStepId": "1", "testStepEnd": {"status": "SKIP"}}},
     {"testRunArtifact": {"testRunEnd": {"status": "COMPLETE", "result": "PASS"}}},
 ]
 STEP = "testStepArtifact"
@@ -56,15 +64,22 @@ BROKEN = [
     (change(3, STEP, "measurement", "value", to=2), 5, "PASS although a validator is not met"),
     (change(4, STEP, "diagnosis", "type", to="FAIL"), 5, "FAIL although all validators are met"),
     (change(4, STEP, "testStepId", to="1"), 5, "step 1 is not open"),
-    (change(5, STEP, "testStepEnd", "status", to="ERROR"), 7, "although a step ended with an error"),
-    (change(6, RUN, "testRunEnd", "result", to="NOT_APPLICABLE"), 7, "status COMPLETE with result"),
+    (change(5, STEP, "testStepEnd", "status", to="ERROR"), 12, "although a step ended with an error"),
+    (change(7, STEP, "measurementSeriesStart", "hardwareInfoId", to="x"), 8, "unknown hardware x"),
+    (change(8, STEP, "measurementSeriesElement", "index", to=1), 9, "series a has no element 0"),
+    (change(8, STEP, "measurementSeriesElement", "value", to=None), 9, "measurementSeriesElement.value"),
+    (change(9, STEP, "measurementSeriesEnd", "totalCount", to=2), 10, "series a has 1 elements"),
+    (change(11, RUN, "testRunEnd", "result", to="NOT_APPLICABLE"), 12, "status COMPLETE with result"),
     (remove(0), 1, "schema version"),
     (remove(1), 2, "a step starts before the run"),
-    (remove(5), 6, "the run ends with open steps: ['0']"),
-    (remove(6), 6, "the run never ends"),
+    (remove(5), 11, "the run ends with open steps: ['0']"),
+    (remove(7), 8, "series a is not open in step 1"),
+    (remove(9), 10, "step 1 ends with open series: ['a']"),
+    (remove(11), 11, "the run never ends"),
     (repeat(1, 2), 3, "the run starts twice"),
     (repeat(2, 3), 4, "step 0 starts twice"),
-    (repeat(6, 7), 8, "an artifact follows the run's end"),
+    (repeat(7, 8), 9, "series a starts twice"),
+    (repeat(11, 12), 13, "an artifact follows the run's end"),
 ]
 
 

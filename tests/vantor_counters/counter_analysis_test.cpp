@@ -6,7 +6,6 @@
 
 #include <gmock/gmock.h>
 
-#include "tests/support/is_error.h"
 #include "vantor_counters/expected_channels.h"
 
 namespace {
@@ -48,15 +47,6 @@ TEST(CounterAnalysis, GivesEachChannelItsOwnMeasurementAndLimit) {
             EXPECT_EQ(&bound->value()->unit(), &ZRDimensionlessUnit::events());
         }
     }
-}
-
-TEST(CounterAnalysis, ReportsTheFirstOfSeveralMissing) {
-    platform::ErrorRef error;
-    EXPECT_THAT(ZRVantorMeterixAnalysis().analyzeExperimentResult(ZRExperimentResult(), &error),
-                IsNull());
-    EXPECT_THAT(error,
-                test::IsPlainError(ZRErrorDomain, 6,
-                                   "Missing measurement for Number Xel INT_ADC_READY_LATCH"));
 }
 
 TEST(CounterDescriptions, SayWhatTheyAreFor) {

@@ -17,7 +17,6 @@
 namespace {
 
 using simulator::CounterChannel;
-using simulator::Fault;
 using simulator::MeterixProfile;
 using testing::IsNull;
 
@@ -65,30 +64,6 @@ TEST(CounterExperiment, MeasuresTheKeptChannelsOnly) {
     EXPECT_EQ(&(*result->measurements().find("A"))->unit(), &ZRDimensionlessUnit::events());
     EXPECT_TRUE(result->auxiliaryData().empty());
     EXPECT_NE(runOn({.channels = {{"CPU", "Cores", "A", 5}}}, nullptr), nullptr);
-}
-
-TEST(CounterExperiment, AFailureCarriesTheFacilitysError) {
-    const auto cause = std::make_shared<const platform::Error>("Meterix", 5, "gone");
-    const struct {
-        MeterixProfile profile;
-        std::string_view text;
-        platform::ErrorRef underlying;
-    } kCases[] = {
-        {{.channels = {}, .report = Fault::failing(cause)},
-         "Could not get simple channels.",
-         cause},
-        {{.channels = {}, .firstSnapshot = Fault::failing(cause)},
-         "Could not sample the report.",
-         cause},
-        {{.channels = {{"Q71ISP", "Q71ISP Events", "Deaf", std::nullopt}}},
-         "Could not get the count of Deaf.",
-         nullptr},
-    };
-    for (const auto& [profile, text, underlying] : kCases) {
-        platform::ErrorRef error;
-        EXPECT_THAT(runOn(profile, &error), IsNull());
-        EXPECT_THAT(error, test::IsError(ZRMeterixErrorDomain, 100, text, underlying));
-    }
 }
 
 // A facility that reports an error with a call that went well: the run keeps it, and attaches it to a

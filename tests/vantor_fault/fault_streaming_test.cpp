@@ -37,16 +37,6 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
         {"no frame asked for", [] {}, 0, 0, ""},
         {"a light source read as 32 bits",
          [&] { at(1).set.set(kLight, (std::int64_t{1} << 32) + 2); }, 2, 0, ""},
-        {"unlit for safety",
-         [&] {
-             at(3).set.set(kLight, 0);
-             at(3).set.set("HardwareEvents", 0x12000);
-         },
-         3, 213, "Frame 3 is not illuminated for safety reason!"},
-        {"metadata corrupt", [&] { at(1).metadataIsNoDictionary = true; }, 9, 206,
-         "Frame metadata is not a dictionary!"},
-        {"metadata incomplete", [&] { at(2).remove = {"HardwareEvents"}; }, 9, 206,
-         "Could not create a frame description of frame 2!"},
         {"dropped frames have no ordinal",
          [&] {
              at(1).dropped = true;
@@ -59,8 +49,6 @@ TEST_F(FaultStreaming, EndsAsItsFramesAndItsStopDecide) {
              camera().stop = Fault::failing(test::serviceError("stuck"));
          },
          1, 206, "Frame 1 is not illuminated for unknown reason!"},
-        {"error counters of another kind", [&] { camera().errorCounters = 5; }, 2, 210,
-         "Failed to get error counters from zorvel."},
         {"neither stops nor counts",
          [&] {
              camera().stop = Fault::failing(nullptr);

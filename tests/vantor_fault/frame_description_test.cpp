@@ -68,42 +68,6 @@ TEST(FrameDescription, StartsWithZerosAndNoFloodTemperature) {
               "0,1970-01-01 00:00:00 +0000,nan,0,0,0,0,0,0,0,0,0,0,(null),0,0,0,0,0,0,0\n");
 }
 
-// Every number has its own property, which the row shows under the number's key.
-TEST(FrameDescription, KeepsEachNumberUnderItsKey) {
-    const struct {
-        const Number& (Description::*get)() const;
-        void (Description::*set)(Number);
-    } kProperties[] = {
-        {&Description::projectorMode, &Description::setProjectorMode},
-        {&Description::infraredLightSource, &Description::setInfraredLightSource},
-        {&Description::projectorIndex, &Description::setProjectorIndex},
-        {&Description::projectorPowerLow, &Description::setProjectorPowerLow},
-        {&Description::projectorPowerHigh, &Description::setProjectorPowerHigh},
-        {&Description::projectorPowerFlood, &Description::setProjectorPowerFlood},
-        {&Description::projectorProbeMode, &Description::setProjectorProbeMode},
-        {&Description::projectorPowerProbeA, &Description::setProjectorPowerProbeA},
-        {&Description::projectorPowerProbeB, &Description::setProjectorPowerProbeB},
-        {&Description::projectorPulseWidth, &Description::setProjectorPulseWidth},
-        {&Description::floodActiveTemperature, &Description::setFloodActiveTemperature},
-        {&Description::NTCTemperatureIdle, &Description::setNTCTemperatureIdle},
-        {&Description::NTCTemperatureStandby, &Description::setNTCTemperatureStandby},
-        {&Description::NTCTemperatureActive, &Description::setNTCTemperatureActive},
-        {&Description::DIETemperatureIdle, &Description::setDIETemperatureIdle},
-        {&Description::DIETemperatureStandby, &Description::setDIETemperatureStandby},
-        {&Description::DIETemperatureActive, &Description::setDIETemperatureActive},
-        {&Description::hardwareEvents, &Description::setHardwareEvents},
-    };
-    const auto read = describe(metadata());
-    Description written;
-    for (std::size_t column = 0; column < std::size(kKeys); ++column) {
-        const Number number = Dictionary(metadata()).number(kKeys[column]);
-        EXPECT_EQ((read.get()->*kProperties[column].get)(), number) << kKeys[column];
-        (written.*kProperties[column].set)(number);
-    }
-    const auto numbers = [](const std::string& row) { return row.substr(row.find(".000000,")); };
-    EXPECT_EQ(numbers(written.csvRepresentation()), numbers(read->csvRepresentation()));
-}
-
 TEST(FrameDescription, NeedsANumberUnderEveryKeyButTheFloodTemperature) {
     EXPECT_EQ(describe({}), nullptr);
     for (const std::string_view key : kKeys) {

@@ -34,7 +34,8 @@ struct FrameEvent {
 
 // Frames are numbered by the sensor, from 1 at each start.
 struct StreamProfile {
-    std::string portType;
+    std::string name;               // in a profile
+    std::string portType;           // what a client reads
     platform::Value errorCounters;  // what a client reads: a dictionary, complete or not
 
     platform::MutableDictionary metadata;  // of every frame

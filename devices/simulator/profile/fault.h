@@ -22,6 +22,7 @@ class Fault {
     }
 
     bool fails() const { return _fails; }
+    const platform::ErrorRef& error() const { return _error; }  // null: none, or the call succeeds
 
     // Returns whether the call fails. If it does and there is an error object, stores it in the slot
     // (which may be null).

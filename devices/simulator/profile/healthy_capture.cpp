@@ -6,8 +6,9 @@ namespace simulator {
 
 namespace {
 
-StreamProfile camera(std::string_view portType) {
+StreamProfile camera(std::string name, std::string_view portType) {
     StreamProfile stream;
+    stream.name = std::move(name);
     stream.portType = portType;
     stream.errorCounters = platform::Dictionary{
         {kRylCaptureStreamPropertyValue_I2CErrorCount, 0},
@@ -23,7 +24,7 @@ StreamProfile camera(std::string_view portType) {
 // Powers in milliwatts, the pulse in microseconds, temperatures in degrees Celsius. The light source
 // is 1 and 2 in turn, as an interleaved stream shows it.
 StreamProfile infraredCamera() {
-    StreamProfile stream = camera(kRylCapturePortType_FrontFacingInfraredCamera);
+    StreamProfile stream = camera("front-infrared", kRylCapturePortType_FrontFacingInfraredCamera);
     stream.lightSources = {1, 2};
     constexpr std::pair<std::string_view, double> kMetadata[] = {
         {"MetaDataProjectorMode", 2},        {"MetaDataProjectorIndex", 0},
@@ -61,7 +62,8 @@ StreamProfile infraredCamera() {
 
 CaptureProfile healthyCapture() {
     CaptureProfile profile;
-    profile.streams = {camera("ryl.port.rear"), camera("ryl.port.front"), infraredCamera()};
+    profile.streams = {camera("rear", "ryl.port.rear"), camera("front", "ryl.port.front"),
+                       infraredCamera()};
     return profile;
 }
 

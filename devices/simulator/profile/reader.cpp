@@ -10,7 +10,7 @@
 #include <utility>
 
 #include "devices/simulator/profile/gallery_text.h"
-#include "devices/simulator/profile/part_readers.h"
+#include "devices/simulator/profile/parts.h"
 #include "input/json_reader.h"
 #include "input/nearest.h"
 
@@ -18,10 +18,8 @@ namespace simulator {
 
 using input::DocumentProblem;
 using input::Json;
-using input::JsonKey;
 using input::JsonNode;
 using input::parseJson;
-using input::readObject;
 
 namespace {
 
@@ -82,39 +80,27 @@ struct Layer {
     Json document;
 };
 
-std::string readSummary(const JsonNode& node) {
-    std::string summary = node.asText();
-    if (std::any_of(summary.begin(), summary.end(), isControl)) {
-        node.fail("not one line");
-    }
-    return summary;
+// What a profile that extends null starts from.
+DeviceProfile bareDevice() {
+    DeviceProfile device;
+    device.capture.streams.clear();
+    device.meterix.channels.clear();
+    device.hid.devices.clear();
+    return device;
 }
-
-constexpr JsonKey<DeviceProfile> kProfileKeys[] = {
-    {"$schema", [](const JsonNode& node, DeviceProfile& /*device*/) { node.asText(); }},
-    {"summary",
-     [](const JsonNode& node, DeviceProfile& device) { device.summary = readSummary(node); }},
-    {"extends", [](const JsonNode& node, DeviceProfile& /*device*/) { node.asText(); }},
-    {"capture",
-     [](const JsonNode& node, DeviceProfile& device) { readCapture(node, device.capture); }},
-    {"counters",
-     [](const JsonNode& node, DeviceProfile& device) { readCounters(node, device.meterix); }},
-    {"hid", [](const JsonNode& node, DeviceProfile& device) { readHid(node, device.hid); }},
-    {"display",
-     [](const JsonNode& node, DeviceProfile& device) { readDisplay(node, device.display); }},
-};
 
 // The profile and those that it extends, each before the one that it extends. `at` is the name of the
 // document that is being read.
 std::vector<Layer> readLayers(const std::string& nameOrFile, std::string& at) {
+    std::vector<std::string> none;  // nothing is visited here
     std::vector<Layer> layers;
     Source source = findSource(nameOrFile, {});
     while (true) {
         at = source.name;
         Json document = parseJson(source.text);
         layers.push_back({std::move(source), std::move(document)});
-        const JsonNode root(layers.back().document);
-        if (!root.isObject() || !root.json().contains("extends")) {
+        const JsonNode root(layers.back().document, none);
+        if (!root.isObject() || root.json().value("extends", Json()).is_null()) {
             return layers;
         }
         const JsonNode base = root["extends"];
@@ -145,24 +131,32 @@ std::vector<GalleryEntry> gallery() {
     return entries;
 }
 
-std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile, std::string& problem) {
+std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile,
+                                         std::vector<std::string>& problems) {
     std::string at;
+    std::vector<std::string> found;
+    DeviceProfile device;
     try {
         std::vector<Layer> layers = readLayers(nameOrFile, at);
         std::reverse(layers.begin(), layers.end());
-        DeviceProfile device;
-        for (const Layer& layer : layers) {
-            at = layer.source.name;
+        for (auto layer = layers.begin(); layer != layers.end() && found.empty(); ++layer) {
+            at = layer->source.name;
+            if (layer->document.contains("extends") && layer->document["extends"].is_null()) {
+                device = bareDevice();
+            }
             device.summary.clear();
-            readObject(JsonNode(layer.document), kProfileKeys, device);
+            readProfile(JsonNode(layer->document, found), device);
         }
-        device.name = nameOrFile;
-        return device;
-    } catch (const DocumentProblem& found) {
-        problem = (at.empty() ? "" : at + ": ") + found.what();
-        std::replace_if(problem.begin(), problem.end(), isControl, '?');
-        return std::nullopt;
+    } catch (const DocumentProblem& problem) {
+        found.emplace_back(problem.what());
     }
+    for (std::string& problem : found) {
+        problem.insert(0, at.empty() ? "" : at + ": ");
+        std::replace_if(problem.begin(), problem.end(), isControl, '?');
+        problems.push_back(std::move(problem));
+    }
+    device.name = nameOrFile;
+    return found.empty() ? std::optional(std::move(device)) : std::nullopt;
 }
 
 }  // namespace simulator

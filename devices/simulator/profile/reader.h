@@ -20,9 +20,11 @@ std::vector<GalleryEntry> gallery();
 
 // The profile of that name in the gallery, or of that file (a name with a slash or a dot is a file).
 // A profile may extend another one, which is looked up in the same way; a file's relative to it. On
-// failure returns nothing and stores one line in `problem`: the file or the profile, a JSON pointer
-// (RFC 6901) where there is one, and the reason. A key that is not known is an error.
-std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile, std::string& problem);
+// failure returns nothing and appends a line to `problems` for each thing that is wrong: the file or the
+// profile, a JSON pointer (RFC 6901) where there is one, and the reason. A key that is not known is an error.
+// What is wrong with a profile that is extended hides what is wrong with those that extend it.
+std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile,
+                                         std::vector<std::string>& problems);
 
 }  // namespace simulator
 

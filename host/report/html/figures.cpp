@@ -11,6 +11,7 @@
 
 #include <fmt/format.h>
 
+#include "host/record/frame_gap.h"
 #include "host/record/run_text.h"
 #include "host/report/html/axis.h"
 #include "host/report/html/plot.h"
@@ -21,10 +22,10 @@ namespace {
 
 constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
 
-// "Least 33.32, median 33.33, greatest 66.67 ms (frame 17)."
+// "Least 33.32, median 33.33, greatest 66.67 ms (frame 17)."; `place` says where the greatest is.
 std::string spreadText(const std::vector<Point>& points,
                        std::string_view unit,
-                       std::string_view place) {
+                       const std::function<std::string(double x)>& place) {
     std::vector<Point> drawn;
     std::copy_if(points.begin(), points.end(), std::back_inserter(drawn),
                  [](const Point& point) { return isDrawable(point.y); });
@@ -33,89 +34,125 @@ std::string spreadText(const std::vector<Point>& points,
     }
     std::stable_sort(drawn.begin(), drawn.end(),
                      [](const Point& a, const Point& b) { return a.y < b.y; });
-    return fmt::format("Least {:.2f}, median {:.2f}, greatest {:.2f} {} ({}).", drawn.front().y,
-                       drawn[drawn.size() / 2].y, drawn.back().y, unit,
-                       fmt::format(fmt::runtime(place), drawn.back().x));
+    return fmt::format("Least {:.2f}, median {:.2f}, greatest {:.2f} {} at {}.", drawn.front().y,
+                       drawn[drawn.size() / 2].y, drawn.back().y, unit, place(drawn.back().x));
 }
 
-// A value of each frame over the frame's number.
-std::vector<Point> overFrames(
-    const std::vector<FrameRecord>& frames,
-    const std::function<std::optional<double>(const FrameRecord&)>& value) {
-    std::vector<Point> points;
-    points.reserve(frames.size());
-    for (const FrameRecord& frame : frames) {
-        points.push_back({static_cast<double>(frame.number), value(frame).value_or(kNone)});
+// The drawings of a run's frames, over their received numbers.
+class FrameFigures {
+  public:
+    FrameFigures(const std::vector<FrameRecord>& frames, const std::string& id)
+        : _frames(frames), _id(id), _lost(gapsIn(frames)) {}
+
+    std::string html() const {
+        return _timing(&FrameRecord::presentation, "clock", "Frame interval, device's clock",
+                       "Between presentation times.") +
+               _timing(&FrameRecord::delivered, "arrival", "Frame interval, arrival",
+                       "Real time between two deliveries.") +
+               _temperatures() + _light();
     }
-    return points;
-}
 
-// Milliseconds since the frame before, over the frame's number.
-std::vector<Point> intervals(const std::vector<FrameRecord>& frames, double FrameRecord::*clock) {
-    std::vector<Point> points;
-    for (std::size_t at = 1; at < frames.size(); ++at) {
-        points.push_back({static_cast<double>(frames[at].number),
-                          (frames[at].*clock - frames[at - 1].*clock) * 1000});
-    }
-    return points;
-}
-
-std::string timingFigure(const std::vector<FrameRecord>& frames,
-                         double FrameRecord::*clock,
-                         const std::string& id,
-                         const std::string& title,
-                         const std::string& what) {
-    const std::vector<Point> points = intervals(frames, clock);
-    return linePlot({.figure = {.id = id,
-                                .title = title,
-                                .caption = what + " " + spreadText(points, "ms", "frame {:g}"),
-                                .xLabel = "frame",
-                                .yLabel = "ms since the frame before"},
-                     .series = {{title, "hue-a", points}},
-                     .bands = {}});
-}
-
-std::string temperatureFigure(const std::vector<FrameRecord>& frames, const std::string& id) {
-    // The hue shows the sensor, the dashes its state.
-    static constexpr const char* kHues[] = {"hue-a", "hue-b", "hue-c"};
-    static constexpr const char* kDashes[] = {" dotted", " dashed", ""};
-    LinePlot plot{.figure = {.id = id,
-                             .title = "Temperatures",
-                             .caption = "As the frames' metadata states them, in the device's own "
-                                        "unit. A gap is a frame without the value.",
-                             .xLabel = "frame",
-                             .yLabel = "device's own unit"},
-                  .series = {},
-                  .bands = {}};
-    for (std::size_t at = 0; at < kTemperatureCount; ++at) {
-        std::vector<Point> points =
-            overFrames(frames, [at](const FrameRecord& frame) { return frame.temperatures[at]; });
-        const bool drawn = std::any_of(points.begin(), points.end(),
-                                       [](const Point& point) { return isDrawable(point.y); });
-        if (drawn) {
-            const TemperatureEntry& entry = kTemperatures[at];
-            plot.series.push_back({std::string(entry.name),
-                                   std::string(kHues[static_cast<std::size_t>(entry.sensor)]) +
-                                       kDashes[static_cast<std::size_t>(entry.state)],
-                                   std::move(points)});
+  private:
+    // A value of each frame. The line is broken where frames were lost.
+    std::vector<Point> _points(
+        const std::function<std::optional<double>(std::size_t at)>& value) const {
+        std::vector<Point> points;
+        points.reserve(_frames.size() + _lost.size());
+        auto gap = _lost.begin();
+        for (std::size_t at = 0; at < _frames.size(); ++at) {
+            if (gap != _lost.end() && gap->after == &_frames[at]) {
+                points.push_back({_gapX(*gap++), kNone});
+            }
+            points.push_back({static_cast<double>(_frames[at].number), value(at).value_or(kNone)});
         }
+        return points;
     }
-    return linePlot(plot);
-}
 
-std::string lightFigure(const std::vector<FrameRecord>& frames, const std::string& id) {
-    const std::vector<Point> points =
-        overFrames(frames, [](const FrameRecord& frame) { return frame.lightSource; });
-    return linePlot({.figure = {.id = id,
-                                .title = "Light source",
-                                .caption = "Which light lit a frame, as its metadata states it: 1 "
-                                           "the dots, 2 the flood, anything else neither.",
-                                .xLabel = "frame",
-                                .yLabel = "light source"},
-                     .wholeY = true,
-                     .series = {{"light source", "hue-c", points}},
-                     .bands = {}});
-}
+    static double _gapX(const FrameGap& gap) {
+        return (static_cast<double>(gap.before->number) + static_cast<double>(gap.after->number)) /
+               2;
+    }
+
+    LinePlot _plot(std::string_view suffix,
+                   std::string title,
+                   std::string caption,
+                   std::string yLabel) const {
+        LinePlot plot{.figure = {.id = fmt::format("{}-{}", _id, suffix),
+                                 .title = std::move(title),
+                                 .caption = std::move(caption),
+                                 .xLabel = "frame, as received",
+                                 .yLabel = std::move(yLabel)},
+                      .series = {},
+                      .bands = {},
+                      .gaps = {}};
+        for (const FrameGap& gap : _lost) {
+            plot.gaps.push_back({_gapX(gap), gapText(gap)});
+        }
+        return plot;
+    }
+
+    // Milliseconds since the frame before.
+    std::string _timing(double FrameRecord::*clock,
+                        std::string_view suffix,
+                        const std::string& title,
+                        const std::string& what) const {
+        std::vector<Point> points = _points([&](std::size_t at) {
+            return at > 0 ? std::optional((_frames[at].*clock - _frames[at - 1].*clock) * 1000)
+                          : std::nullopt;
+        });
+        const auto place = [this](double x) {
+            const auto frame = std::find_if(
+                _frames.begin(), _frames.end(),
+                [x](const FrameRecord& one) { return static_cast<double>(one.number) == x; });
+            return frameText(*frame);
+        };
+        LinePlot plot = _plot(suffix, title, what + " " + spreadText(points, "ms", place),
+                              "ms since the frame before");
+        plot.series = {{title, "hue-a", std::move(points)}};
+        return linePlot(plot);
+    }
+
+    std::string _temperatures() const {
+        // The hue shows the sensor, the dashes its state.
+        static constexpr const char* kHues[] = {"hue-a", "hue-b", "hue-c"};
+        static constexpr const char* kDashes[] = {" dotted", " dashed", ""};
+        LinePlot plot =
+            _plot("temperatures", "Temperatures",
+                  "As the frames' metadata states them, in the device's own unit. A line has a gap "
+                  "where a frame lacks the value.",
+                  "device's own unit");
+        for (std::size_t at = 0; at < kTemperatureCount; ++at) {
+            std::vector<Point> points =
+                _points([&](std::size_t frame) { return _frames[frame].temperatures[at]; });
+            const bool drawn = std::any_of(points.begin(), points.end(),
+                                           [](const Point& point) { return isDrawable(point.y); });
+            if (drawn) {
+                const TemperatureEntry& entry = kTemperatures[at];
+                plot.series.push_back({std::string(entry.name),
+                                       std::string(kHues[static_cast<std::size_t>(entry.sensor)]) +
+                                           kDashes[static_cast<std::size_t>(entry.state)],
+                                       std::move(points)});
+            }
+        }
+        return linePlot(plot);
+    }
+
+    std::string _light() const {
+        LinePlot plot =
+            _plot("light", "Light source",
+                  "Which light lit a frame, as its metadata states it: 1 the dots, 2 the "
+                  "flood, anything else neither.",
+                  "light source");
+        plot.wholeY = true;
+        plot.series = {{"light source", "hue-c",
+                        _points([&](std::size_t at) { return _frames[at].lightSource; })}};
+        return linePlot(plot);
+    }
+
+    const std::vector<FrameRecord>& _frames;
+    const std::string& _id;
+    const std::vector<FrameGap> _lost;
+};
 
 // One list of samples of every image; NaN where a sample is not a number.
 std::vector<std::vector<double>> samplesOf(const platform::List& images,
@@ -176,7 +213,8 @@ std::string sampleFigures(const platform::List& images, const std::string& id) {
                              .yLabel = "sample value"},
                   .series = {curve("I", "hue-a", samplesI), curve("Q", "hue-b dashed", samplesQ)},
                   .bands = {envelope("I, all images", "hue-a", samplesI),
-                            envelope("Q, all images", "hue-b", samplesQ)}});
+                            envelope("Q, all images", "hue-b", samplesQ)},
+                  .gaps = {}});
     for (const auto& [name, samples] : {std::pair("I", &samplesI), std::pair("Q", &samplesQ)}) {
         figures += heatMap({.figure = {.id = fmt::format("{}-map-{}", id, name),
                                        .title = fmt::format("{} samples over the images", name),
@@ -198,26 +236,40 @@ std::string imageTemperatureFigure(const platform::List& images, const std::stri
         latest = std::max(latest, (image.milliseconds.asDouble() - start) / 1000);
         points.push_back({latest, image.celsius.isPresent() ? image.celsius.asDouble() : kNone});
     }
+    const auto after = [](double x) { return fmt::format("{:g} s", x); };
     return linePlot({.figure = {.id = id,
                                 .title = "Temperature",
                                 .caption = "The sensor's temperature monitor. " +
-                                           spreadText(points, "°C", "after {:g} s"),
+                                           spreadText(points, "°C", after),
                                 .xLabel = "seconds on the sensor's clock since the first image",
                                 .yLabel = "°C"},
                      .wholeX = false,
                      .series = {{"temperature", "hue-c", points}},
-                     .bands = {}});
+                     .bands = {},
+                     .gaps = {}});
 }
 
 }  // namespace
 
 std::string frameFigures(const RunRecord& run, const std::string& id) {
-    const auto& frames = run.frames;
-    return timingFigure(frames, &FrameRecord::presentation, id + "-clock",
-                        "Frame interval, device's clock", "Between presentation times.") +
-           timingFigure(frames, &FrameRecord::delivered, id + "-arrival", "Frame interval, arrival",
-                        "Real time between two deliveries.") +
-           temperatureFigure(frames, id + "-temperatures") + lightFigure(frames, id + "-light");
+    return FrameFigures(run.frames, id).html();
+}
+
+std::string repetitionFigure(const RepeatRecord& repeat, const std::string& id) {
+    std::vector<Point> points;
+    for (const RepetitionOutcome& one : repeat.outcomes) {
+        points.push_back({static_cast<double>(points.size() + 1), one.seconds});
+    }
+    const auto run = [](double x) { return fmt::format("run {:g}", x); };
+    const std::string caption = spreadText(points, "s", run);
+    return linePlot({.figure = {.id = id + "-seconds",
+                                .title = "Seconds of each run",
+                                .caption = caption,
+                                .xLabel = "run",
+                                .yLabel = "seconds"},
+                     .series = {{"seconds", "hue-a", std::move(points)}},
+                     .bands = {},
+                     .gaps = {}});
 }
 
 std::string imageFigures(const RunRecord& run, const std::string& id) {

@@ -19,33 +19,50 @@ std::string sectionId(std::size_t at) {
     return fmt::format("run-{}", at + 1);
 }
 
-const RepeatRecord* repeatOf(const SessionRecord& session, std::size_t at) {
-    return at < session.repeats.size() ? &session.repeats[at] : nullptr;
+// The run's name; with its place among the runs of that name when there are several.
+std::string titleOf(const SessionRecord& session, std::size_t at) {
+    const std::string& name = session.runs[at].plan.name;
+    std::size_t place = 0;
+    std::size_t count = 0;
+    for (std::size_t other = 0; other < session.runs.size(); ++other) {
+        if (session.runs[other].plan.name == name) {
+            ++count;
+            place = other <= at ? count : place;
+        }
+    }
+    return count == 1 ? name : fmt::format("{} ({} of {})", name, place, count);
+}
+
+std::size_t namesIn(const SessionRecord& session) {
+    return session.runs.size() + session.notStarted().size();
 }
 
 // What was run, and its outcome, in one line each.
 std::string subjectOf(const SessionRecord& session) {
-    return session.runs.size() == 1 ? session.runs.front().plan.name
-                                    : plural(session.runs.size(), "run", "runs");
+    if (namesIn(session) != 1) {
+        return plural(namesIn(session), "run", "runs");
+    }
+    return session.runs.empty() ? session.planned.front().name : session.runs.front().plan.name;
 }
 
 std::string outcomeOf(const SessionRecord& session) {
+    if (session.verdict == Verdict::Interrupted) {
+        return interruptionText(session);
+    }
+    std::uint64_t runs = session.runs.size();
+    auto passed = static_cast<std::uint64_t>(
+        std::count_if(session.runs.begin(), session.runs.end(),
+                      [](const RunRecord& run) { return run.verdict == Verdict::Passed; }));
     if (!session.repeats.empty()) {
-        std::uint64_t runs = 0;
-        std::uint64_t passed = 0;
+        runs = passed = 0;
         for (const RepeatRecord& repeat : session.repeats) {
             runs += repeat.runs;
             passed += repeat.passed;
         }
-        return fmt::format("{} of {} passed", passed, plural(runs, "run", "runs"));
-    }
-    if (session.runs.size() == 1) {
+    } else if (runs == 1) {
         return headline(session.runs.front());
     }
-    const auto passed =
-        std::count_if(session.runs.begin(), session.runs.end(),
-                      [](const RunRecord& run) { return run.verdict == Verdict::Passed; });
-    return fmt::format("{} of {} passed", passed, plural(session.runs.size(), "run", "runs"));
+    return fmt::format("{} of {} passed", passed, plural(runs, "run", "runs"));
 }
 
 std::string factHtml(std::string_view name, std::string_view value, std::string_view more = "") {
@@ -63,7 +80,7 @@ std::string headHtml(const SessionRecord& session) {
 </div>
 </header>
 )",
-                       verdictClass(session.verdict), htmlText(subjectOf(session)),
+                       verdictName(session.verdict), htmlText(subjectOf(session)),
                        verdictHtml(session.verdict), htmlText(outcomeOf(session)),
                        factHtml("Device", session.deviceName, session.deviceSummary) +
                            factHtml("Started", session.started.text()) +
@@ -71,9 +88,9 @@ std::string headHtml(const SessionRecord& session) {
                            factHtml("Bench", "zrlab " + session.version));
 }
 
-// With several runs: a link to each, and its outcome.
+// With several names: a link to each run, its outcome, and which names were not started.
 std::string contentsHtml(const SessionRecord& session) {
-    if (session.runs.size() < 2) {
+    if (namesIn(session) < 2) {
         return "";
     }
     std::string entries;
@@ -81,7 +98,11 @@ std::string contentsHtml(const SessionRecord& session) {
         const RunRecord& run = session.runs[at];
         entries += fmt::format(
             "<li><a href=\"#{}\">{} {}</a> <span class=\"faint\">{}</span></li>\n", sectionId(at),
-            verdictHtml(run.verdict), htmlText(run.plan.name), htmlText(headline(run)));
+            verdictHtml(run.verdict), htmlText(titleOf(session, at)), htmlText(headline(run)));
+    }
+    for (const RunPlan& plan : session.notStarted()) {
+        entries += fmt::format("<li>{} <span class=\"faint\">not started</span></li>\n",
+                               htmlText(plan.name));
     }
     return "<nav class=\"sheet\" aria-label=\"Runs\">\n<ol>\n" + entries + "</ol>\n</nav>\n";
 }
@@ -122,10 +143,11 @@ std::string htmlReport(const SessionRecord& session) {
 <a class="skip" href="#results">Skip to the results</a>
 )",
         verdictText(session.verdict), htmlText(subjectOf(session)), kReportStyle);
-    const bool manyRuns = session.runs.size() > 1 || !session.repeats.empty();
+    const bool manyRuns = namesIn(session) > 1 || !session.repeats.empty();
     page += headHtml(session) + contentsHtml(session) + "<main class=\"sheet\" id=\"results\">\n";
     for (std::size_t at = 0; at < session.runs.size(); ++at) {
-        page += runHtml(session.runs[at], repeatOf(session, at), sectionId(at), manyRuns);
+        page += runHtml(session.runs[at], session.repeatOf(at),
+                        {sectionId(at), titleOf(session, at), manyRuns});
     }
     return page + "</main>\n" + footHtml(session) + "</body>\n</html>\n";
 }

@@ -20,6 +20,8 @@ constexpr std::size_t kFewPoints = 40;
 // The user units of a drawing's data, stretched to its box.
 constexpr double kWidth = 2000;
 constexpr double kHeight = 1000;
+// Gaps that are closer to each other than this share of the axis are drawn as one.
+constexpr double kGapWidth = 1.0 / 250;
 constexpr int kLevels = 16;  // colours of a heat map: classes level-0 to level-15
 
 struct Range {
@@ -107,6 +109,22 @@ std::string bandSvg(const Band& band, const Scale& scale) {
     return fmt::format(R"(<path class="band {}" d="{}z"/>)", band.style, outline);
 }
 
+std::string gapsSvg(const std::vector<Gap>& gaps, const Axis& x) {
+    std::string svg;
+    double last = -1;
+    for (const Gap& gap : gaps) {
+        const double at = x.at(gap.x);
+        if (at - last >= kGapWidth) {
+            svg += fmt::format(
+                "<line class=\"gap\" x1=\"{0:.2f}%\" x2=\"{0:.2f}%\" y1=\"0\" "
+                "y2=\"100%\"><title>{1}</title></line>",
+                100 * at, htmlText(gap.text));
+            last = at;
+        }
+    }
+    return svg;
+}
+
 std::string legendEntry(std::string_view shape, const std::string& style, const std::string& name) {
     return fmt::format(
         "<li><svg class=\"swatch\" width=\"28\" height=\"10\" aria-hidden=\"true\">"
@@ -129,8 +147,7 @@ std::string legendOf(const LinePlot& plot) {
 }
 
 std::string figureOf(const Figure& figure,
-                     const Axis& x,
-                     const Axis& y,
+                     const std::string& axes,
                      std::string_view viewBox,
                      std::string_view kind,
                      const std::string& data,
@@ -152,7 +169,7 @@ std::string figureOf(const Figure& figure,
 )",
         fmt::arg("title", htmlText(figure.title)), fmt::arg("caption", htmlText(figure.caption)),
         fmt::arg("xLabel", htmlText(figure.xLabel)), fmt::arg("yLabel", htmlText(figure.yLabel)),
-        fmt::arg("id", figure.id), fmt::arg("axes", axesSvg(x, y)), fmt::arg("viewBox", viewBox),
+        fmt::arg("id", figure.id), fmt::arg("axes", axes), fmt::arg("viewBox", viewBox),
         fmt::arg("kind", kind), fmt::arg("data", data), fmt::arg("legend", legend));
 }
 
@@ -279,6 +296,10 @@ std::string linePlot(const LinePlot& plot) {
     const Axis y = plot.wholeY ? Axis(up.least - 0.5, up.greatest + 0.5, true)
                                : Axis::around(up.least, up.greatest);
     const Scale scale(x, y);
+    Figure figure = plot.figure;
+    if (!plot.gaps.empty()) {
+        figure.caption += " An upright line stands where frames were lost.";
+    }
     std::string data;
     for (const Band& band : plot.bands) {
         data += bandSvg(band, scale);
@@ -286,8 +307,8 @@ std::string linePlot(const LinePlot& plot) {
     for (const Series& series : plot.series) {
         data += seriesSvg(series, scale, plot);
     }
-    return figureOf(plot.figure, x, y, fmt::format("0 0 {} {}", kWidth, kHeight), "lines", data,
-                    legendOf(plot));
+    return figureOf(figure, axesSvg(x, y) + gapsSvg(plot.gaps, x),
+                    fmt::format("0 0 {} {}", kWidth, kHeight), "lines", data, legendOf(plot));
 }
 
 std::string heatMap(const HeatMap& map) {
@@ -314,7 +335,7 @@ std::string heatMap(const HeatMap& map) {
     const Axis y(-0.5, static_cast<double>(rows) - 0.5, true);
     // The last group may be smaller: its column is cut, so that the marks stay where they belong.
     const double width = static_cast<double>(map.columns.size()) / static_cast<double>(group);
-    return figureOf(figure, x, y, fmt::format("0 0 {:g} {}", width, rows), "cells",
+    return figureOf(figure, axesSvg(x, y), fmt::format("0 0 {:g} {}", width, rows), "cells",
                     cellsSvg(columns, rows, range), colourLegend(range));
 }
 

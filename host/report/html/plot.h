@@ -41,12 +41,19 @@ struct Figure {
     std::string yLabel;
 };
 
+// A place between two x at which something is missing: an upright line.
+struct Gap {
+    double x;
+    std::string text;  // says what is missing; shown on hovering
+};
+
 struct LinePlot {
     Figure figure;
     bool wholeX = true;   // x counts something
     bool wholeY = false;  // y is a state, a whole number
     std::vector<Series> series;
     std::vector<Band> bands;
+    std::vector<Gap> gaps;
 };
 
 // Nothing is drawn, and the text is empty, when no point has a drawable y.

@@ -11,6 +11,7 @@
 #include <fmt/format.h>
 
 #include "host/record/clean_text.h"
+#include "host/record/frame_gap.h"
 #include "host/record/run_text.h"
 #include "host/report/html/figures.h"
 
@@ -21,9 +22,14 @@ namespace {
 // Log lines shown: as many from the start and from the end.
 constexpr std::size_t kLinesAtEachEnd = 500;
 
+// Findings listed of a repetition, and gaps of a run's frames.
+constexpr std::size_t kMostFindings = 5;
+
 struct Column {
     std::string_view name;
-    std::string_view style{};  // class of its cells: "number" lines them up at the right
+    // Class of its cells: "number" lines them up at the right, "judged" stays beside the row's name on
+    // a narrow screen.
+    std::string_view style{};
 };
 
 // A table: a caption, one head cell per column, and rows whose first cell names the row.
@@ -32,13 +38,15 @@ class Table {
     Table(std::string caption, std::vector<Column> columns)
         : _caption(std::move(caption)), _columns(std::move(columns)) {}
 
-    // Cells are HTML, one for each column.
+    // Cells are HTML, one for each column. On a narrow screen each cell shows its column's name.
     void row(const std::vector<std::string>& cells, std::string_view style = "") {
         _rows += style.empty() ? "<tr>" : fmt::format("<tr class=\"{}\">", style);
         for (std::size_t at = 0; at < cells.size(); ++at) {
-            const std::string attributes =
-                (at == 0 ? " scope=\"row\"" : "") + _classOf(_columns[at]);
-            _rows += fmt::format("<{0}{1}>{2}</{0}>", at == 0 ? "th" : "td", attributes, cells[at]);
+            const Column& column = _columns[at];
+            _rows += at == 0
+                         ? fmt::format("<th scope=\"row\"{}>{}</th>", _classOf(column), cells[at])
+                         : fmt::format("<td data-name=\"{}\"{}>{}</td>", column.name,
+                                       _classOf(column), cells[at]);
         }
         _rows += "</tr>\n";
     }
@@ -54,7 +62,7 @@ class Table {
         }
         const std::string caption = htmlText(_caption);
         return fmt::format(
-            "<div class=\"scroll\" role=\"region\" aria-label=\"{0}\" tabindex=\"0\">\n"
+            "<div class=\"scroll\" role=\"group\" aria-label=\"{0}\" tabindex=\"0\">\n"
             "<table>\n<caption>{0}</caption>\n<thead><tr>{1}</tr></thead>\n<tbody>\n{2}</tbody>\n"
             "</table>\n</div>\n",
             caption, head, _rows);
@@ -81,10 +89,8 @@ class Sections {
         }
         const std::string id = fmt::format("{}-{}", _id, ++_count);
         _links += fmt::format("<li><a href=\"#{}\">{}</a></li>\n", id, title);
-        _html += fmt::format(
-            "<section aria-labelledby=\"{0}\">\n<h3 id=\"{0}\">{1}</h3>\n{2}"
-            "</section>\n",
-            id, title, content);
+        _html +=
+            fmt::format("<section>\n<h3 id=\"{}\">{}</h3>\n{}</section>\n", id, title, content);
     }
 
     std::string html(const std::string& name) const {
@@ -184,7 +190,7 @@ std::string failuresHtml(const RunRecord& run) {
         errors += errorHtml(failure, run);
     }
     Table table("Results outside their limits",
-                {{"Result"}, {"Measured", "number"}, {"Limit"}, {"Range"}, {"Deviation"}});
+                {{"Result"}, {"Measured", "judged"}, {"Limit"}, {"Range"}, {"Deviation"}});
     for (const ResultRecord& result : run.results) {
         if (result.judgement == Judgement::Outside) {
             table.row({htmlText(result.name),
@@ -198,8 +204,9 @@ std::string failuresHtml(const RunRecord& run) {
 }
 
 std::string resultsHtml(const RunRecord& run) {
-    Table table("Every result and its limit",
-                {{"Result"}, {"Value", "number"}, {"Unit"}, {"Limit"}, {"Range"}, {"Judgement"}});
+    Table table(
+        "Every result and its limit",
+        {{"Result"}, {"Value", "number"}, {"Unit"}, {"Limit"}, {"Range"}, {"Judgement", "judged"}});
     for (const ResultRecord& result : run.results) {
         table.row(
             {htmlText(result.name), numberText(result.value), htmlText(result.unit),
@@ -209,39 +216,96 @@ std::string resultsHtml(const RunRecord& run) {
     return table.html();
 }
 
-std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
-    if (repeat == nullptr) {
-        return "";
+std::string figuresHtml(const std::string& figures) {
+    return figures.empty() ? "" : "<div class=\"figures\">\n" + figures + "</div>\n";
+}
+
+// What is known of a repetition that did not pass; the JSON report has all of it.
+std::string findingsHtml(const Repetition& one) {
+    std::vector<std::string> findings;
+    for (const FailureRecord& failure : one.failures) {
+        const std::string symptom =
+            failure.error != nullptr
+                ? fmt::format(" <code>{}</code>", htmlText(symptomText(failure, " ")))
+                : "";
+        findings.push_back(htmlText(failureText(failure)) + symptom);
     }
+    for (const ResultRecord& result : one.outside) {
+        findings.push_back(
+            fmt::format("{} <strong class=\"fail\">{}</strong> <span "
+                        "class=\"faint\">{}</span>",
+                        htmlText(result.name), htmlText(valueText(result.value, result.unit)),
+                        htmlText(limitLine(result.limit, result.unit))));
+    }
+    if (findings.empty()) {
+        return htmlText(one.why);
+    }
+    std::string items;
+    for (std::size_t at = 0; at < std::min(findings.size(), kMostFindings); ++at) {
+        items += "<li>" + findings[at] + "</li>";
+    }
+    if (findings.size() > kMostFindings) {
+        items +=
+            fmt::format("<li class=\"faint\">and {} more</li>", findings.size() - kMostFindings);
+    }
+    return "<ul>" + items + "</ul>";
+}
+
+std::string notPassedHtml(const RepeatRecord& repeat) {
+    Table runs("Runs that did not pass",
+               {{"Run"}, {"Verdict", "judged"}, {"Took", "number"}, {"Why", "message"}});
+    for (const Repetition& one : repeat.notPassed) {
+        runs.row({std::to_string(one.number),
+                  fmt::format("<span class=\"{}\">{}</span>", verdictName(one.verdict),
+                              verdictText(one.verdict)),
+                  fmt::format("{:.2f} s", one.seconds), findingsHtml(one)});
+    }
+    const std::uint64_t more = repeat.notPassedCount() - repeat.notPassed.size();
+    return runs.html() + (more > 0 ? fmt::format("<p>{} did not pass.</p>\n",
+                                                 plural(more, "more run", "more runs"))
+                                   : "");
+}
+
+// The share of each verdict, and below it the order in which they came.
+std::string outcomesHtml(const RepeatRecord& repeat) {
     std::string shares;
-    for (const auto& [style, count] :
-         {std::pair("pass", repeat->passed), std::pair("fail", repeat->failed),
-          std::pair("error", repeat->errors)}) {
+    for (const auto& [verdict, count] :
+         {std::pair(Verdict::Passed, repeat.passed), std::pair(Verdict::Failed, repeat.failed),
+          std::pair(Verdict::Error, repeat.errors),
+          std::pair(Verdict::Interrupted, repeat.interrupted)}) {
         if (count > 0) {
-            shares += fmt::format(R"(<i class="{}" style="flex-grow:{}"></i>)", style, count);
+            shares += fmt::format(R"(<i class="{}" style="flex-grow:{}"></i>)",
+                                  verdictName(verdict), count);
         }
     }
-    const std::string counts =
-        fmt::format("{}: {} passed, {} failed, {} in error", plural(repeat->runs, "run", "runs"),
-                    repeat->passed, repeat->failed, repeat->errors);
-    Table runs("Runs that did not pass", {{"Run", "number"}, {"Verdict"}, {"Why"}});
-    for (const Repetition& one : repeat->notPassed) {
-        runs.row({std::to_string(one.number),
-                  fmt::format("<span class=\"{}\">{}</span>", verdictClass(one.verdict),
-                              verdictText(one.verdict)),
-                  htmlText(one.why)});
+    std::string squares;
+    for (const RepetitionOutcome& one : repeat.outcomes) {
+        squares += fmt::format("<i class=\"{}\"></i>", verdictName(one.verdict));
     }
-    const std::uint64_t notListed = repeat->failed + repeat->errors - repeat->notPassed.size();
-    const std::string more = notListed > 0 ? fmt::format("<p>{} did not pass.</p>\n",
-                                                         plural(notListed, "more run", "more runs"))
-                                           : "";
+    std::string html =
+        fmt::format("<div class=\"shares\" role=\"img\" aria-label=\"{}\">{}</div>\n",
+                    countsText(repeat), shares);
+    if (!squares.empty()) {
+        const std::string label =
+            repeat.outcomes.size() < repeat.runs
+                ? fmt::format("The first {} runs in their order", repeat.outcomes.size())
+                : "The runs in their order";
+        html += fmt::format(
+            "<p class=\"faint\">{0}</p>\n<div class=\"strip\" role=\"img\" "
+            "aria-label=\"{0}\">{1}</div>\n",
+            label, squares);
+    }
+    return html;
+}
+
+std::string statisticsHtml(const RepeatRecord& repeat) {
     const std::vector<Column> columns = {
         {"Result"}, {"Least", "number"}, {"Median", "number"}, {"Greatest", "number"}, {"Unit"},
-        {"Limit"},  {"Range"},           {"Outside", "number"}};
+        {"Limit"},  {"Range"},           {"Outside", "judged"}};
     Table table("Results that differed from run to run, or were outside their limits", columns);
     Table alike("Results within their limits and alike in every run", columns);
     std::uint64_t alikeCount = 0;
-    for (const ResultStatistics& result : repeat->results) {
+    for (const ResultStatistics& result : repeat.results) {
         const bool isAlike = result.outside == 0 && result.minimum == result.maximum;
         alikeCount += isAlike ? 1 : 0;
         const std::string outside = fmt::format("{} of {}", result.outside, result.runs);
@@ -256,14 +320,23 @@ std::string repetitionsHtml(const RepeatRecord* repeat, const RunRecord& run) {
                       : outside},
                  result.outside > 0 ? "outside" : "");
     }
+    return table.html() +
+           folded(plural(alikeCount, "result alike in every run", "results alike in every run"),
+                  alike.html());
+}
+
+std::string repetitionsHtml(const RepeatRecord* repeat,
+                            const RunRecord& run,
+                            const std::string& id) {
+    if (repeat == nullptr) {
+        return "";
+    }
     return fmt::format(
-        "<p>{0}. The other sections show run {1}, {2}.</p>\n"
-        "<div class=\"shares\" role=\"img\" aria-label=\"{0}\">{3}</div>\n{4}",
-        counts, run.number,
-        run.verdict == Verdict::Passed ? "the last" : "the first that did not pass", shares,
-        table.html() + runs.html() + more +
-            folded(plural(alikeCount, "result alike in every run", "results alike in every run"),
-                   alike.html()));
+               "<p>{}: {}. The other sections show run {}, {}.</p>\n",
+               plural(repeat->runs, "run", "runs"), countsText(*repeat), run.number,
+               run.verdict == Verdict::Passed ? "the last" : "the first that did not pass") +
+           outcomesHtml(*repeat) + notPassedHtml(*repeat) + statisticsHtml(*repeat) +
+           figuresHtml(repetitionFigure(*repeat, id));
 }
 
 std::string measurementsHtml(const RunRecord& run) {
@@ -299,10 +372,12 @@ std::string logHtml(const RunRecord& run) {
     Table table("Lines that the run logged, with their time of day in UTC",
                 {{"Time", "time"}, {"Level"}, {"Message", "message"}});
     std::size_t errors = 0;
+    std::size_t late = 0;
     for (std::size_t at = 0; at < run.log.size(); ++at) {
         const LogRecord& line = run.log[at];
         const bool isError = line.level == platform::LogLevel::Error;
         errors += isError ? 1 : 0;
+        late += line.late ? 1 : 0;
         if (run.log.size() > 2 * kLinesAtEachEnd && at >= kLinesAtEachEnd &&
             at < run.log.size() - kLinesAtEachEnd) {
             if (at == kLinesAtEachEnd) {
@@ -314,60 +389,69 @@ std::string logHtml(const RunRecord& run) {
             continue;
         }
         const std::string time = line.time.timestamp();
-        table.row({time.substr(time.find('T') + 1, 12), std::string(levelText(line.level)),
-                   htmlText(line.message)},
+        table.row({time.substr(time.find('T') + 1, 12), levelText(line), htmlText(line.message)},
                   isError ? "outside" : "");
     }
     std::string summary = plural(run.log.size(), "line", "lines");
-    if (errors > 0) {
-        summary += fmt::format(", {} of level error", errors);
-    }
+    summary += errors > 0 ? fmt::format(", {} of level error", errors) : "";
+    summary += late > 0 ? fmt::format(", {} that came when the run had ended", late) : "";
     return folded(summary, table.html());
+}
+
+// How many frames came, and where frames were lost.
+std::string framesHtml(const RunRecord& run) {
+    std::string text = framesText(run);
+    if (text.empty()) {
+        return "";
+    }
+    const std::vector<FrameGap> gaps = gapsIn(run.frames);
+    std::string items;
+    for (std::size_t at = 0; at < std::min(gaps.size(), kMostFindings); ++at) {
+        items += "<li>" + htmlText(gapText(gaps[at])) + "</li>\n";
+    }
+    if (gaps.size() > kMostFindings) {
+        items += fmt::format("<li class=\"faint\">and {}</li>\n",
+                             plural(gaps.size() - kMostFindings, "more gap", "more gaps"));
+    }
+    if (!run.framesLost.has_value()) {
+        text += ". The device does not number its frames, so that lost ones cannot be counted";
+    }
+    return "<p>" + htmlText(text) + ".</p>\n" +
+           (items.empty() ? "" : "<ul class=\"gaps\">\n" + items + "</ul>\n");
 }
 
 }  // namespace
 
-std::string_view verdictClass(Verdict verdict) {
-    static constexpr std::string_view kClasses[] = {"pass", "fail", "error"};
-    return kClasses[static_cast<std::size_t>(verdict)];
-}
-
 std::string verdictHtml(Verdict verdict) {
-    // A tick, a cross, an exclamation mark, each in a disc.
+    // A tick, a cross, an exclamation mark, a pause sign, each in a disc.
     static constexpr std::string_view kMarks[] = {"M7 12.5l3.4 3.5 6.6-7.5", "M8 8l8 8M16 8l-8 8",
-                                                  "M12 6.5v7M12 17v.01"};
+                                                  "M12 6.5v7M12 17v.01", "M9 7.5v9M15 7.5v9"};
     return fmt::format(
         "<span class=\"verdict {}\"><svg class=\"disc\" viewBox=\"0 0 24 24\" "
         "aria-hidden=\"true\"><circle cx=\"12\" cy=\"12\" r=\"11\"/><path d=\"{}\"/></svg>"
         "{}</span>",
-        verdictClass(verdict), kMarks[static_cast<std::size_t>(verdict)], verdictText(verdict));
+        verdictName(verdict), kMarks[static_cast<std::size_t>(verdict)], verdictText(verdict));
 }
 
-std::string runHtml(const RunRecord& run,
-                    const RepeatRecord* repeat,
-                    const std::string& id,
-                    bool withOutcome) {
+std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const SectionPlace& place) {
     const std::string outcome =
         fmt::format("<p class=\"outcome\">{} {} <span class=\"faint\">in {:.2f} s</span></p>\n",
                     verdictHtml(run.verdict), htmlText(headline(run)), run.seconds);
-    const auto figures = [](const std::string& content) {
-        return content.empty() ? "" : "<div class=\"figures\">\n" + content + "</div>\n";
-    };
-    Sections sections(id);
+    Sections sections(place.id);
     sections.add("What failed", failuresHtml(run));
+    sections.add("Repetitions", repetitionsHtml(repeat, run, place.id));
+    sections.add("Frames", framesHtml(run) + figuresHtml(frameFigures(run, place.id)));
+    sections.add("Images", figuresHtml(imageFigures(run, place.id)));
     sections.add("Results and limits", resultsHtml(run));
-    sections.add("Repetitions", repetitionsHtml(repeat, run));
     sections.add("Measurements", measurementsHtml(run));
-    sections.add("Frames", figures(frameFigures(run, id)));
-    sections.add("Images", figures(imageFigures(run, id)));
     sections.add("Parameters", parametersHtml(run));
     sections.add("Log", logHtml(run));
     return fmt::format(
         "<section class=\"run\" id=\"{0}\" aria-labelledby=\"{0}-name\">\n"
         "<header>\n<h2 id=\"{0}-name\">{1}</h2>\n{2}<p class=\"summary\">{3}</p>\n{4}</header>\n"
         "{5}</section>\n",
-        id, htmlText(run.plan.name), withOutcome ? outcome : "", htmlText(run.plan.summary),
-        resultStrip(run), sections.html(run.plan.name));
+        place.id, htmlText(place.title), place.withOutcome ? outcome : "",
+        htmlText(run.plan.summary), resultStrip(run), sections.html(place.title));
 }
 
 }  // namespace host

@@ -11,15 +11,15 @@ namespace host {
 // The verdict as a mark and a word, so that it does not depend on colour alone.
 std::string verdictHtml(Verdict verdict);
 
-// "pass", "fail", "error": the class that gives an element the verdict's colour.
-std::string_view verdictClass(Verdict verdict);
+// How a run's section stands in the page.
+struct SectionPlace {
+    std::string id;     // of the section, and the beginning of every id in it
+    std::string title;  // unique in the page
+    bool withOutcome;   // the head shows the run's own verdict, when the page's may differ
+};
 
-// The section; its id, and the beginning of every id in it, is `id`. `repeat` is null when the run was
-// not repeated. `withOutcome`: the head shows the run's own verdict, when the page's may differ.
-std::string runHtml(const RunRecord& run,
-                    const RepeatRecord* repeat,
-                    const std::string& id,
-                    bool withOutcome);
+// The section. `repeat` is null when the run was not repeated.
+std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const SectionPlace& place);
 
 }  // namespace host
 

@@ -1,4 +1,5 @@
 #include <cmath>
+#include <sstream>
 #include <string>
 
 #include <gmock/gmock.h>
@@ -15,10 +16,11 @@ using testing::HasSubstr;
 using testing::Not;
 using testing::Pair;
 
-// The pieces stand in the page in this order.
-void expectInOrder(const std::string& page, const std::vector<std::string>& pieces) {
+// The pieces, which bars separate, stand in the page in this order.
+void expectInOrder(const std::string& page, const std::string& pieces) {
     std::size_t at = page.find("<body>");
-    for (const std::string& piece : pieces) {
+    std::istringstream in(pieces);
+    for (std::string piece; std::getline(in, piece, '|');) {
         const std::size_t found = page.find(piece, at);
         ASSERT_NE(found, std::string::npos) << piece;
         at = found + piece.size();
@@ -26,55 +28,51 @@ void expectInOrder(const std::string& page, const std::vector<std::string>& piec
 }
 
 TEST(HtmlReport, TellsTheVerdictFirstThenWhatFailed) {
-    expectInOrder(host::htmlReport(test::judgedSession()), {"<h1>",
-                                                            "FAIL",
-                                                            "3 of 4 limits not met",
-                                                            "What failed",
-                                                            "above",
-                                                            "3</strong> events",
-                                                            "0 … 0.5 events",
-                                                            "2.5 above",
-                                                            "open",
-                                                            "&gt; 30 events",
-                                                            "on the open bound",
-                                                            "nan",
-                                                            "not a number",
-                                                            "Results and limits",
-                                                            "closed",
-                                                            "within",
-                                                            "above",
-                                                            "outside",
-                                                            "no limit",
-                                                            "Parameters",
-                                                            "80.5",
-                                                            "Log",
-                                                            "late",
-                                                            "zrlab run Diagnostic"});
     expectInOrder(
-        host::htmlReport(test::brokenSession()),
-        {"ERROR", "did not complete", "experiment Experiment, run", "Failed to start streaming.",
-         "PlugInErrorDomain 204", "caused by", "Start was refused", "Capture 7", "caused by",
-         "Stream is busy", "Service -3", "No manager available?!", "property written too early"});
-    expectInOrder(host::htmlReport(test::repeatedSession()),
-                  {"17 of 20 runs passed", "Number of Channel 17", "Repetitions",
-                   "20 runs: 17 passed, 2 failed, 1 in error", "show run 7", "Number of Channel 17",
-                   "2 of 19", "59 results alike in every run"});
+        host::htmlReport(test::judgedSession()),
+        "<h1>|FAIL|3 of 4 limits not met|What failed|above|3</strong> events|0 … 0.5 events|"
+        "2.5 above|open|&gt; 30 events|on the open bound|nan|not a number|Results and limits|"
+        "closed|within|above|outside|no limit|Parameters|80.5|Log|error, late|time-out|"
+        "zrlab run Diagnostic");
+    expectInOrder(host::htmlReport(test::brokenSession()),
+                  "ERROR|did not complete|experiment Experiment, run|Failed to start streaming.|"
+                  "PlugInErrorDomain 204|caused by|Start was refused|Capture 7|caused by|"
+                  "Stream is busy|Service -3|No manager available?!|property written too early");
+    expectInOrder(
+        host::htmlReport(test::repeatedSession()),
+        "17 of 20 runs passed|Number of Channel 17|Repetitions|"
+        "20 runs: 17 passed, 2 failed, 1 in error|show run 7|Runs that did not pass|7|3.25 s|"
+        "Number of Channel 17|3 events|9|1.50 s|Failed to start streaming.|"
+        "PlugInErrorDomain 204|10|71 frames|Number of Channel 17|>0<|>0.5<|>3<|2 of 19|"
+        "59 results alike in every run|Results and limits");
+    expectInOrder(host::htmlReport(test::interruptedSession()),
+                  "INTERRUPTED|FaultDiagnostic stopped after 37 of 90 frames|PASS|ImageExperiment|"
+                  "not started|FaultDiagnostic (1 of 2)|FaultDiagnostic (2 of 2)|"
+                  "stopped after 37 of 90 frames|As measured by the experiment|Channel 59");
 }
 
 TEST(HtmlReport, DrawsWhatThereIsAndNothingElse) {
     const std::string page = host::htmlReport(test::streamedSession(90));
-    expectInOrder(page, {"device&#39;s clock", "greatest 66.67 ms (frame 41)", "arrival",
-                         "Temperatures", "Flood active", "Light source"});
-    // The flood temperature lacks the first ten of thirty frames: three stretches, one line.
-    const std::size_t flood =
-        page.find("class=\"line hue-c\" d=\"", page.find("Temperatures</h4>"));
-    const std::string path = page.substr(flood, page.find('>', flood) - flood);
-    EXPECT_EQ(std::count(path.begin(), path.end(), 'M'), 3);
+    expectInOrder(
+        page,
+        "90 frames delivered, 1 lost.|"
+        "1 frame lost between the received frames 40 and 41 (the sensor&#39;s 40 and 42)|"
+        "device&#39;s clock|greatest 66.67 ms at frame 41 (the sensor&#39;s 42)|"
+        "<line class=\"gap\"|1 frame lost|arrival|Temperatures|Flood active|Light source");
+    // A line is broken where a frame was lost. The flood temperature lacks the first ten of thirty frames as
+    // well, and there was a loss just then.
+    for (const auto& [style, stretches] : {std::pair("hue-a dotted", 2), std::pair("hue-c", 3)}) {
+        const std::size_t line = page.find("class=\"line " + std::string(style) + "\" d=\"",
+                                           page.find("Temperatures</h4>"));
+        const std::string path = page.substr(line, page.find('>', line) - line);
+        EXPECT_EQ(std::count(path.begin(), path.end(), 'M'), stretches) << style;
+    }
     EXPECT_THAT(page, Not(HasSubstr("Images")));
 
     const std::string images = host::htmlReport(test::imagesSession(25));
-    expectInOrder(images, {"frame ID 124", "all 25 images", "I samples over the images",
-                           "Q samples over the images", "°C"});
+    expectInOrder(
+        images,
+        "frame ID 124|all 25 images|I samples over the images|Q samples over the images|°C");
     EXPECT_THAT(images, Not(HasSubstr("Frame interval")));
     for (const std::string& empty :
          {host::htmlReport(test::imagesSession(0)), host::htmlReport(test::judgedSession())}) {
@@ -102,6 +100,13 @@ TEST(HtmlReport, EscapesEveryText) {
 TEST(HtmlReport, StaysSmallHoweverLongTheRun) {
     EXPECT_LT(host::htmlReport(test::streamedSession(20000)).size(), 1'000'000U);
     EXPECT_LT(host::htmlReport(test::imagesSession(3000)).size(), 1'000'000U);
+    host::SessionRecord lossy = test::streamedSession(20000);
+    for (host::FrameRecord& frame : lossy.runs.front().frames) {
+        frame.sensorNumber = static_cast<std::int64_t>(2 * frame.number);
+    }
+    const std::string page = host::htmlReport(lossy);
+    EXPECT_LT(page.size(), 1'000'000U);
+    EXPECT_THAT(page, HasSubstr("and 19994 more gaps"));
 }
 
 TEST(HtmlPlot, DecimationKeepsPeaksOrderAndGaps) {

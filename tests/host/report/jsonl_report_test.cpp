@@ -1,6 +1,7 @@
 #include "host/report/jsonl_report.h"
 
 #include <latch>
+#include <map>
 #include <string>
 #include <thread>
 #include <vector>
@@ -62,7 +63,7 @@ TEST(JsonlReport, WritesAJudgedDiagnostic) {
                "metadata": {"summary": "A device without faults"}}}}})",
          step(e, R"("testStepStart": {"name": "Experiment"})"),
          step(e, R"("log": {"severity": "INFO", "message": "Diagnostic"})"),
-         step(e, R"("log": {"severity": "ERROR", "message": "late"})"),
+         R"({"testRunArtifact": {"log": {"severity": "ERROR", "message": "late: time-out"}}})",
          step(e, R"("measurement": {"name": "Diagnostic", "value": 3.0, "unit": "events",
                                     "hardwareInfoId": "device"})"),
          step(e, R"("measurement": {"name": "Infinite", "value": "inf",
@@ -121,6 +122,52 @@ TEST(JsonlReport, WritesEachImageAndNoDiagnosisOfAnExperiment) {
     EXPECT_EQ(image["content"]["frameID"], 107);
     EXPECT_EQ(image["content"]["dScanI"].size(), 48U);
     EXPECT_EQ(image["content"]["tmonDataInC"], "nan");
+}
+
+TEST(JsonlReport, WritesEachQuantityOfTheFramesAsASeries) {
+    host::SessionRecord session = test::streamedSession(42);
+    session.runs.front().log.clear();
+    std::map<std::string, std::vector<Json>> series;
+    std::map<std::string, std::string> idOf;
+    for (const Json& artifact : artifactsOf(session)) {
+        const Json content = artifact.value("testStepArtifact", Json::object());
+        if (content.contains("measurementSeriesStart")) {
+            const Json& start = content["measurementSeriesStart"];
+            idOf[start["name"]] = start["measurementSeriesId"];
+        } else if (content.contains("measurementSeriesElement")) {
+            const Json& element = content["measurementSeriesElement"];
+            series[element["measurementSeriesId"]].push_back(element);
+        }
+    }
+    EXPECT_EQ(series.size(), 2U + 1 + host::kTemperatureCount);
+    const auto& intervals = series[idOf["frame interval, device's clock"]];
+    ASSERT_EQ(intervals.size(), 41U);
+    EXPECT_EQ(intervals[0]["metadata"], Json({{"frame", 2}}));
+    EXPECT_NEAR(intervals[39]["value"], 66.67, 0.01);
+    EXPECT_EQ(intervals[39]["metadata"], Json({{"frame", 41}, {"sensorFrame", 42}}));
+    const auto& light = series[idOf["light source"]];
+    EXPECT_EQ(light[1]["value"], 2.0);
+    EXPECT_EQ(light[0]["timestamp"], "2026-11-24T17:34:07.201Z");  // 0.2 s after the run's start
+    EXPECT_EQ(series[idOf["RylFloodActiveTemperature"]].size(), 22U);
+}
+
+TEST(JsonlReport, ClosesWhatWasInterruptedAndSkipsWhatWasNotStarted) {
+    const std::vector<Json> artifacts = artifactsOf(test::interruptedSession());
+    const std::string given = "2-FaultDiagnostic-1-experiment";
+    const std::string skipped = "3-ImageExperiment-not-started";
+    expectArtifacts(
+        {artifacts.end() - 8, artifacts.end()},
+        {step(given, R"("measurementSeriesEnd": {"measurementSeriesId": "series-19",
+                                                 "totalCount": 20})"),
+         step(given, R"("diagnosis": {"verdict": "FaultDiagnostic-interrupted", "type": "UNKNOWN",
+             "message": "stopped after 37 of 90 frames", "hardwareInfoId": "device"})"),
+         step(given, R"("testStepEnd": {"status": "ERROR"})"),
+         step(skipped, R"("testStepStart": {"name": "Experiment"})"),
+         step(skipped, R"("log": {"severity": "INFO", "message": "not started"})"),
+         step(skipped, R"("testStepEnd": {"status": "SKIP"})"),
+         R"({"testRunArtifact": {"error": {"symptom": "interrupted", "softwareInfoIds": ["zrlab"],
+             "message": "FaultDiagnostic stopped after 37 of 90 frames"}}})",
+         R"({"testRunArtifact": {"testRunEnd": {"status": "ERROR", "result": "NOT_APPLICABLE"}}})"});
 }
 
 TEST(JsonlReport, CarriesHostileNames) {

@@ -46,7 +46,7 @@ TEST_F(JunitReport, HasACaseForEachResult) {
     EXPECT_EQ(property(suite, "experiment.frameCount"), "90");
     EXPECT_EQ(property(suite, "analysis.frameCount"), "80.5");
     EXPECT_THAT(suite.child("system-out").text().get(),
-                HasSubstr("2026-11-24T17:34:07.020Z error: late\n"));
+                HasSubstr("2026-11-24T17:34:07.020Z error, late: time-out\n"));
 
     const struct {
         const char* name;
@@ -61,7 +61,7 @@ TEST_F(JunitReport, HasACaseForEachResult) {
     };
     for (const auto& [name, kind, finding] : kCases) {
         const pugi::xml_node node = suite.find_child_by_attribute("testcase", "name", name);
-        EXPECT_STREQ(node.attribute("classname").value(), "Diagnostic");
+        EXPECT_STREQ(node.attribute("classname").value(), "healthy.Diagnostic");
         EXPECT_STREQ(node.first_child().name(), kind) << name;
         EXPECT_STREQ(node.child(kind).text().get(), finding);
     }
@@ -101,8 +101,37 @@ TEST_F(JunitReport, JudgesAllRepetitions) {
     EXPECT_STREQ(suite.attribute("time").value(), "61.500");
     EXPECT_EQ(property(suite, "passed"), "17");
     EXPECT_STREQ(caseOf(session, "Number of Channel 17").child("failure").text().get(),
-                 "outside 2 of 19 times: least 0, median 0, greatest 3 events, "
+                 "outside 2 of 19 times: least 0, median 0.5, greatest 3 events, "
                  "Max Reports: 0 … 0 events");
+}
+
+// What the first of two runs had and the second did not come to is skipped, and so is what did not start.
+TEST_F(JunitReport, AnInterruptedRunIsAnErrorAndSkipsWhatItDidNotComeTo) {
+    host::SessionRecord session = test::interruptedSession();
+    session.deviceName = "a device.json";
+    session.runs[1].results = {session.runs[0].results[0]};
+    const pugi::xml_node first = suiteOf(session);
+    EXPECT_EQ(property(first, "frames"), "90 frames delivered, 1 lost");
+    const pugi::xml_node second = first.next_sibling();
+    EXPECT_THAT(counts(second), ElementsAre(62, 0, 1, 60));
+    EXPECT_EQ(property(second, "verdict"), "INTERRUPTED");
+    const pugi::xml_node error = second.find_child_by_attribute("testcase", "name", "run");
+    EXPECT_STREQ(error.attribute("classname").value(), "a_device_json.FaultDiagnostic");
+    EXPECT_STREQ(error.child("error").attribute("type").value(), "interrupted");
+    EXPECT_STREQ(second.find_child_by_attribute("testcase", "name", "Frame Count")
+                     .child("skipped")
+                     .attribute("message")
+                     .value(),
+                 "not known: the run stopped after 37 of 90 frames");
+    const pugi::xml_node third = second.next_sibling();
+    EXPECT_THAT(counts(third), ElementsAre(1, 0, 0, 1));
+    EXPECT_STREQ(third.child("testcase").child("skipped").attribute("message").value(),
+                 "not started");
+    EXPECT_THAT(counts(first.parent()), ElementsAre(124, 0, 1, -1));
+
+    // Between two runs: the session has the error.
+    session.runs.pop_back();
+    EXPECT_THAT(counts(suiteOf(session).parent()), ElementsAre(64, 0, 1, -1));
 }
 
 // Names and messages arrive, with what XML cannot carry replaced; the parser accepts the document.

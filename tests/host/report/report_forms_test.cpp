@@ -40,19 +40,4 @@ TEST(ReportForms, EachWritesASessionAndIsFound) {
     EXPECT_EQ(host::reportFormNamed("pdf"), nullptr);
 }
 
-// Names that were asked for are set apart, and a repeated one begins with its figures.
-TEST(ReportForms, TextIsWrittenNameByName) {
-    host::SessionRecord session = test::repeatedSession();
-    std::string text;
-    const auto report =
-        host::reportFormNamed("text")->open([&text](std::string_view piece) { text += piece; }, {});
-    report->nameEnded(session);
-    EXPECT_THAT(text, HasSubstr("17 passed, 2 failed, 1 in error"));
-    EXPECT_THAT(text, HasSubstr("\nrun 7:\nFAIL"));
-    session.runs.push_back(session.runs.front());
-    text.clear();
-    report->nameEnded(session);
-    EXPECT_EQ(text.front(), '\n');
-}
-
 }  // namespace

@@ -86,6 +86,7 @@ host::FrameRecord frameOf(std::size_t at) {
     const double late = at >= 40 ? 1.0 / 30 : 0;  // one frame was dropped on the way
     host::FrameRecord frame;
     frame.number = at + 1;
+    frame.sensorNumber = static_cast<std::int64_t>(at + (at >= 40 ? 2 : 1));
     frame.presentation = 1000 + static_cast<double>(at) / 30 + late;
     frame.delivered = 0.2 + static_cast<double>(at) / 30 + late + noise;
     frame.lightSource = at % 2 == 0 ? 1 : 2;
@@ -133,7 +134,7 @@ SessionRecord judgedSession(const std::string& name) {
     result("nan", std::nan(""), std::nullopt, BoundRecord{HUGE_VAL, true}, Judgement::Outside);
     run.results.push_back({name, 1.25, "frames", std::nullopt, Judgement::Information});
     run.log = {{timeOf(10), platform::LogLevel::Default, name},
-               {timeOf(20), platform::LogLevel::Error, "late"}};
+               {timeOf(20), platform::LogLevel::Error, "time-out", true}};
     return sessionOf(std::move(run));
 }
 
@@ -156,6 +157,8 @@ SessionRecord brokenSession() {
 SessionRecord streamedSession(std::size_t frames) {
     RunRecord run = diagnosticOf("FaultDiagnostic", Verdict::Passed);
     addResults(run, false);
+    run.framesDelivered = frames;
+    run.framesLost = frames > 40 ? 1 : 0;
     for (std::size_t at = 0; at < frames; ++at) {
         run.frames.push_back(frameOf(at));
         run.log.push_back({timeOf(static_cast<int>(at) * 33),
@@ -171,6 +174,7 @@ SessionRecord imagesSession(std::size_t images) {
     for (std::size_t at = 0; at < images; ++at) {
         list.push_back(imageOf(at));
     }
+    run.imagesDelivered = images;
     run.auxiliaryData = {{"images", platform::List(std::move(list))}};
     return sessionOf(std::move(run));
 }
@@ -179,18 +183,43 @@ SessionRecord repeatedSession() {
     RunRecord run = diagnosticOf("FaultDiagnostic", Verdict::Failed);
     addResults(run, true);
     run.number = 7;
-    host::RepeatRecord repeat{run.plan.name, 20, 17, 2, 1, 61.5, {}, {}};
-    repeat.notPassed = {{7, Verdict::Failed, "Frame Count is 71 frames"},
-                        {9, Verdict::Error, kHostile}};
+    host::RepeatRecord repeat;
+    repeat.name = run.plan.name;
+    repeat.runs = 20;
+    repeat.passed = 17;
+    repeat.failed = 2;
+    repeat.errors = 1;
+    repeat.seconds = 61.5;
+    repeat.outcomes.resize(20, {Verdict::Passed, 3.0});
+    repeat.outcomes[6] = {Verdict::Failed, 3.25};
+    repeat.outcomes[8] = {Verdict::Error, 1.5};
+    repeat.outcomes[9] = {Verdict::Failed, 3.75};
+    repeat.notPassed = {
+        {7, Verdict::Failed, 3.25, "Number of Channel 17 is 3 events", {run.results[17]}, {}},
+        {9, Verdict::Error, 1.5, kHostile, {}, {brokenSession().runs.front().failures[0]}},
+        {10, Verdict::Failed, 3.75, "Frame Count is 71 frames", {run.results[60]}, {}}};
     for (const host::ResultRecord& result : run.results) {
         const bool outside = result.judgement == Judgement::Outside;
         repeat.results.push_back({result.name, result.unit, result.limit, 19, outside ? 2U : 0U,
-                                  std::min(result.value, outside ? 0.0 : result.value),
-                                  outside ? 0 : result.value, result.value});
+                                  outside ? 0 : result.value, outside ? 0.5 : result.value,
+                                  result.value});
     }
     SessionRecord session = sessionOf(std::move(run));
     session.repeats = {std::move(repeat)};
     session.verdict = Verdict::Error;
+    return session;
+}
+
+SessionRecord interruptedSession() {
+    SessionRecord session = streamedSession(90);
+    session.planned = {session.planned.front(), session.planned.front(),
+                       imagesSession(0).planned.front()};
+    RunRecord run = streamedSession(37).runs.front();
+    run.verdict = Verdict::Interrupted;
+    run.analysisSeconds.reset();
+    run.results.clear();
+    session.runs.push_back(std::move(run));
+    session.verdict = Verdict::Interrupted;
     return session;
 }
 
@@ -223,7 +252,10 @@ void play(const SessionRecord& session, host::RunListener& listener) {
             listener.logged(line);
         }
         tell(host::Part::Experiment, false);
-        listener.partEnded(run, host::Part::Experiment);
+        // What was given up does not end its part.
+        if (run.verdict != Verdict::Interrupted) {
+            listener.partEnded(run, host::Part::Experiment);
+        }
         if (run.analysisSeconds.has_value()) {
             listener.partStarted(run, host::Part::Analysis);
             tell(host::Part::Analysis, false);
@@ -236,15 +268,11 @@ void play(const SessionRecord& session, host::RunListener& listener) {
 }
 
 std::vector<std::pair<std::string, SessionRecord>> sampleSessions() {
-    return {{"pass", streamedSession(90)},
-            {"fail", judgedSession()},
-            {"hostile", judgedSession(kHostile)},
-            {"error", brokenSession()},
-            {"images", imagesSession(25)},
-            {"long", streamedSession(20000)},
-            {"long-images", imagesSession(3000)},
-            {"repeated", repeatedSession()},
-            {"mixed", mixedSession()},
+    return {{"pass", streamedSession(90)},         {"fail", judgedSession()},
+            {"hostile", judgedSession(kHostile)},  {"error", brokenSession()},
+            {"images", imagesSession(25)},         {"long", streamedSession(20000)},
+            {"long-images", imagesSession(3000)},  {"repeated", repeatedSession()},
+            {"interrupted", interruptedSession()}, {"mixed", mixedSession()},
             {"empty-images", imagesSession(0)}};
 }
 

@@ -25,15 +25,18 @@ host::SessionRecord judgedSession(const std::string& name = "Diagnostic");
 // An experiment that failed with a chain of errors, whose teardown threw, on a device that was misused.
 host::SessionRecord brokenSession();
 
-// A diagnostic that passed, with as many frames and log lines; some frames lack temperatures, one came
-// late.
+// A diagnostic that passed, with as many frames and log lines; some frames lack temperatures, and one
+// was lost behind the 40th.
 host::SessionRecord streamedSession(std::size_t frames);
 
 // An experiment with as many images.
 host::SessionRecord imagesSession(std::size_t images);
 
-// A diagnostic that was repeated 20 times and failed twice.
+// A diagnostic that was repeated 20 times, failed in runs 7 and 10, and was in error in run 9.
 host::SessionRecord repeatedSession();
+
+// A diagnostic twice and an experiment: the first run passed, the second was given up after 37 frames.
+host::SessionRecord interruptedSession();
 
 // All of the above as one session of several runs.
 host::SessionRecord mixedSession();

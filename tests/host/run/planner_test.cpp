@@ -146,11 +146,37 @@ TEST(RunPlan, RefusesBeforeAnythingRuns) {
          "none of the parts to be run declares a parameter \"coumt\"; did you mean count?"},
         {{"PlanExperiment"},
          {"count=1", "analysis:count=1"},
-         "no analysis to be run declares a parameter \"count\""},
+         "no analysis to be run declares a parameter \"count\"; zrlab describe NAME shows them"},
+        {{"PlanExperiment", "count=1"},
+         {},
+         "unknown diagnostic or experiment \"count=1\"; did you mean --set count=1?"},
         {{"HalfDiagnostic"}, {"count=1"}, "HalfDiagnostic: its analysis Nowhere is not registered"},
     };
     for (const Row& row : rows) {
         EXPECT_EQ(plan(row.names, row.settings), row.problem);
+    }
+}
+
+TEST(RunPlan, WarnsOfValuesThatMayBeReadDifferently) {
+    const char* kNoCount = " is not a whole number from 0 to 9007199254740992";
+    const char* kNoSeconds = " is not a number of seconds from 0";
+    const std::pair<const char*, const char*> rows[] = {
+        {"images=2.7", kNoCount},  {"images=-1", kNoCount},    {"images=nan", kNoCount},
+        {"images=1e30", kNoCount}, {"timeout=-1", kNoSeconds}, {"timeout=nan", kNoSeconds},
+        {"images=1e3", nullptr},   {"timeout=0.5", nullptr},   {"timeout=inf", nullptr},
+        {"frameCount=0", nullptr}, {"count=-2.7", nullptr},
+    };
+    for (const auto& [text, problem] : rows) {
+        const host::ParameterSetting setting = host::readSetting(text);
+        host::RunPlan plan;
+        plan.experiment.parameters = {{setting.name, setting.value}};
+        plan.analysis = plan.experiment;  // of both parts only one line
+        std::vector<std::string> expected;
+        if (problem != nullptr) {
+            expected = {"warning: " + setting.name + " " + setting.value.text() + problem +
+                        "; the run may use another value"};
+        }
+        EXPECT_EQ(host::valueWarnings({plan, plan}), expected) << text;
     }
 }
 

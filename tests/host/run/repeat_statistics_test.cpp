@@ -32,18 +32,34 @@ TEST(RepeatStatistics, FiguresOfEachResult) {
 
     statistics.add(run(Verdict::Failed, 100.0, Judgement::Outside));
     statistics.add(run(Verdict::Failed, std::nan(""), Judgement::Outside));
-    statistics.add(run(Verdict::Error, 0, Judgement::Within));
+    RunRecord failing = run(Verdict::Error, 0, Judgement::Within);
+    failing.number = 6;
+    failing.seconds = 1.5;
+    failing.failures = {{host::Part::Experiment, host::kStepRun, nullptr, "no light"}};
+    statistics.add(failing);
+    statistics.add(run(Verdict::Interrupted, 5, Judgement::Within));
     const host::RepeatRecord record = statistics.record();
-    EXPECT_EQ(record.runs, 6U);
+    EXPECT_EQ(record.runs, 7U);
     EXPECT_EQ(record.passed, 3U);
     EXPECT_EQ(record.failed, 2U);
     EXPECT_EQ(record.errors, 1U);
+    EXPECT_EQ(record.interrupted, 1U);
+    EXPECT_EQ(record.notPassedCount(), 4U);
+    ASSERT_EQ(record.notPassed.size(), 4U);
+    ASSERT_EQ(record.notPassed[0].outside.size(), 1U);
+    EXPECT_EQ(record.notPassed[0].outside[0].value, 100.0);
+    EXPECT_EQ(record.notPassed[2].number, 6U);
+    EXPECT_EQ(record.notPassed[2].failures.at(0).message, "no light");
+    EXPECT_EQ(record.notPassed[2].why, "no light");
+    ASSERT_EQ(record.outcomes.size(), 7U);
+    EXPECT_EQ(record.outcomes[5].verdict, Verdict::Error);
+    EXPECT_EQ(record.outcomes[5].seconds, 1.5);
     ASSERT_EQ(record.results.size(), 2U);
     const host::ResultStatistics& noise = record.results[0];
-    EXPECT_EQ(noise.runs, 5U);
+    EXPECT_EQ(noise.runs, 6U);
     EXPECT_EQ(noise.outside, 2U);
     EXPECT_EQ(noise.minimum, 1.0);
-    EXPECT_EQ(noise.median, 7.0);  // of 1, 5, 9, 100: the NaN has no place
+    EXPECT_EQ(noise.median, 5.0);  // of 1, 5, 5, 9, 100: the NaN has no place
     EXPECT_EQ(noise.maximum, 100.0);
 }
 

@@ -16,13 +16,17 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
+#include "devices/simulator/profile/writer.h"
 #include "tests/support/is_error.h"
 
 namespace {
 
 namespace fs = std::filesystem;
+using Json = nlohmann::ordered_json;
 using simulator::DeviceProfile;
 using simulator::loadProfile;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
 constexpr auto kLast = std::numeric_limits<std::uint64_t>::max();
@@ -43,15 +47,15 @@ class ProfileReader : public ::testing::Test {
     static void write(const std::string& file, const std::string& text) {
         std::ofstream(file, std::ios::binary) << text;
     }
-    static std::string problemOf(const std::string& nameOrFile) {
-        std::string problem;
-        EXPECT_FALSE(loadProfile(nameOrFile, problem).has_value()) << nameOrFile;
-        return problem;
+    static std::vector<std::string> problemsOf(const std::string& nameOrFile) {
+        std::vector<std::string> problems;
+        EXPECT_FALSE(loadProfile(nameOrFile, problems).has_value()) << nameOrFile;
+        return problems;
     }
     static DeviceProfile load(const std::string& nameOrFile) {
-        std::string problem;
-        auto device = loadProfile(nameOrFile, problem);
-        EXPECT_EQ(problem, "");
+        std::vector<std::string> problems;
+        auto device = loadProfile(nameOrFile, problems);
+        EXPECT_THAT(problems, IsEmpty());
         return device.value_or(DeviceProfile());
     }
     static std::string fileOfTests(const std::string& name) { return ZR_PROFILE_TESTS "/" + name; }
@@ -60,6 +64,8 @@ class ProfileReader : public ::testing::Test {
     const fs::path _before;
     fs::path _folder;
 };
+
+using ProfileWriter = ProfileReader;
 
 TEST_F(ProfileReader, LoadsTheWholeGalleryTheHealthyDeviceFirst) {
     const auto entries = simulator::gallery();
@@ -75,12 +81,15 @@ TEST_F(ProfileReader, LoadsTheWholeGalleryTheHealthyDeviceFirst) {
 
 TEST_F(ProfileReader, TellsWhatIsWrongWithAProfile) {
     std::ifstream file(fileOfTests("broken_profiles.json"));
-    const auto broken = nlohmann::ordered_json::parse(file);
+    const auto broken = Json::parse(file);
     ASSERT_THAT(broken, SizeIs(::testing::Gt(50U)));
     for (const auto& row : broken) {
         write("x.json", row.at("profile").dump());
-        const auto reason = row.at("problem").get<std::string>();
-        EXPECT_EQ(problemOf("x.json"), "x.json: " + reason);
+        std::vector<std::string> expected;
+        for (const auto& line : row.at("problems")) {
+            expected.push_back("x.json: " + line.get<std::string>());
+        }
+        EXPECT_EQ(problemsOf("x.json"), expected);
     }
 }
 
@@ -103,13 +112,15 @@ TEST_F(ProfileReader, TellsWhatIsNoStrictJson) {
          "/display/powered: the key comes twice"},
         {R"({"a": [{}, {"b": 1, "c": [], "b": 2}]})", "/a/1/b: the key comes twice"},
         {R"({"summary": "", "a\nb": 1})", "/a?b: unknown key"},
-        {R"({"display": {"powered": 1e999}})", "number overflow parsing '1e999'"},
+        {R"({"display": {"powered": 1e999}})", "/display/powered: 1e999 is too large for a number"},
+        {R"([0, {"a": [{}, -1e400]}])", "/1/a/1: -1e400 is too large for a number"},
+        {"1e400", "1e400 is too large for a number"},
         {std::string(100000, '['), deep + ": nested more than 64 deep"},
         {std::string((1U << 20U) + 1, ' '), "longer than 1 MiB"},
     };
     for (const auto& [text, problem] : kCases) {
         write("x.json", text);
-        EXPECT_EQ(problemOf("x.json"), "x.json: " + problem) << text.substr(0, 60);
+        EXPECT_THAT(problemsOf("x.json"), ElementsAre("x.json: " + problem)) << text.substr(0, 60);
     }
 }
 
@@ -135,7 +146,7 @@ TEST_F(ProfileReader, TellsWhatCannotBeFound) {
         {"sub/c.json", "sub/c.json: /extends: sub/c.json extends itself"},
     };
     for (const auto& [name, problem] : kCases) {
-        EXPECT_EQ(problemOf(name), problem);
+        EXPECT_THAT(problemsOf(name), ElementsAre(problem));
     }
 
     for (int level = 0; level < 17; ++level) {
@@ -143,7 +154,8 @@ TEST_F(ProfileReader, TellsWhatCannotBeFound) {
               R"({"extends": "./)" + std::to_string(level + 1) + R"(.json"})");
     }
     write("17.json", "{}");
-    EXPECT_EQ(problemOf("0.json"), "15.json: /extends: more than 16 profiles in a row");
+    EXPECT_THAT(problemsOf("0.json"),
+                ElementsAre("15.json: /extends: more than 16 profiles in a row"));
     write("healthy", R"({"extends": "healthy"})");
     EXPECT_EQ(load("./healthy").name, "./healthy");
     EXPECT_EQ(load("2.json").display.powered, platform::Value(true));
@@ -152,11 +164,11 @@ TEST_F(ProfileReader, TellsWhatCannotBeFound) {
 TEST_F(ProfileReader, AnExtensionChangesWhatItNamesAndKeepsTheRest) {
     fs::create_directory("sub");
     write("sub/base.json", R"({"summary": "Base", "extends": "i2c-errors",
-        "capture": {"streams": {"front-infrared": {"seed": 5, "metadata": {"Own": 1, "Other": 2},
+        "capture": {"streams": {"front-infrared": {"seed": 5, "metadata": {"+Own": 1, "+Other": 2},
             "overrides": [{"frames": "1"}, {"frames": "2"}], "faults": {"start": true}}}},
         "counters": {"channels": {"New": {"group": "g", "subgroup": "s", "count": 4}}}})");
     write("top.json", R"({"extends": "sub/base.json",
-        "capture": {"streams": {"front-infrared": {"metadata": {"Own": null, "Other": 3},
+        "capture": {"streams": {"front-infrared": {"metadata": {"+Own": null, "+Other": 3},
             "overrides": [{"frames": "3"}], "faults": {"start": false}}}},
         "counters": {"channels": {"New": {"count": 6}}}})");
     const DeviceProfile device = load("top.json");
@@ -173,6 +185,56 @@ TEST_F(ProfileReader, AnExtensionChangesWhatItNamesAndKeepsTheRest) {
     const auto& channel = device.meterix.channels.back();
     EXPECT_EQ(std::tie(channel.name, channel.group, channel.subgroup, channel.count),
               std::make_tuple("New", "g", "s", std::optional<std::uint64_t>(6)));
+}
+
+// What a profile gives is in the document that shows the device; null may have become nothing at all.
+void expectShown(const Json& given, const Json& shown, const std::string& where) {
+    if (given.is_structured() && shown.type() == given.type()) {
+        EXPECT_TRUE(given.is_object() || shown.size() == given.size()) << where;
+        for (const auto& [key, value] : given.items()) {
+            expectShown(value,
+                        given.is_object() ? shown.value(key, Json()) : shown[std::stoul(key)],
+                        where + "/" + key);
+        }
+        return;
+    }
+    const bool isNothing = given.is_null() && (shown.is_null() || shown == false);
+    EXPECT_TRUE(isNothing || shown == given) << where << ": " << given << " became " << shown;
+}
+
+TEST_F(ProfileWriter, ShowsAllThatAProfileGivesAndReadsItBackTheSame) {
+    std::vector<std::pair<std::string, std::string>> profiles = {
+        {fileOfTests("every_key.json"), fileOfTests("every_key.json")}};
+    for (const auto& entry : simulator::gallery()) {
+        profiles.emplace_back(entry.name, ZR_PROFILES "/" + entry.name + ".json");
+    }
+    for (const auto& [name, file] : profiles) {
+        const std::string text = simulator::profileText(load(name));
+        write("shown.json", text);
+        EXPECT_EQ(simulator::profileText(load("./shown.json")), text) << name;
+        std::ifstream stream(file);
+        Json given = Json::parse(stream);
+        given.erase("$schema");
+        given["extends"] = nullptr;
+        expectShown(given, Json::parse(text), name);
+    }
+}
+
+// Names stay, and so does the order in which a client finds the streams.
+TEST_F(ProfileWriter, KeepsStreamsThatWereRemovedRenamedAndAddedAgain) {
+    write("base.json", R"({"capture": {"streams": {"rear": null, "front": {"portType": "x"}}}})");
+    write("top.json", R"({"extends": "./base.json", "capture": {"streams": {
+        "rear": {"portType": "front-infrared", "metadata": {"HardwareEvents": null}},
+        "front": {"seed": 4}}}})");
+    write("shown.json", simulator::profileText(load("top.json")));
+    const auto streams = load("shown.json").capture.streams;
+    ASSERT_THAT(streams, SizeIs(3));
+    EXPECT_EQ(streams[0].portType, "x");
+    EXPECT_EQ(streams[0].seed, 4U);
+    EXPECT_EQ(streams[1].name, "front-infrared");
+    EXPECT_EQ(streams[2].name, "rear");
+    EXPECT_FALSE(streams[2].metadata.contains("HardwareEvents"));
+    EXPECT_TRUE(streams[2].metadata.contains("DIETemperatureIdle"));
 }
 
 platform::ErrorRef errorOf(const simulator::Fault& fault) {

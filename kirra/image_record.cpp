@@ -1,8 +1,8 @@
 #include "kirra/image_record.h"
 
+#include <array>
 #include <bit>
 #include <cstdint>
-#include <utility>
 
 namespace {
 
@@ -13,15 +13,18 @@ constexpr std::size_t kQOffset = 208;
 constexpr std::size_t kTemperatureOffset = 788;
 
 std::uint32_t wordAt(const KirraImage& image, std::size_t offset) {
-    std::uint32_t word = 0;
-    for (std::size_t at = 4; at-- > 0;) {
-        word = (word << 8) | std::to_integer<std::uint32_t>(image.bytes[offset + at]);
-    }
-    return word;
+    const auto byte = [&](std::size_t at) {
+        return std::to_integer<std::uint32_t>(image.bytes[offset + at]);
+    };
+    return byte(0) | byte(1) << 8 | byte(2) << 16 | byte(3) << 24;
 }
 
-std::int32_t signedAt(const KirraImage& image, std::size_t offset) {
-    return static_cast<std::int32_t>(wordAt(image, offset));
+platform::List samplesAt(const KirraImage& image, std::size_t offset) {
+    std::array<std::int32_t, ZRKirraMendraImage::kSampleCount> samples;
+    for (std::size_t sample = 0; sample < samples.size(); ++sample) {
+        samples[sample] = static_cast<std::int32_t>(wordAt(image, offset + 4 * sample));
+    }
+    return platform::List(samples);
 }
 
 KirraImage recordOfZeros() {
@@ -35,17 +38,8 @@ KirraImage recordOfZeros() {
 ZRKirraMendraImage::ZRKirraMendraImage() : ZRKirraMendraImage(recordOfZeros()) {}
 
 ZRKirraMendraImage::ZRKirraMendraImage(const KirraImage& kirraImage)
-    : _frameID(wordAt(kirraImage, kFrameIDOffset)) {
-    platform::MutableList samplesI;
-    platform::MutableList samplesQ;
-    samplesI.reserve(kSampleCount);
-    samplesQ.reserve(kSampleCount);
-    for (std::size_t sample = 0; sample < kSampleCount; ++sample) {
-        samplesI.emplace_back(signedAt(kirraImage, kIOffset + 4 * sample));
-        samplesQ.emplace_back(signedAt(kirraImage, kQOffset + 4 * sample));
-    }
-    _dScanI = platform::List(std::move(samplesI));
-    _dScanQ = platform::List(std::move(samplesQ));
-    _tmonDataInC = std::bit_cast<float>(wordAt(kirraImage, kTemperatureOffset));
-    _timestampInMilliseconds = wordAt(kirraImage, kTimestampOffset);
-}
+    : _frameID(wordAt(kirraImage, kFrameIDOffset))
+    , _dScanI(samplesAt(kirraImage, kIOffset))
+    , _dScanQ(samplesAt(kirraImage, kQOffset))
+    , _tmonDataInC(std::bit_cast<float>(wordAt(kirraImage, kTemperatureOffset)))
+    , _timestampInMilliseconds(wordAt(kirraImage, kTimestampOffset)) {}

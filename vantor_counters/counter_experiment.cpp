@@ -26,7 +26,7 @@ ZRExperimentResultRef ZRVantorMeterixExperiment::run(platform::ErrorSlot error) 
             return fail(error, ZRMeterixErrorDomain, 100, reported,
                         "Could not get the count of %@.", channel.channelDescription().name());
         }
-        storeMeasurement(channel, *result);
     }
+    storeMeasurements(snapshot.samples(), *result);
     return result;
 }

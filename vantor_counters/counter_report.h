@@ -14,9 +14,9 @@ bool isISPEventChannel(const WLMeterixChannelDescription& description);
 // whatever their group.
 bool isISPEventSubgroup(const WLMeterixChannelDescription& description);
 
-// Stores the channel's count as a measurement in `events` under the channel's name; an entry of that
-// name is replaced. A channel without a count counts as 0: whether that is an error is the caller's
-// decision.
-void storeMeasurement(const WLMeterixChannel& channel, ZRExperimentResult& result);
+// Stores each channel's count as a measurement in `events` under the channel's name, in the order of the
+// samples; an entry of that name is replaced. A channel without a count counts as 0: whether that is an
+// error is the caller's decision.
+void storeMeasurements(const platform::MeterixSamples& samples, ZRExperimentResult& result);
 
 #endif

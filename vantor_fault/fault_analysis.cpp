@@ -1,6 +1,9 @@
 #include "vantor_fault/fault_analysis.h"
 
+#include <iterator>
+
 #include "vantor_counters/expected_channels.h"
+#include "vantor_counters/limited_results.h"
 
 namespace {
 
@@ -13,28 +16,20 @@ constexpr struct {
     std::string_view resultName;
 } kErrorCounts[] = {{"I2C", "I2C Errors"}, {"MIPI", "MIPI Errors"}, {"SIF", "SIF Errors"}};
 
-ZRBoundRef closedBound(double value, const ZRDimensionlessUnit& unit) {
-    return std::make_shared<const ZRBound>(std::make_shared<const Measurement>(value, unit), false);
-}
-
 // The measurement under `key`, judged as `resultName` and limited to exactly 0.
-ZRMeasuredResultRef zeroLimitMeasuredResult(const Measurements& measurements,
-                                            std::string_view key,
+ZRMeasuredResultRef zeroLimitMeasuredResult(LimitedResults& limited,
+                                            const Measurements& measurements,
+                                            const platform::StringKey& key,
                                             std::string_view resultName,
                                             const ZRDimensionlessUnit& unit,
                                             platform::ErrorSlot error) {
     const MeasurementRef* measurement = measurements.find(key);
     if (measurement == nullptr) {
         return platform::fail(error, ZRErrorDomain, 6, nullptr, "Missing measurement named %@!",
-                              key);
+                              key.text());
     }
-    const ZRBoundRef zero = closedBound(0.0, unit);
-    auto limit = std::make_shared<ZRLimit>("Limit");
-    limit->setLowerBound(zero);
-    limit->setUpperBound(zero);
-    auto measured = std::make_shared<ZRMeasuredResult>(std::string(resultName), *measurement);
-    measured->setLimit(std::move(limit));
-    return measured;
+    const ZRBoundRef zero = limited.closedBound(limited.value(0.0, unit));
+    return limited.result(resultName, *measurement, "Limit", zero, zero);
 }
 
 }  // namespace
@@ -58,15 +53,20 @@ bool ZRVantorFaultAnalysis::setupWithParameters(const platform::Dictionary& para
 ZRAnalysisResultRef ZRVantorFaultAnalysis::analyzeExperimentResult(const ZRExperimentResult& result,
                                                                    platform::ErrorSlot error) {
     const Measurements& measurements = result.measurements();
+    constexpr std::size_t kResults =
+        kVantorCounterChannelNames.size() + 1 + std::size(kErrorCounts);
+    LimitedResults limited(kResults);
     auto analysis = std::make_shared<ZRAnalysisResult>();
     auto& measuredResults = analysis->measuredResults();
+    measuredResults.reserve(kResults);
 
     for (const std::string_view name : kVantorCounterChannelNames) {
-        if (!measurements.contains(name)) {
+        const platform::StringKey key(name);
+        if (!measurements.contains(key)) {
             return platform::fail(error, ZRErrorDomain, 6, nullptr, "Missing measurement for %@",
                                   name);
         }
-        measuredResults.push_back(zeroLimitMeasuredResult(measurements, name, name,
+        measuredResults.push_back(zeroLimitMeasuredResult(limited, measurements, key, name,
                                                           ZRDimensionlessUnit::events(), error));
     }
 
@@ -75,14 +75,13 @@ ZRAnalysisResultRef ZRVantorFaultAnalysis::analyzeExperimentResult(const ZRExper
         return platform::fail(error, ZRErrorDomain, 6, nullptr, "Missing %@ measurement!",
                               kFrameCount);
     }
-    auto actualFrames = std::make_shared<ZRMeasuredResult>("Actual Frames", *frames);
-    auto minimum = std::make_shared<ZRLimit>("Min Frame Count");
-    minimum->setLowerBound(closedBound(_frameCount.asDouble(), ZRDimensionlessUnit::frames()));
-    actualFrames->setLimit(std::move(minimum));
-    measuredResults.push_back(std::move(actualFrames));
+    measuredResults.push_back(limited.result(
+        "Actual Frames", *frames, "Min Frame Count",
+        limited.closedBound(limited.value(_frameCount.asDouble(), ZRDimensionlessUnit::frames())),
+        nullptr));
 
     for (const auto& [key, resultName] : kErrorCounts) {
-        auto measured = zeroLimitMeasuredResult(measurements, key, resultName,
+        auto measured = zeroLimitMeasuredResult(limited, measurements, key, resultName,
                                                 ZRDimensionlessUnit::errors(), error);
         if (measured == nullptr) {
             return nullptr;

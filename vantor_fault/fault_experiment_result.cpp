@@ -31,8 +31,6 @@ ZRExperimentResultRef ZRVantorFaultExperiment::_buildResult() const {
             put(name, _errorCounters->number(key).asDouble(), ZRDimensionlessUnit::errors());
         }
     }
-    for (const WLMeterixSample& sample : _meterixDelta.samples()) {
-        storeMeasurement(sample.channel(), *result);
-    }
+    storeMeasurements(_meterixDelta.samples(), *result);
     return result;
 }

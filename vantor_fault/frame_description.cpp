@@ -54,7 +54,7 @@ std::string ZRVantorFrameDescription::csvRepresentationHeader() {
     std::string header = "Frame,Date,MediaTime(s)";
     for (const Source& source : kSources) {
         header += ',';
-        header += source.key;
+        header += source.key.text();
     }
     header += '\n';
     return header;

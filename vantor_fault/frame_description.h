@@ -109,7 +109,7 @@ class ZRVantorFrameDescription {
 
     // What each column is read from.
     struct Source {
-        std::string_view key;
+        platform::StringKey key;
         bool required;
     };
 #define ZR_SOURCE(Name, getter, key, required) {key, required},

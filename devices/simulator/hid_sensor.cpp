@@ -286,9 +286,7 @@ void Sensor::_deliverOne(const DeliveryRef& delivery) {
     }
 }
 
-bool hasEntry(const HidDeviceProfile& device,
-              const std::string& key,
-              const platform::Value& value) {
+bool hasEntry(const HidDeviceProfile& device, std::string_view key, const platform::Value& value) {
     const platform::Number number = value.asNumber();
     if (!number.isPresent()) {
         return false;

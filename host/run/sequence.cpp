@@ -219,11 +219,12 @@ class Sequence {
         }
         for (const auto& [name, measurement] : result->measurements()) {
             if (measurement == nullptr) {
-                _fail(kPart, kStepRun, "the measurement \"" + name + "\" is null");
+                _fail(kPart, kStepRun, "the measurement \"" + std::string(name) + "\" is null");
                 return nullptr;
             }
             _edit([&, &key = name, &one = measurement](RunRecord& run) {
-                run.measurements.push_back({key, one->doubleValue(), one->unit().symbol()});
+                run.measurements.push_back(
+                    {std::string(key), one->doubleValue(), one->unit().symbol()});
             });
         }
         _edit([&](RunRecord& run) {

@@ -40,6 +40,7 @@ WLMeterix WLMeterix::reportByFilteringChannels(const ChannelFilter& filter) cons
         return {};
     }
     platform::MeterixChannels kept;
+    kept.reserve(_channels->size());
     std::copy_if(_channels->begin(), _channels->end(), std::back_inserter(kept),
                  [&filter](const auto& description) { return filter(*description); });
     return {_facility, std::make_shared<const platform::MeterixChannels>(std::move(kept))};

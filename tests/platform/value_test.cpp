@@ -1,10 +1,17 @@
 #include "platform/value.h"
 
+#include <array>
 #include <bit>
 #include <cmath>
 #include <limits>
+#include <map>
+#include <memory>
+#include <random>
+#include <string>
 
 #include <gtest/gtest.h>
+
+#include "platform/shared_block.h"
 
 namespace {
 
@@ -153,12 +160,89 @@ TEST(Dictionary, IsSortedByKeyAndTheLastValueOfAKeyHolds) {
     growing.set("later", 1);  // a copy was taken
     std::string keys;
     for (const auto& [key, value] : dictionary) {
-        keys += key + ',';
+        keys.append(key) += ',';
     }
     EXPECT_EQ(keys, ",B,a,ab,b,\xC3\xA9,");
     EXPECT_EQ(dictionary["b"], Value(6));
     EXPECT_TRUE(dictionary.contains(""));
     EXPECT_FALSE(dictionary.contains("later"));
+}
+
+// Sets, replaces and removes at random, iterating in between; keys of every length around a word's.
+TEST(StringMap, HoldsWhatATreeHolds) {
+    std::mt19937 random(1);
+    platform::StringMap<std::string> map;
+    std::map<std::string, std::string, std::less<>> tree;
+    for (int step = 0; step < 5000; ++step) {
+        const std::string key = std::string(random() % 20, 'k') + std::to_string(random() % 40);
+        if (random() % 3 == 0) {
+            map.remove(key);
+            tree.erase(key);
+        } else {
+            map.set(key, std::to_string(step));
+            tree[key] = std::to_string(step);
+        }
+        ASSERT_EQ(map.contains(key), tree.count(key) == 1);
+        if (step % 50 != 0) {
+            continue;
+        }
+        ASSERT_EQ(map.size(), tree.size());
+        const auto copy = map;
+        EXPECT_TRUE(copy == map);
+        auto expected = tree.begin();
+        for (const auto& [name, value] : copy) {
+            ASSERT_EQ(name, expected->first);
+            ASSERT_EQ(value, (expected++)->second);
+            ASSERT_EQ(*map.find(name), value);
+        }
+    }
+}
+
+TEST(StringKey, HasOneHashAtCompileTimeAndAtRunTime) {
+    constexpr platform::StringKey kKeys[] = {"",         "a",         "1234567",
+                                             "12345678", "123456789", "\xC3\xA9 345678901234567"};
+    for (const platform::StringKey& key : kKeys) {
+        EXPECT_EQ(platform::StringKey(std::string(key.text())).hash(), key.hash());
+    }
+}
+
+TEST(List, OfOneKindBoxesWhatItHolds) {
+    const auto check = [](const auto& numbers) {
+        const List packed(numbers);
+        const List boxed(platform::MutableList(numbers.begin(), numbers.end()));
+        EXPECT_EQ(packed, boxed);
+        EXPECT_EQ(boxed, packed);
+        EXPECT_EQ(packed.size(), numbers.size());
+    };
+    check(std::array{true, false});
+    check(std::array<std::int8_t, 2>{-1, 127});
+    check(std::array{std::numeric_limits<std::int32_t>::min(), -1});
+    check(std::array{kMaxU64});
+    check(std::array{0.1, -0.0});
+    check(std::array<std::int32_t, 0>());
+    EXPECT_EQ(List(std::array<std::int32_t, 0>()), List());
+    EXPECT_NE(List(std::array{1, 2}), (List{1, 2U}));
+    EXPECT_NE(List(std::array{1, 2}), (List{1}));
+
+    constexpr std::uint32_t kSignalling = 0x7F800001U;
+    const Number nan = List(std::array{1.0F, std::bit_cast<float>(kSignalling)})[1].asNumber();
+    EXPECT_EQ(nan.kind(), Kind::Float);
+    EXPECT_EQ(std::bit_cast<std::uint32_t>(nan.asFloat()), kSignalling);
+}
+
+TEST(SharedBlock, KeepsAnObjectWhoseSiblingsAndMakerAreGone) {
+    std::shared_ptr<const std::string> kept;
+    std::weak_ptr<const std::string> first;
+    {
+        platform::SharedBlock<std::string> block(2);
+        first = block.make("first");
+        kept = block.make("second");
+        EXPECT_EQ(*block.make("in another block"), "in another block");
+        EXPECT_EQ(*first.lock(), "first");
+    }
+    EXPECT_EQ(*kept, "second");
+    kept.reset();
+    EXPECT_TRUE(first.expired());
 }
 
 }  // namespace

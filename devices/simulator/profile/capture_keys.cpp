@@ -52,7 +52,7 @@ const std::vector<std::string>& metadataNames() {
         for (const StreamProfile& stream : healthyCapture().streams) {
             for (const auto& [key, value] : stream.metadata) {
                 if (shortMetadataName(key) == nullptr) {
-                    all.push_back(key);
+                    all.emplace_back(key);
                 }
             }
         }

@@ -163,8 +163,8 @@ std::vector<std::vector<double>> samplesOf(const platform::List& images,
         std::vector<double>& samples = all.emplace_back();
         const platform::List* held = ImageView(image).*list;
         for (std::size_t at = 0; held != nullptr && at < held->size(); ++at) {
-            const platform::Number* sample = (*held)[at].number();
-            samples.push_back(sample != nullptr ? sample->asDouble() : kNone);
+            const platform::Number sample = (*held)[at].asNumber();
+            samples.push_back(sample.isPresent() ? sample.asDouble() : kNone);
         }
     }
     return all;

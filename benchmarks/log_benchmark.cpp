@@ -52,9 +52,9 @@ void printedLineBaseline(benchmark::State& state) {
     }
 }
 
-BENCHMARK(lineThatIsOff);
-BENCHMARK(noLineBaseline);
-BENCHMARK(lineThatIsOn);
-BENCHMARK(printedLineBaseline);
+BENCHMARK(lineThatIsOff)->Name("log-off/here");
+BENCHMARK(noLineBaseline)->Name("log-off/no line");
+BENCHMARK(lineThatIsOn)->Name("log-on/here");
+BENCHMARK(printedLineBaseline)->Name("log-on/snprintf");
 
 }  // namespace

@@ -1,0 +1,27 @@
+#include "benchmarks/allocations.h"
+
+#include <cstdlib>
+#include <new>
+
+namespace {
+
+thread_local Allocations allocated;
+
+}  // namespace
+
+Allocations allocationsOfThisThread() {
+    return allocated;
+}
+
+[[gnu::noinline]] void* operator new(std::size_t size) {
+    ++allocated.count;
+    allocated.bytes += size;
+    void* memory = std::malloc(size);
+    return memory != nullptr ? memory : throw std::bad_alloc();
+}
+[[gnu::noinline]] void operator delete(void* memory) noexcept {
+    std::free(memory);
+}
+[[gnu::noinline]] void operator delete(void* memory, std::size_t /*size*/) noexcept {
+    std::free(memory);
+}

@@ -24,6 +24,7 @@ void describe(benchmark::State& state) {
     }
     state.counters["allocations"] = static_cast<double>(allocationsOfThisThread().count - before) /
                                     static_cast<double>(state.iterations());
+    state.SetItemsProcessed(state.iterations());
 }
 
 template <class Contender>
@@ -39,6 +40,7 @@ void buildAndDescribe(benchmark::State& state) {
         benchmark::DoNotOptimize(description.get());
         benchmark::ClobberMemory();
     }
+    state.SetItemsProcessed(state.iterations());
 }
 
 template <class... Contenders>

@@ -90,11 +90,11 @@ def report_row(name, title, experiment, parameter, sizes):
         judged += [
             Goal(f"{form}: seconds at {last:,}", value(f"{form}/{last}:seconds"), 5, "s"),
             Goal(f"{form}: peak memory at {last:,}", value(f"{form}/{last}:megabytes"), 200, "MB"),
-            Goal(f"{form}: time per item at {last:,} of that at {first:,}",
-                 growth(f"{form}/{last}:seconds", f"{form}/{first}:seconds", last, first), 1.5),
+            Goal(f"{form}: session's time per item at {last:,} of that at {first:,}",
+                 growth(f"{form}/{last}:session", f"{form}/{first}:session", last, first), 1.5),
         ]
-    judged.append(Goal(f"jsonl: peak memory at {last:,} of that at {first:,}",
-                       growth(f"jsonl/{last}:megabytes", f"jsonl/{first}:megabytes"), 1.03))
+    judged.append(Goal(f"jsonl: peak memory at {last:,} of the text form's",
+                       growth(f"jsonl/{last}:megabytes", f"text/{last}:megabytes"), 1.03))
     forms = ("html", "json", "jsonl")
     return Row(
         name, title, measure.report(experiment, parameter, sizes), tuple(judged),
@@ -220,9 +220,9 @@ ROWS = (
                       (1000, 30_000, 1_000_000)),)),
     Row("memory-runs", "Memory of a session by its number of runs", measure.memory_of_runs,
         (Goal("100,000 runs of 1,000", growth("100000", "1000"), 1.03),),
-        "Peak memory of zrlab run VantorFaultDiagnostic --repeat N, one frame per run, --speed max; the time-out of 50 ms "
+        "Peak memory of zrlab run VantorFaultDiagnostic --repeat N, five frames per run, --speed max; the time-out of 0.1 s "
         "is well below what 1,000 runs take.",
-        "A pending time-out keeps its experiment until it has passed: fifty milliseconds of runs are alive at once.",
+        "A pending time-out keeps its experiment until it has passed: a tenth of a second of runs is alive at once.",
         unit="MB",
         curves=(Curve("memory-runs.svg", "Peak memory of a session", "runs", "MB", "{size}", ("here",),
                       (1000, 10_000, 100_000)),)),

@@ -58,7 +58,9 @@ def google(row, prefix=()):
             name = re.sub(r"/(manual_time|real_time|iterations:\d+)", "", run["run_name"])[len(row) + 1:]
             if "items_per_second" in run:
                 found.setdefault(name, []).append(1e9 / run["items_per_second"])
-            for counter in ("allocations", "bytes", "start", "posting"):
+            # What a peer takes from malloc itself is not counted: only our allocations are comparable.
+            for counter in ("allocations", "bytes", "start", "posting") if name.startswith("here") else (
+                    "start", "posting"):
                 if counter in run:
                     found.setdefault(f"{name}:{counter}", []).append(run[counter])
         return {name: statistics.median(values) for name, values in found.items()}
@@ -102,16 +104,17 @@ def at_30_fps(quick):
 
 
 def memory_of_frames(quick):
-    """Peak megabytes of a run of the experiment over a hand-fed stream, by number of frames."""
-    return {str(frames): spend(BIN / "zr_benchmarks",
-                               f"--benchmark_filter=^frames/here/{frames}/")["megabytes"]
+    """Peak megabytes of a run of the experiment over a hand-fed stream, by user and number of frames."""
+    return {f"{user}/{frames}": spend(*prefix, BIN / "zr_benchmarks",
+                                      f"--benchmark_filter=^frames/here/{frames}/")["megabytes"]
+            for user, prefix in (("here", ()), ("ordinary user", WITHOUT_RAISING))
             for frames in ((1000, 30_000) if quick else (1000, 30_000, 1_000_000))}
 
 
 def memory_of_runs(quick):
     """Peak megabytes of a session, by number of runs."""
-    return {str(runs): zrlab_run("VantorFaultDiagnostic", "frameCount=5", "timeout=0.1",
-                                 extra=["--repeat", runs])["megabytes"]
+    return {f"here/{runs}": zrlab_run("VantorFaultDiagnostic", "frameCount=5", "timeout=0.1",
+                                     extra=["--repeat", runs])["megabytes"]
             for runs in ((10, 100) if quick else (1000, 10_000, 100_000))}
 
 

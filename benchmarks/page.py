@@ -38,9 +38,10 @@ def goal_table(rows, results):
 def row_section(row, result):
     lines = [f"### {row.title}", "", f"`{row.name}`. {row.conditions}", "", f"Limited by: {row.limit}", ""]
     if result is not None:
-        lines += [f"| contender | {row.unit or 'value'} |", "|---|--:|"]
-        lines += [f"| {name} | {number(value)} |" for name, value in result["figures"].items()]
-        lines.append("")
+        if row.unit:
+            lines += [f"| contender | {row.unit} |", "|---|--:|"]
+            lines += [f"| {name} | {number(value)} |" for name, value in result["figures"].items()]
+            lines.append("")
         lines += [f"![{curve.title}](images/{curve.file})\n" for curve in row.curves]
     return "\n".join(lines)
 

@@ -40,11 +40,13 @@ class Camera {
     }
     void start(Handler handler) {
         _thread = std::thread([this, handler = std::move(handler)] {
-            std::int64_t frame = 0;
-            while (!_stopped.load()) {
+            for (std::int64_t frame = 1;; ++frame) {
                 _free.acquire();
-                handler(Buffer(&_image, [this](const Image*) { _free.release(); }),
-                        {++frame, 30, platform::MediaTime::kValid, 0});
+                const Buffer buffer(&_image, [this](const Image*) { _free.release(); });
+                if (_stopped.load()) {
+                    return;
+                }
+                handler(buffer, {frame, 30, platform::MediaTime::kValid, 0});
             }
         });
     }
@@ -127,12 +129,16 @@ void here(benchmark::State& state) {
             state.SkipWithError("the run failed");
             break;
         }
+        // The pending time-out keeps the experiment; the camera ends here.
+        experiment->setStream(nullptr);
+        experiment->setDevice(nullptr);
+        platform::installServices({});
     }
-    platform::installServices({});
     state.SetItemsProcessed(state.iterations() * state.range(0));
 }
 
-// The same road on another queue, with metadata in a flat_hash_map.
+// The same road on other queues, with metadata in a flat_hash_map. The last reference may go inside an item,
+// so the camera and the queues, which join their threads, belong to its caller.
 template <class Queue>
 class Pipeline : public std::enable_shared_from_this<Pipeline<Queue>> {
   public:
@@ -140,7 +146,11 @@ class Pipeline : public std::enable_shared_from_this<Pipeline<Queue>> {
     using Image = metadata::FlatTextMap<Contender::Metadata>;
     using Buffer = Camera<Image>::Buffer;
 
-    explicit Pipeline(std::int64_t frames) : _frames(static_cast<std::uint64_t>(frames)) {}
+    Pipeline(std::int64_t frames, Camera<Image>& camera, Queue& receiving, Queue& processing)
+        : _frames(static_cast<std::uint64_t>(frames))
+        , _camera(camera)
+        , _receiving(receiving)
+        , _processing(processing) {}
 
     void run() {
         _camera.start([weak = this->weak_from_this()](const Buffer& buffer, auto time) {
@@ -191,22 +201,22 @@ class Pipeline : public std::enable_shared_from_this<Pipeline<Queue>> {
     std::atomic<bool> _stop{false};
     std::atomic<std::uint64_t> _count{0};
     std::binary_semaphore _done{0};
-    Camera<Image> _camera{
-        Image{{std::string(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary),
-               Contender::build(metadata::frameEntries())}}};
-    Queue _processing{queues::kBackground};
-    Queue _receiving{queues::kUserInteractive};
+    Camera<Image>& _camera;
+    Queue& _receiving;
+    Queue& _processing;
 };
 
 template <class Queue>
 void peer(benchmark::State& state) {
+    using Image = typename Pipeline<Queue>::Image;
+    using Contender = typename Pipeline<Queue>::Contender;
     for (auto _ : state) {
-        auto pipeline = std::make_shared<Pipeline<Queue>>(state.range(0));
-        pipeline->run();
-        // The last reference must not go inside an item: these queues join their threads.
-        while (pipeline.use_count() > 1) {
-            std::this_thread::yield();
-        }
+        Queue processing(queues::kBackground);
+        Queue receiving(queues::kUserInteractive);
+        Camera<Image> camera(
+            Image{{std::string(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary),
+                   Contender::build(metadata::frameEntries())}});
+        std::make_shared<Pipeline<Queue>>(state.range(0), camera, receiving, processing)->run();
     }
     state.SetItemsProcessed(state.iterations() * state.range(0));
 }

@@ -1,6 +1,7 @@
 """The values that a kind of machine once reached, and what has become worse since."""
 
 import json
+import math
 import re
 from pathlib import Path
 
@@ -31,10 +32,11 @@ def update(machine, results):
 
 
 def worse(kept, row, result):
-    """The goals of a row that became worse by a tenth and by more than the kept spread."""
+    """The goals of a row that became worse by a tenth and by more than the kept spread, with the values before
+    and now. A kept goal that was not measured, or not as a number, counts as worse."""
     found = []
     for goal, before in kept.get(row, {}).items():
-        now = result["goals"].get(goal, {}).get("value")
-        if now is not None and now > before["value"] * WORSE_BY and now - before["value"] > before["spread"]:
+        now = result["goals"].get(goal, {}).get("value", math.nan)
+        if not (now <= before["value"] * WORSE_BY or now - before["value"] <= before["spread"]):
             found.append((goal, before["value"], now))
     return found

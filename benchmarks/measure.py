@@ -1,8 +1,10 @@
 """What is measured: benchmarks of zr_benchmarks, and programs as a whole.
 
-Every function here returns one sample of a row: a dictionary from names to numbers.
+A row's function returns one sample: a dictionary from names to numbers. When it is to be quick, it does a
+small part of the work under the same names.
 """
 
+import datetime
 import json
 import os
 import re
@@ -103,19 +105,23 @@ def at_30_fps(quick):
     return found
 
 
+def scaled(size, quick):
+    return size // 100 if quick else size
+
+
 def memory_of_frames(quick):
     """Peak megabytes of a run of the experiment over a hand-fed stream, by user and number of frames."""
     return {f"{user}/{frames}": spend(*prefix, BIN / "zr_benchmarks",
-                                      f"--benchmark_filter=^frames/here/{frames}/")["megabytes"]
+                                      f"--benchmark_filter=^frames/here/{scaled(frames, quick)}/")["megabytes"]
             for user, prefix in (("here", ()), ("ordinary user", WITHOUT_RAISING))
-            for frames in ((1000, 30_000) if quick else (1000, 30_000, 1_000_000))}
+            for frames in (1000, 30_000, 1_000_000)}
 
 
 def memory_of_runs(quick):
     """Peak megabytes of a session, by number of runs."""
     return {f"here/{runs}": zrlab_run("VantorFaultDiagnostic", "frameCount=5", "timeout=0.1",
-                                     extra=["--repeat", runs])["megabytes"]
-            for runs in ((10, 100) if quick else (1000, 10_000, 100_000))}
+                                     extra=["--repeat", scaled(runs, quick)])["megabytes"]
+            for runs in (1000, 10_000, 100_000)}
 
 
 def report(name, parameter, sizes):
@@ -124,8 +130,8 @@ def report(name, parameter, sizes):
     def sample(quick):
         found = {}
         with tempfile.TemporaryDirectory() as folder:
-            for size in [size // 100 for size in sizes] if quick else sizes:
-                used = {form: zrlab_run(name, f"{parameter}={size}", "timeout=600",
+            for size in sizes:
+                used = {form: zrlab_run(name, f"{parameter}={scaled(size, quick)}", "timeout=600",
                                         extra=["--format", form, "--output", f"{folder}/{form}"])
                         for form in ("text", "html", "json", "jsonl")}
                 for form, session in used.items():
@@ -149,4 +155,5 @@ def machine():
         "root": os.geteuid() == 0,
         "nice": os.nice(0),
         "load": os.getloadavg()[0],
+        "date": datetime.date.today().isoformat(),
     }

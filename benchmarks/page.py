@@ -57,7 +57,7 @@ def write(machine, rows, results):
 Made by `benchmarks/run`; do not edit it. The rows, their goals and their conditions are in `benchmarks/rows.py`.
 
 - Machine: {machine["processor"]}, {machine["cores"]} cores, Linux {machine["kernel"]}; load {machine["load"]:.1f} when
-  the run began. Release preset, {machine["compiler"]}, commit {machine["commit"]}.
+  the run began, on {machine["date"]}. Release preset, {machine["compiler"]}, commit {machine["commit"]}.
 - Run by {who} at nice {machine["nice"]}. No thread is pinned to a core.
 - A value is the median of five repeats; the rows take turns. A ratio is formed within each repeat, whose contenders
   run in one process in random order, five times each; less is better everywhere. The spread is the distance of the

@@ -18,8 +18,8 @@ BUILD = ROOT / "build/release"
 BIN = BUILD / "bin"
 MODULES = {"here": BIN / "zr_plugin.so", "empty": BUILD / "lib/zr_empty_module.so"}
 
-# Runs a command as an ordinary user would as far as priorities go: without the right to raise them.
-WITHOUT_RAISING = ["setpriv", "--bounding-set=-sys_nice", "--inh-caps=-sys_nice"]
+# Runs a command as an ordinary user would as far as priorities go: without root's right to raise them.
+WITHOUT_RAISING = ["setpriv", "--bounding-set=-sys_nice", "--inh-caps=-sys_nice"] if os.geteuid() == 0 else []
 
 
 class Failed(Exception):
@@ -44,7 +44,7 @@ def spend(*command):
 
 def google(row, prefix=()):
     """Measures the contenders of a row in one process: nanoseconds per item under "CONTENDER" or
-    "CONTENDER/ARGUMENT", a counter under "…:COUNTER"; medians of repetitions in random order."""
+    "CONTENDER/SIZE", a counter under "… [COUNTER]"; medians of repetitions in random order."""
 
     def sample(quick):
         text = output_of([*prefix, BIN / "zr_benchmarks", f"--benchmark_filter=^{row}/",
@@ -61,10 +61,10 @@ def google(row, prefix=()):
             if "items_per_second" in run:
                 found.setdefault(name, []).append(1e9 / run["items_per_second"])
             # What a peer takes from malloc itself is not counted: only our allocations are comparable.
-            for counter in ("allocations", "bytes", "start", "posting") if name.startswith("here") else (
-                    "start", "posting"):
+            own = ("allocations", "bytes") if name.startswith("here") else ()
+            for counter in ("start", "posting", "switches", *own):
                 if counter in run:
-                    found.setdefault(f"{name}:{counter}", []).append(run[counter])
+                    found.setdefault(f"{name} [{counter}]", []).append(run[counter])
         return {name: statistics.median(values) for name, values in found.items()}
 
     return sample
@@ -100,8 +100,8 @@ def at_30_fps(quick):
     alone = spend(BIN / "zr_device_alone", frames)
     found = {}
     for name, used in (("here", run), ("device alone", alone)):
-        found[f"{name}:share"] = 100 * used["cpu"] / (frames / 30)
-        found[f"{name}:switches"] = used["switches"] / frames
+        found[f"{name} [share]"] = 100 * used["cpu"] / (frames / 30)
+        found[f"{name} [switches]"] = used["switches"] / frames
     return found
 
 
@@ -135,9 +135,9 @@ def report(name, parameter, sizes):
                                         extra=["--format", form, "--output", f"{folder}/{form}"])
                         for form in ("text", "html", "json", "jsonl")}
                 for form, session in used.items():
-                    found[f"{form}/{size}:seconds"] = session["cpu"] - used["text"]["cpu"]
-                    found[f"{form}/{size}:session"] = session["cpu"]
-                    found[f"{form}/{size}:megabytes"] = session["megabytes"]
+                    found[f"{form}/{size} [seconds]"] = session["cpu"] - used["text"]["cpu"]
+                    found[f"{form}/{size} [session]"] = session["cpu"]
+                    found[f"{form}/{size} [megabytes]"] = session["megabytes"]
         return found
 
     return sample

@@ -1,6 +1,8 @@
 """docs/performance.md and its drawings, from the results of a run."""
 
 import math
+import re
+import textwrap
 from xml.sax.saxutils import escape
 
 import measure
@@ -35,15 +37,31 @@ def goal_table(rows, results):
     return "\n".join(lines) + "\n"
 
 
+def figure_table(row, figures):
+    """The contenders by size and by what was counted."""
+    lines = {}
+    for key, found in figures.items():
+        contender, size, counter = re.fullmatch(r"(.*?)(?:/(\d+))?(?: \[(\w+)\])?", key).groups()
+        lines.setdefault(contender, {})[(counter or row.unit, int(size or 0))] = found
+    columns = sorted({column for line in lines.values() for column in line})
+    titles = [f"{what} at {size:,}" if size else what for what, size in columns]
+    table = [f"| | {' | '.join(titles)} |", f"|---|{'--:|' * len(columns)}"]
+    for name in sorted(lines, key=lambda name: (name != "here", lines[name].get(columns[0], math.inf))):
+        cells = [number(lines[name][column]) if column in lines[name] else "" for column in columns]
+        table.append(f"| {name} | {' | '.join(cells)} |")
+    return "\n".join(table) + "\n"
+
+
 def row_section(row, result):
-    lines = [f"### {row.title}", "", f"`{row.name}`. {row.conditions}", "", f"Limited by: {row.limit}", ""]
+    parts = [f"### {row.title}\n", wrapped(f"`{row.name}`. {row.conditions}"), wrapped(f"Limited by: {row.limit}")]
     if result is not None:
-        if row.unit:
-            lines += [f"| contender | {row.unit} |", "|---|--:|"]
-            lines += [f"| {name} | {number(value)} |" for name, value in result["figures"].items()]
-            lines.append("")
-        lines += [f"![{curve.title}](images/{curve.file})\n" for curve in row.curves]
-    return "\n".join(lines)
+        parts.append(figure_table(row, result["figures"]))
+        parts += [f"![{curve.title}](images/{curve.file})\n" for curve in row.curves]
+    return "\n".join(parts)
+
+
+def wrapped(text):
+    return textwrap.fill(text, 110, break_long_words=False, break_on_hyphens=False) + "\n"
 
 
 def write(machine, rows, results):
@@ -52,22 +70,24 @@ def write(machine, rows, results):
             if row.name in results:
                 (IMAGES / curve.file).write_text(drawing(curve, results[row.name]["figures"]))
     who = "root" if machine["root"] else "an ordinary user"
-    PAGE.write_text(f"""# Performance
-
-Made by `benchmarks/run`; do not edit it. The rows, their goals and their conditions are in `benchmarks/rows.py`.
-
-- Machine: {machine["processor"]}, {machine["cores"]} cores, Linux {machine["kernel"]}; load {machine["load"]:.1f} when
-  the run began, on {machine["date"]}. Release preset, {machine["compiler"]}, commit {machine["commit"]}.
-- Run by {who} at nice {machine["nice"]}. No thread is pinned to a core.
-- A value is the median of five repeats; the rows take turns. A ratio is formed within each repeat, whose contenders
-  run in one process in random order, five times each; less is better everywhere. The spread is the distance of the
-  quartiles.
-- "here" is this project; the other contenders are peers that do the same work.
-
-{goal_table(rows, results)}
-## Rows
-
-""" + "\n".join(row_section(row, results.get(row.name)) for row in rows))
+    method = [
+        f"Machine: {machine['processor']}, {machine['cores']} cores, Linux {machine['kernel']}; load "
+        f"{machine['load']:.1f} when the run began, on {machine['date']}. Release preset, {machine['compiler']}, "
+        f"commit {machine['commit']}.",
+        f"Run by {who} at nice {machine['nice']}. No thread is pinned to a core.",
+        f"A value is the median of {machine['repeats']} repeats; the rows take turns. A ratio is formed within each "
+        "repeat, whose contenders run in one process in random order, five times each; less is better everywhere. "
+        "The spread is the distance of the quartiles.",
+        "\"here\" is this project; the other contenders are peers that do the same work.",
+    ]
+    PAGE.write_text("\n".join([
+        "# Performance\n",
+        wrapped("Made by `benchmarks/run`; do not edit it. The rows, their goals and their conditions are in "
+                "`benchmarks/rows.py`."),
+        *(wrapped(f"- {line}") for line in method),
+        goal_table(rows, results),
+        "## Rows\n",
+        *(row_section(row, results.get(row.name)) for row in rows)]))
 
 
 HUES = ("#2a78d6", "#1a9a6c", "#c4741a")

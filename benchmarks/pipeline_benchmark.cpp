@@ -115,8 +115,16 @@ class HandFedCapture final : public WLRylCaptureStream,
     Camera<platform::ImageBuffer> _camera;
 };
 
+void reportPerFrame(benchmark::State& state, double switchesBefore) {
+    const auto frames = state.iterations() * state.range(0);
+    state.SetItemsProcessed(frames);
+    state.counters["switches"] =
+        (queues::contextSwitches() - switchesBefore) / static_cast<double>(frames);
+}
+
 void here(benchmark::State& state) {
     platform::setLogSink(nullptr, platform::LogLevel::Error);
+    const double switches = queues::contextSwitches();
     for (auto _ : state) {
         platform::installServices(
             {.capture = std::make_shared<HandFedCapture>(),
@@ -134,7 +142,7 @@ void here(benchmark::State& state) {
         experiment->setDevice(nullptr);
         platform::installServices({});
     }
-    state.SetItemsProcessed(state.iterations() * state.range(0));
+    reportPerFrame(state, switches);
 }
 
 // The same road on other queues, with metadata in a flat_hash_map. The last reference may go inside an item,
@@ -210,6 +218,7 @@ template <class Queue>
 void peer(benchmark::State& state) {
     using Image = typename Pipeline<Queue>::Image;
     using Contender = typename Pipeline<Queue>::Contender;
+    const double switches = queues::contextSwitches();
     for (auto _ : state) {
         Queue processing(queues::kBackground);
         Queue receiving(queues::kUserInteractive);
@@ -218,7 +227,7 @@ void peer(benchmark::State& state) {
                    Contender::build(metadata::frameEntries())}});
         std::make_shared<Pipeline<Queue>>(state.range(0), camera, receiving, processing)->run();
     }
-    state.SetItemsProcessed(state.iterations() * state.range(0));
+    reportPerFrame(state, switches);
 }
 
 [[maybe_unused]] const bool registered = [] {

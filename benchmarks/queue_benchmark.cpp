@@ -83,6 +83,7 @@ void through(benchmark::State& state) {
     std::binary_semaphore over(0);
     Queue queue(kUserInteractive);
     const Captures captures;
+    const double before = queues::contextSwitches();
     for (auto _ : state) {
         for (std::int64_t i = 1; i < state.range(0); ++i) {
             postOne(queue, captures);
@@ -90,7 +91,9 @@ void through(benchmark::State& state) {
         queue.async([&over] { over.release(); });
         over.acquire();
     }
-    state.SetItemsProcessed(state.iterations() * state.range(0));
+    const auto items = state.iterations() * state.range(0);
+    state.SetItemsProcessed(items);
+    state.counters["switches"] = (queues::contextSwitches() - before) / static_cast<double>(items);
 }
 
 double median(std::vector<double>& samples) {
@@ -169,7 +172,6 @@ void registerRaised() {
 [[maybe_unused]] const bool registered = [] {
     queues::visitAll([]<class Queue>(Queue*) {
         benchmark::RegisterBenchmark(named<Queue>("post").c_str(), post<Queue>)
-            ->Arg(16)
             ->Arg(1000)
             ->UseManualTime();
         benchmark::RegisterBenchmark(named<Queue>("through").c_str(),
@@ -178,6 +180,11 @@ void registerRaised() {
             ->UseRealTime();
         registerWake<Queue>();
     });
+    // As many items as a device has buffers, or fewer: for the allocations.
+    benchmark::RegisterBenchmark("post/here", post<queues::Here>)
+        ->Arg(16)
+        ->Iterations(1000)
+        ->UseManualTime();
     registerWake<queues::BareFutex>();
     registerRaised<queues::Here>();
     registerRaised<queues::LockedDeque>();

@@ -29,9 +29,16 @@ namespace queues {
 inline constexpr int kUserInteractive = -5;
 inline constexpr int kBackground = 10;
 
-// False without the privilege to raise a priority; the thread keeps its level then.
-inline bool setNice(int nice) {
-    return setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()), nice) == 0;
+// Refused without the privilege to raise a priority; the thread keeps its level then.
+inline void setNice(int nice) {
+    setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()), nice);
+}
+
+// Context switches of the process since it started.
+inline double contextSwitches() {
+    rusage used{};
+    getrusage(RUSAGE_SELF, &used);
+    return static_cast<double>(used.ru_nvcsw + used.ru_nivcsw);
 }
 
 // Puts the calling thread at a level as long as it lives.

@@ -60,8 +60,8 @@ def row_section(row, result):
     return "\n".join(parts)
 
 
-def wrapped(text):
-    return textwrap.fill(text, 110, break_long_words=False, break_on_hyphens=False) + "\n"
+def wrapped(text, indent=""):
+    return textwrap.fill(text, 110, subsequent_indent=indent, break_long_words=False, break_on_hyphens=False) + "\n"
 
 
 def write(machine, rows, results):
@@ -84,7 +84,7 @@ def write(machine, rows, results):
         "# Performance\n",
         wrapped("Made by `benchmarks/run`; do not edit it. The rows, their goals and their conditions are in "
                 "`benchmarks/rows.py`."),
-        *(wrapped(f"- {line}") for line in method),
+        "".join(wrapped(f"- {line}", "  ") for line in method),
         goal_table(rows, results),
         "## Rows\n",
         *(row_section(row, results.get(row.name)) for row in rows)]))

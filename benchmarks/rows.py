@@ -30,7 +30,7 @@ class Goal:
 
     def compared(self):
         """Whether the kept baseline has it: what depends on the machine's speed alone, it has not."""
-        return self.unit not in ("ms", "s")
+        return self.unit not in ("ns", "µs", "ms", "s")
 
 
 @dataclass(frozen=True)

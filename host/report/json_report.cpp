@@ -169,7 +169,7 @@ Json jsonOf(const RunRecord& run) {
     object["framesDelivered"] = run.framesDelivered;
     object["framesLost"] = jsonOf(run.framesLost);
     object["imagesDelivered"] = run.imagesDelivered;
-    object["frames"] = arrayOf(run.frames, [](const FrameRecord& frame) { return jsonOf(frame); });
+    object["frames"] = Json::array();  // see withFrames()
     object["log"] = arrayOf(run.log, [](const LogRecord& line) { return jsonOf(line); });
     return object;
 }
@@ -213,6 +213,31 @@ Json deviceOf(const SessionRecord& session) {
             {"facts", std::move(facts)}};
 }
 
+// Text that is not UTF-8 (it may come from a device) must not stop the report.
+std::string textOf(const Json& json, int indent) {
+    return json.dump(indent, ' ', false, Json::error_handler_t::replace);
+}
+
+// The document's text with the frames of each run, one per line. As part of the document, those of a long
+// run would need many times the memory of their text.
+std::string withFrames(const std::string& document, const SessionRecord& session) {
+    // Only a member of a run is indented like this, and no text contains a line's end.
+    constexpr std::string_view kPlace = "\n      \"frames\": [";
+    std::string text;
+    std::size_t from = 0;
+    for (const RunRecord& run : session.runs) {
+        const std::size_t to = document.find(kPlace, from) + kPlace.size();
+        text.append(document, from, to - from);
+        for (const FrameRecord& frame : run.frames) {
+            text += &frame != &run.frames.front() ? "," : "";
+            text += "\n        " + textOf(jsonOf(frame), -1);
+        }
+        text += run.frames.empty() ? "" : "\n      ";
+        from = to;
+    }
+    return text.append(document, from, std::string::npos);
+}
+
 }  // namespace
 
 std::string jsonReport(const SessionRecord& session) {
@@ -228,8 +253,7 @@ std::string jsonReport(const SessionRecord& session) {
         arrayOf(session.notStarted(), [](const RunPlan& plan) { return Json(plan.name); });
     document["repeats"] =
         arrayOf(session.repeats, [](const RepeatRecord& repeat) { return jsonOf(repeat); });
-    // Text that is not UTF-8 (it may come from a device) must not stop the report.
-    return document.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+    return withFrames(textOf(document, 2), session) + "\n";
 }
 
 std::shared_ptr<RunListener> openJsonReport(ReportSink sink, const TextStyle& /*style*/) {

@@ -1,4 +1,5 @@
 // Observed devices and streams that go on any thread, in any order, while frames arrive.
+#include <chrono>
 #include <functional>
 #include <future>
 #include <memory>
@@ -27,7 +28,7 @@ class CaptureLifetime : public ::testing::Test {
     CaptureLifetime() { profile.streams.back().events = {{.frame = 2, .code = 1}}; }
     ~CaptureLifetime() override { EXPECT_THAT(witness->waitForMisuses(0), IsEmpty()); }
 
-    // A new device with a running stream; `handlers` expires when its handlers have been dropped.
+    // A new device with a running stream.
     void start(
         WLRylFrameHandler frame, WLRylEventHandler event = [](auto, auto, auto) {}) {
         plugIn = observed::observeCapture(
@@ -36,8 +37,9 @@ class CaptureLifetime : public ::testing::Test {
         device = plugIn->device(nullptr);
         stream = device->streams(nullptr)->back();
         ASSERT_TRUE(device->requestControlOfStreams({stream}, nullptr));
-        auto token = std::make_shared<int>();
-        handlers = token;
+        const auto ended = std::make_shared<std::promise<void>>();
+        handlersEnd = ended->get_future();
+        std::shared_ptr<void> token(nullptr, [ended](void*) { ended->set_value(); });
         ASSERT_TRUE(stream->setValue(
             test::captureHandlers(
                 [frame = std::move(frame), token = std::move(token)](
@@ -54,18 +56,15 @@ class CaptureLifetime : public ::testing::Test {
         });
         return first->get_future().get();
     }
-    void awaitHandlersEnd() const {
-        while (!handlers.expired()) {
-            std::this_thread::yield();
-        }
-    }
+    // Waits until its handlers have been dropped: what they did is visible then.
+    void awaitHandlersEnd() const { handlersEnd.wait(); }
 
     simulator::CaptureProfile profile = simulator::healthyCapture();
     std::shared_ptr<test::CaptureWitness> witness = std::make_shared<test::CaptureWitness>();
     std::shared_ptr<observed::ObservedCapture> plugIn;
     std::shared_ptr<WLRylCaptureDevice> device;
     std::shared_ptr<WLRylCaptureStream> stream;
-    std::weak_ptr<int> handlers;
+    std::future<void> handlersEnd;
 };
 
 // The last references to everything go inside a frame handler, after a stop, or inside an event handler.
@@ -102,7 +101,7 @@ TEST_F(CaptureLifetime, IsInvalidatedWhileItDelivers) {
         start([&](const auto&, auto) { ++frames; });
         witness->waitFor(before + static_cast<std::size_t>(round % 5));
         ASSERT_TRUE(device->invalidate(nullptr));
-        EXPECT_TRUE(handlers.expired());
+        EXPECT_EQ(handlersEnd.wait_for(std::chrono::seconds(0)), std::future_status::ready);
         EXPECT_EQ(witness->waitFor(0).size(), before + frames);
         EXPECT_EQ(plugIn->lentBuffers(), 0U);
     }

@@ -18,15 +18,14 @@ class WorkItem {
     WorkItem() = default;  // empty; must not be run
 
     template <class Callable>
-    requires(!std::same_as<std::remove_cvref_t<Callable>, WorkItem> &&
-             std::invocable<std::decay_t<Callable>&>) WorkItem(Callable&& callable) {
-        using Kept = std::decay_t<Callable>;
-        if constexpr (fitsInside<Kept>) {
-            ::new (static_cast<void*>(_inside)) Kept(std::forward<Callable>(callable));
-            _operations = &operationsOf<Kept>;
+    requires(!std::same_as<Callable, WorkItem> && std::invocable<Callable&>)
+        WorkItem(Callable callable) {
+        if constexpr (kFitsInside<Callable>) {
+            ::new (static_cast<void*>(_inside)) Callable(std::move(callable));
+            _operations = &kOperationsOf<Callable>;
         } else {
-            *this = WorkItem(
-                [kept = std::make_unique<Kept>(std::forward<Callable>(callable))] { (*kept)(); });
+            *this =
+                WorkItem([kept = std::make_unique<Callable>(std::move(callable))] { (*kept)(); });
         }
     }
 
@@ -44,6 +43,7 @@ class WorkItem {
 
   private:
     static constexpr std::size_t kInside = 64;  // bytes
+    static constexpr std::size_t kAlignment = alignof(void*);
 
     // What depends on the callable's type.
     struct Operations {
@@ -53,12 +53,11 @@ class WorkItem {
     };
 
     template <class Kept>
-    static constexpr bool fitsInside =
-        sizeof(Kept) <= kInside &&
-        alignof(Kept) <= alignof(void*) && std::is_nothrow_move_constructible_v<Kept>;
+    static constexpr bool kFitsInside = std::is_nothrow_move_constructible_v<Kept> &&
+                                        sizeof(Kept) <= kInside && alignof(Kept) <= kAlignment;
 
     template <class Kept>
-    static constexpr Operations operationsOf{
+    static constexpr Operations kOperationsOf{
         [](void* callable) { (*static_cast<Kept*>(callable))(); },
         [](void* to, void* from) noexcept {
             ::new (to) Kept(std::move(*static_cast<Kept*>(from)));
@@ -79,7 +78,7 @@ class WorkItem {
     }
 
     const Operations* _operations = nullptr;
-    alignas(void*) std::byte _inside[kInside];
+    alignas(kAlignment) std::byte _inside[kInside];
 };
 
 }  // namespace platform

@@ -18,8 +18,8 @@ struct Queued {
     RunTag run = 0;
 };
 
-// Keeps items in chunks, which it uses again, so that a line that is no longer than it has been allocates
-// nothing, and a long one moves no item twice. One thread at a time.
+// Keeps items in chunks of 32, so that a long line moves no item twice, and keeps one chunk to use again, so
+// that a short line allocates nothing. One thread at a time.
 class ItemLine {
   public:
     ItemLine() = default;
@@ -61,8 +61,7 @@ class ItemLine {
                 item = WorkItem();
             }
             _first->count = 0;
-            std::unique_ptr<Chunk> done = std::exchange(_first, std::move(_first->next));
-            _spare = std::move(done);
+            _spare = std::exchange(_first, std::move(_first->next));
         }
         _last = nullptr;
     }

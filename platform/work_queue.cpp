@@ -173,8 +173,8 @@ class WorkQueue::Timer {
   private:
     struct Delayed {
         std::shared_ptr<State> queue;
-        std::optional<Queued>
-            item;  // nothing: was queued already, but no thread could be started for it
+        // Nothing when it was queued already, but no thread could be started for it.
+        std::optional<Queued> item;
     };
     using Pending = std::multimap<Clock::time_point, Delayed>;  // of equal times, the first added
 

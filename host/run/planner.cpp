@@ -240,6 +240,14 @@ std::vector<RunPlan> planRuns(const ZRLab& lab,
     return plans;
 }
 
+std::vector<std::pair<Part, std::string>> partsOf(const ZRLab& lab, const std::string& name) {
+    if (const auto diagnostic = lab.diagnosticNamed(name)) {
+        return {{Part::Experiment, diagnostic->experimentName},
+                {Part::Analysis, diagnostic->analysisName}};
+    }
+    return {{Part::Experiment, name}};
+}
+
 std::vector<std::string> runnableNames(const ZRLab& lab) {
     std::vector<std::string> names;
     for (const auto& diagnostic : lab.diagnostics()) {

@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "frame/host_interface.h"
@@ -40,6 +41,10 @@ std::vector<std::string> valueWarnings(const std::vector<RunPlan>& plans);
 
 // The description that a new instance of the part gives; nothing when the name is not registered.
 std::optional<ZRDescription> describePart(const ZRLab& lab, Part part, std::string_view name);
+
+// The parts that run under a name: those of the diagnostic, else the experiment of that name, which need
+// not be registered.
+std::vector<std::pair<Part, std::string>> partsOf(const ZRLab& lab, const std::string& name);
 
 // The names that can be run: diagnostics, then experiments.
 std::vector<std::string> runnableNames(const ZRLab& lab);

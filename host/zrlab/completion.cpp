@@ -5,6 +5,8 @@
 #include <exception>
 #include <set>
 
+#include <fmt/format.h>
+
 #include "frame/host_interface.h"
 #include "host/record/clean_text.h"
 #include "host/record/run_text.h"
@@ -114,7 +116,8 @@ class Answer {
         text += _prefix + word;
         const std::size_t length = description.find_first_of(";\n");  // a longer one's first part
         if (!description.empty()) {
-            text += "\t" + plainLine(description.substr(0, length));
+            text += '\t';
+            text += plainLine(description.substr(0, length));
         }
         text += "\n";
     }
@@ -162,7 +165,7 @@ class Answer {
             }
             for (const auto& [name, parameter] : description->parameters()) {
                 for (const std::string& word :
-                     {name + "=", std::string(partText(kind)) + ":" + name + "="}) {
+                     {name + "=", fmt::format("{}:{}=", partText(kind), name)}) {
                     if (offered.insert(word).second) {
                         _offer(word, parameter.summary());
                     }
@@ -171,10 +174,8 @@ class Answer {
         };
         for (const std::string& name :
              _line.positionals.empty() ? runnableNames(lab) : _line.positionals) {
-            const auto diagnostic = lab.diagnosticNamed(name);
-            offer(Part::Experiment, diagnostic.has_value() ? diagnostic->experimentName : name);
-            if (diagnostic.has_value()) {
-                offer(Part::Analysis, diagnostic->analysisName);
+            for (const auto& [kind, part] : partsOf(lab, name)) {
+                offer(kind, part);
             }
         }
     }

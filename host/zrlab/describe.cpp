@@ -61,10 +61,10 @@ std::string runnableWith(const ZRLab& lab, const std::string& name) {
 
 RunPlan leastPlan(const ZRLab& lab, const std::string& name) {
     std::vector<ParameterSetting> settings;
-    const auto require = [&](Part kind, const std::string& part) {
+    for (const auto& [kind, part] : partsOf(lab, name)) {
         const auto description = describePart(lab, kind, part);
         if (!description.has_value()) {
-            return;
+            continue;
         }
         for (const auto& [parameter, declaration] : description->parameters()) {
             if (declaration.required()) {
@@ -72,11 +72,6 @@ RunPlan leastPlan(const ZRLab& lab, const std::string& name) {
                 settings.push_back({kind, parameter, least});
             }
         }
-    };
-    const auto diagnostic = lab.diagnosticNamed(name);
-    require(Part::Experiment, diagnostic.has_value() ? diagnostic->experimentName : name);
-    if (diagnostic.has_value()) {
-        require(Part::Analysis, diagnostic->analysisName);
     }
     return planRuns(lab, {name}, settings).front();
 }

@@ -33,8 +33,8 @@ class OutputFile {
 
 // Opens the file at `path` for a report. With `asItComes` each append() is written at once to the file
 // "PATH.part" beside it, one write each, and finish() renames that: it is kept when the program is killed
-// and when something cannot be written. Otherwise, and where there is no file but a device or a pipe, all is
-// written by finish(). Throws a Problem (kExitUsage) when no file can be made there, or another program
+// and when something cannot be written. Otherwise, and to a device or a pipe, finish() writes all of it.
+// Throws a Problem (kExitUsage) when no file can be made there, or another program
 // is writing it.
 std::unique_ptr<OutputFile> openOutputFile(const std::string& path, bool asItComes);
 

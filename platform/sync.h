@@ -1,6 +1,7 @@
 // What threads synchronize through: a mutex whose uses clang's thread-safety analysis checks, its scoped
-// lock and its condition, atomics, semaphores, and the start of a thread. The platform and the module use
-// nothing else, so that another header in place of this one sees, and can order, every step.
+// lock and its condition, atomics, semaphores, a wake-up for one thread, and the start of a thread. The
+// platform and the module use nothing else, so that another header in place of this one sees, and can
+// order, every step.
 //
 // Fields say which mutex guards them with ZR_GUARDED_BY; functions that need it held with
 // ZR_REQUIRES. Under other compilers the annotations expand to nothing.
@@ -10,10 +11,16 @@
 #include <atomic>
 #include <chrono>
 #include <condition_variable>
+#include <cstdint>
 #include <mutex>
 #include <semaphore>
 #include <thread>
 #include <utility>
+
+#include <linux/futex.h>
+#include <sched.h>
+#include <sys/syscall.h>
+#include <unistd.h>
 
 #if defined(__clang__)
 #define ZR_THREAD_ANNOTATION(x) __attribute__((x))
@@ -91,6 +98,57 @@ template <class T>
 using Atomic = std::atomic<T>;
 
 using Semaphore = std::counting_semaphore<>;
+
+// What one thread waits on until another wakes it. The thread sleeps on the bare system call: no lock is
+// taken and none is taken back.
+//
+// Waking a sleeping thread costs both sides microseconds. So a wait that follows a short one first watches
+// for its end without sleeping, and lets others have the processor meanwhile: who is to wake this thread
+// may wait for the same core.
+class Wakeup {
+  public:
+    // Returns when wake() has been called since the last wait returned, once for any number of calls. One
+    // thread at a time.
+    void wait() {
+        const auto begin = Clock::now();
+        if (_lastWaitWasShort) {
+            while (_word.load(std::memory_order_relaxed) == kUnset &&
+                   Clock::now() - begin < kShort) {
+                sched_yield();
+            }
+        }
+        std::uint32_t seen = kUnset;
+        if (_word.compare_exchange_strong(seen, kAsleep, std::memory_order_acquire)) {
+            while (_word.load(std::memory_order_acquire) == kAsleep) {
+                _futex(FUTEX_WAIT_PRIVATE, kAsleep);
+            }
+        }
+        _word.exchange(kUnset, std::memory_order_acquire);
+        _lastWaitWasShort = Clock::now() - begin < kShort;
+    }
+
+    // Any thread. The object must live until this returns, even if the waiting thread goes on before.
+    void wake() {
+        if (_word.exchange(kSet, std::memory_order_acq_rel) == kAsleep) {
+            _futex(FUTEX_WAKE_PRIVATE, 1);
+        }
+    }
+
+  private:
+    using Clock = std::chrono::steady_clock;
+    // Ten times what it takes to wake a thread. With half of it, frames at full speed still put threads to
+    // sleep on a slow machine.
+    static constexpr std::chrono::microseconds kShort{40};
+
+    enum : std::uint32_t { kUnset, kSet, kAsleep };
+
+    void _futex(int operation, std::uint32_t value) {
+        syscall(SYS_futex, &_word, operation, value, nullptr, nullptr, 0);
+    }
+
+    std::atomic<std::uint32_t> _word{kUnset};
+    bool _lastWaitWasShort = false;  // belongs to the waiting thread
+};
 
 // Runs `body` on a thread of its own that is not joined. An exception that leaves it ends the process
 // where it was thrown, so that the debugger shows the culprit. Throws std::system_error when no thread

@@ -48,17 +48,17 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
 
     void push(Queued&& item) {
         // Once the lock is given up, the item may have run and dropped every other reference.
-        std::shared_ptr<State> asleep;
+        std::shared_ptr<State> waiting;
         {
             const MutexLock lock(_mutex);
             _needThread();  // first: if none can be started, nothing was queued
             _items.add(std::move(item));
-            if (std::exchange(_isAsleep, false)) {
-                asleep = shared_from_this();
+            if (std::exchange(_isWaiting, false)) {
+                waiting = shared_from_this();
             }
         }
-        if (asleep != nullptr) {
-            asleep->_changed.notifyOne();
+        if (waiting != nullptr) {
+            waiting->_wakeup.wake();
         }
     }
 
@@ -77,9 +77,9 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
             } catch (const std::exception&) {
                 return false;
             }
-            _isAsleep = false;
+            _isWaiting = false;
         }
-        _changed.notifyOne();
+        _wakeup.wake();
         return true;
     }
 
@@ -93,7 +93,7 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
             const MutexLock lock(_mutex);
             --_holds;
         }
-        _changed.notifyOne();
+        _wakeup.wake();
     }
 
   private:
@@ -119,25 +119,29 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     // end. That is decided under the lock that saw the queue empty: an item that comes later starts
     // another thread.
     bool _takeAll(ItemLine& taken) {
-        const MutexLock lock(_mutex);
-        while (_items.isEmpty()) {
-            if (_holds == 0) {
-                _hasThread = false;
-                return false;
+        while (true) {
+            {
+                const MutexLock lock(_mutex);
+                _isWaiting = false;
+                if (!_items.isEmpty()) {
+                    taken.takeAll(_items);
+                    return true;
+                }
+                if (_holds == 0) {
+                    _hasThread = false;
+                    return false;
+                }
+                _isWaiting = true;
             }
-            _isAsleep = true;
-            _changed.wait(_mutex);
+            _wakeup.wait();
         }
-        _isAsleep = false;
-        taken.takeAll(_items);
-        return true;
     }
 
     Mutex _mutex;
-    Condition _changed;
+    Wakeup _wakeup;
     ItemLine _items ZR_GUARDED_BY(_mutex);
     bool _hasThread ZR_GUARDED_BY(_mutex) = false;
-    bool _isAsleep ZR_GUARDED_BY(_mutex) = false;  // and not woken yet
+    bool _isWaiting ZR_GUARDED_BY(_mutex) = false;  // and not woken yet
     std::size_t _holds ZR_GUARDED_BY(_mutex) = 0;
 };
 

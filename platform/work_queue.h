@@ -8,7 +8,8 @@
 //          own items; nothing waits then.
 // Threads  Every operation may be called on any thread, and never waits for a running item.
 // Cost     Queueing takes a lock that the queue's thread holds only for a moment, and wakes the thread
-//          when it sleeps. While no more than 32 items wait, one that captured up to 64 bytes
+//          when it sleeps. While items come less than 40 µs apart, the thread watches for the next one
+//          instead of sleeping, and yields its core to whoever wants it. While no more than 32 items wait, one that captured up to 64 bytes
 //          allocates nothing; a longer queue allocates once per 32 items. The queue's thread exists
 //          while there are items or the queue is held (see Hold). An item for a queue that is not held
 //          and has no items costs the start of a thread. The delayed items of all queues wait on one

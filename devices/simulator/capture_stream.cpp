@@ -253,8 +253,9 @@ platform::ImageBufferRef SimulatedStream::_makeBuffer(const Value& metadata) {
 
 void SimulatedStream::_bufferCameBack() {
     const MutexLock lock(_mutex);
-    --_buffersOut;
-    _changed.notifyAll();
+    if (_buffersOut-- == kImageBuffers) {
+        _changed.notifyAll();
+    }
 }
 
 }  // namespace simulator

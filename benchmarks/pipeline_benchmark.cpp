@@ -15,105 +15,12 @@
 #include "devices/simulator/meterix_facility.h"
 #include "platform/log.h"
 #include "platform/services.h"
-#include "platform/welkin/capture.h"
+#include "tests/support/hand_fed_camera.h"
 #include "vantor_fault/fault_experiment.h"
 
 namespace {
 
-// Lends `image` on a thread of its own, at most eight times at once, between start() and stop(). Its
-// destructor waits for every buffer.
-template <class Image>
-class Camera {
-  public:
-    using Buffer = std::shared_ptr<const Image>;
-    using Handler = std::function<void(const Buffer& buffer, platform::MediaTime time)>;
-
-    explicit Camera(Image image) : _image(std::move(image)) {}
-    ~Camera() {
-        stop();
-        if (_thread.joinable()) {
-            _thread.join();
-        }
-        for (std::ptrdiff_t buffer = 0; buffer < kBuffers; ++buffer) {
-            _free.acquire();
-        }
-    }
-    void start(Handler handler) {
-        _thread = std::thread([this, handler = std::move(handler)] {
-            for (std::int64_t frame = 1;; ++frame) {
-                _free.acquire();
-                const Buffer buffer(&_image, [this](const Image*) { _free.release(); });
-                if (_stopped.load()) {
-                    return;
-                }
-                handler(buffer, {frame, 30, platform::MediaTime::kValid, 0});
-            }
-        });
-    }
-    void stop() { _stopped.store(true); }
-
-  private:
-    static constexpr std::ptrdiff_t kBuffers = 8;
-
-    const Image _image;
-    std::counting_semaphore<kBuffers> _free{kBuffers};
-    std::atomic<bool> _stopped{false};  // set on the thread that has seen enough
-    std::thread _thread;
-};
-
-// The camera as the capture service's stream, device and plug-in.
-class HandFedCapture final : public WLRylCaptureStream,
-                             public WLRylCaptureDevice,
-                             public WLISPCapturePlugIn,
-                             public std::enable_shared_from_this<HandFedCapture> {
-  public:
-    HandFedCapture()
-        : _camera(platform::ImageBuffer(
-              platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
-                                    metadata::Here::build(metadata::frameEntries())}})) {}
-
-    platform::Value valueForProperty(std::string_view property,
-                                     platform::ErrorSlot /*error*/) override {
-        if (property == kRylCaptureStreamProperty_PortType) {
-            return kRylCapturePortType_FrontFacingInfraredCamera;
-        }
-        return platform::Dictionary();
-    }
-    bool setValue(const platform::Value& value,
-                  std::string_view forProperty,
-                  platform::ErrorSlot /*error*/) override {
-        if (forProperty == kRylCaptureStreamProperty_VideoOutputHandlers) {
-            _handlers = value;
-        }
-        return true;
-    }
-    bool start(platform::ErrorSlot /*error*/) override {
-        _camera.start(*_handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                                [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                                    .object<WLRylFrameHandler>());
-        return true;
-    }
-    bool stop(platform::ErrorSlot /*error*/) override {
-        _camera.stop();
-        return true;
-    }
-
-    std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot /*error*/) override {
-        return shared_from_this();
-    }
-    std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot /*error*/) override {
-        return WLRylCaptureStreamList{shared_from_this()};
-    }
-    bool requestControlOfStreams(const WLRylCaptureStreamList& /*streams*/,
-                                 platform::ErrorSlot /*error*/) override {
-        return true;
-    }
-    bool invalidate(platform::ErrorSlot /*error*/) override { return true; }
-
-  private:
-    platform::Value _handlers;
-    Camera<platform::ImageBuffer> _camera;
-};
+using test::Camera;
 
 void reportPerFrame(benchmark::State& state, double switchesBefore) {
     const auto frames = state.iterations() * state.range(0);
@@ -124,10 +31,14 @@ void reportPerFrame(benchmark::State& state, double switchesBefore) {
 
 void here(benchmark::State& state) {
     platform::setLogSink(nullptr, platform::LogLevel::Error);
+    const auto image = std::make_shared<const platform::ImageBuffer>(
+        platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
+                              metadata::Here::build(metadata::frameEntries())}});
     const double switches = queues::contextSwitches();
     for (auto _ : state) {
         platform::installServices(
-            {.capture = std::make_shared<HandFedCapture>(),
+            {.capture =
+                 std::make_shared<test::HandFedCapture>([image](std::int64_t) { return image; }),
              .meterix = simulator::makeMeterixFacility(
                  simulator::healthyMeterix(), std::make_shared<simulator::StreamProgress>())});
         const auto experiment = std::make_shared<ZRVantorFaultExperiment>();
@@ -218,13 +129,14 @@ template <class Queue>
 void peer(benchmark::State& state) {
     using Image = typename Pipeline<Queue>::Image;
     using Contender = typename Pipeline<Queue>::Contender;
+    const auto image = std::make_shared<const Image>(
+        Image{{std::string(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary),
+               Contender::build(metadata::frameEntries())}});
     const double switches = queues::contextSwitches();
     for (auto _ : state) {
         Queue processing(queues::kBackground);
         Queue receiving(queues::kUserInteractive);
-        Camera<Image> camera(
-            Image{{std::string(kRylCaptureSampleBufferAttachmentKey_MetadataDictionary),
-                   Contender::build(metadata::frameEntries())}});
+        Camera<Image> camera([image](std::int64_t) { return image; });
         std::make_shared<Pipeline<Queue>>(state.range(0), camera, receiving, processing)->run();
     }
     reportPerFrame(state, switches);

@@ -25,8 +25,9 @@ if(ZR_BUILD_FUZZ)
   target_compile_options(zr_build_flags INTERFACE -fsanitize=fuzzer-no-link)
 endif()
 if(ZR_COVERAGE)
-  target_compile_options(zr_build_flags INTERFACE --coverage)
-  target_link_options(zr_build_flags INTERFACE --coverage)
+  target_compile_options(zr_build_flags INTERFACE
+    -fprofile-instr-generate -fcoverage-mapping -fprofile-update=atomic)
+  target_link_options(zr_build_flags INTERFACE -fprofile-instr-generate)
 endif()
 
 # zr_hide_symbols(NAME)

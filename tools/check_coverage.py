@@ -1,0 +1,113 @@
+#!/usr/bin/env python3
+"""Which lines and branches of the platform and the plug-in the tests run. Every line that they do not run is
+named, with the reason, in tests/coverage-exceptions.json.
+
+    tools/check_coverage.py BUILD      of the coverage preset; runs the test programs that it finds there
+
+Fails on a line that is not run and has no exception, on an exception whose line is run or is not there any
+more, and when fewer than 95 % of a folder's branches are taken. The two ways out of a condition are two
+branches.
+"""
+
+import json
+import os
+import subprocess
+import sys
+import tempfile
+from concurrent.futures import ThreadPoolExecutor
+from pathlib import Path
+
+ROOT = Path(__file__).resolve().parent.parent
+FOLDERS = ("frame", "vantor_counters", "vantor_fault", "kirra", "platform")
+EXCEPTIONS = ROOT / "tests/coverage-exceptions.json"
+BRANCHES = 0.95
+
+
+def run_tests(build, profiles):
+    """Runs every test program and returns one merged profile."""
+
+    def run(program):
+        environment = {**os.environ, "LLVM_PROFILE_FILE": f"{profiles}/{program.name}.%p.profraw"}
+        ended = subprocess.run([program], env=environment, cwd=build, capture_output=True, text=True, check=False)
+        if ended.returncode != 0:
+            print("".join(ended.stdout.splitlines(keepends=True)[-30:]), file=sys.stderr)
+            sys.exit(f"check_coverage: {program.name} failed")
+
+    with ThreadPoolExecutor(os.cpu_count()) as pool:
+        list(pool.map(run, sorted((build / "bin").glob("*_test"))))
+    merged = Path(profiles) / "merged.profdata"
+    subprocess.run(["llvm-profdata-14", "merge", "-sparse", "-o", merged, *Path(profiles).glob("*.profraw")],
+                   check=True)
+    return merged
+
+
+def export(build, profile):
+    """What llvm-cov knows of the files of the folders."""
+    programs = [*(build / "bin").glob("*_test"), *(build / "bin").glob("*.so"), *(build / "lib").glob("*.so")]
+    objects = [word for program in programs for word in ("-object", program)][1:]
+    files = [path for folder in FOLDERS for path in sorted((ROOT / folder).rglob("*"))
+             if path.suffix in (".h", ".cpp")]
+    text = subprocess.run(["llvm-cov-14", "export", f"-instr-profile={profile}", *objects, *files],
+                          stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, text=True, check=True).stdout
+    return {str(Path(file["filename"]).relative_to(ROOT)): file for file in json.loads(text)["data"][0]["files"]}
+
+
+def lines_not_run(file):
+    """The numbers of the lines with code of which nothing ran.
+
+    The space between statements counts as run or not, too (a gap); it is left out, since it is reported as
+    not run after a block that can return."""
+    counts = {}
+    inside = None  # the count of the code that a line begins in
+    line = 0
+    for number, _, count, has_count, _, is_gap in file["segments"]:
+        if inside is not None:
+            for between in range(line + 1, number + 1):
+                counts.setdefault(between, []).append(inside)
+        inside = count if has_count and not is_gap else None
+        line = number
+        if inside is not None:
+            counts.setdefault(number, []).append(inside)
+    return [number for number, seen in sorted(counts.items()) if max(seen) == 0]
+
+
+def branches_of(files):
+    """Branches taken, and all: of a template's instances, what any of them took."""
+    taken = {}
+    for name, file in files:
+        for line, column, _, _, when_true, when_false, *_ in file["branches"]:
+            for way, count in (("true", when_true), ("false", when_false)):
+                key = (name, line, column, way)
+                taken[key] = taken.get(key, False) or count > 0
+    return sum(taken.values()), len(taken)
+
+
+def main():
+    build = Path(sys.argv[1]).resolve()
+    with tempfile.TemporaryDirectory() as profiles:
+        files = export(build, run_tests(build, profiles))
+    problems = []
+    exceptions = {(entry["file"], entry["line"]): entry["reason"] for entry in json.loads(EXCEPTIONS.read_text())}
+    used = set()
+    for name, file in files.items():
+        text = (ROOT / name).read_text().splitlines()
+        for number in lines_not_run(file):
+            key = (name, text[number - 1].strip())
+            used.add(key)
+            if key not in exceptions and not set(key[1]) <= set("{}();"):
+                problems.append(f"{name}:{number}: no test runs it, and it has no exception: {key[1]}")
+    problems += [f"{EXCEPTIONS.name}: a test runs it now, or it is gone: {name}: {line}"
+                 for name, line in exceptions if (name, line) not in used]
+    for folder in FOLDERS:
+        inside = [(name, file) for name, file in files.items() if name.startswith(folder + "/")]
+        taken, branches = branches_of(inside)
+        print(f"{folder:16} {sum(file['summary']['lines']['count'] for _, file in inside):5} lines, "
+              f"{taken} of {branches} branches ({taken / branches:.1%})")
+        if taken < BRANCHES * branches:
+            problems.append(f"{folder}: {taken} of {branches} branches are taken, less than {BRANCHES:.0%}")
+    print("\n".join(problems), file=sys.stderr)
+    print(f"{len(exceptions)} lines are excepted" if not problems else f"{len(problems)} problems")
+    sys.exit(1 if problems else 0)
+
+
+main()

@@ -325,6 +325,7 @@ void RunLoop::addSource(const std::shared_ptr<RunLoopSource>& source, std::strin
     RunLoopSource::Wakers& wakers = *source->_wakers;
     const MutexLock lockWakers(wakers.mutex);
     const MutexLock lock(_state->mutex);
+    wakers.loops.reserve(wakers.loops.size() + 1);  // what comes after add() must not throw
     if (_state->add(_state->sources, source, mode, 0)) {
         wakers.loops.push_back(_state);
         _state->changed.notifyAll();

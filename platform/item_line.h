@@ -19,18 +19,13 @@ struct Queued {
 };
 
 // Keeps items in chunks of 32, so that a long line moves no item twice, and keeps one chunk to use again, so
-// that a short line allocates nothing. One thread at a time.
+// that a short line allocates nothing. One thread at a time. It must be empty when it ends: a long chain of
+// chunks would not end on the stack.
 class ItemLine {
   public:
     ItemLine() = default;
     ItemLine(const ItemLine&) = delete;
     ItemLine& operator=(const ItemLine&) = delete;
-    // One by one: a long chain would not fit the stack.
-    ~ItemLine() {
-        while (_first != nullptr) {
-            _first = std::move(_first->next);
-        }
-    }
 
     bool isEmpty() const { return _first == nullptr; }
 

@@ -81,7 +81,6 @@ class Condition {
             _condition.wait_until(held.lock, deadline);
         }
     }
-    void notifyOne() { _condition.notify_one(); }
     void notifyAll() { _condition.notify_all(); }
 
   private:

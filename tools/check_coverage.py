@@ -72,14 +72,16 @@ def lines_not_run(file):
 
 
 def branches_of(files):
-    """Branches taken, and all: of a template's instances, what any of them took."""
+    """Branches taken, and all: of a template's instances, what any of them took. A condition that was never
+    reached is left out: the compiler decided it, or its line is reported."""
     taken = {}
     for name, file in files:
         for line, column, _, _, when_true, when_false, *_ in file["branches"]:
-            for way, count in (("true", when_true), ("false", when_false)):
-                key = (name, line, column, way)
-                taken[key] = taken.get(key, False) or count > 0
-    return sum(taken.values()), len(taken)
+            ways = taken.setdefault((name, line, column), [False, False])
+            ways[0] |= when_true > 0
+            ways[1] |= when_false > 0
+    reached = [ways for ways in taken.values() if any(ways)]
+    return sum(map(sum, reached)), 2 * len(reached)
 
 
 def main():

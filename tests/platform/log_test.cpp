@@ -1,10 +1,33 @@
 #include "platform/log.h"
 
+#include <array>
 #include <atomic>
+#include <cstdarg>
+#include <cstdio>
+#include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
+#include <syslog.h>
+
 #include <gmock/gmock.h>
+
+namespace {
+
+std::vector<std::pair<int, std::string>> systemLog;
+
+}  // namespace
+
+// In place of the C library's.
+extern "C" void syslog(int priority, const char* format, ...) {
+    std::array<char, 256> text{};
+    va_list arguments;
+    va_start(arguments, format);
+    std::vsnprintf(text.data(), text.size(), format, arguments);
+    va_end(arguments);
+    systemLog.emplace_back(priority, text.data());
+}
 
 namespace {
 
@@ -46,6 +69,18 @@ TEST_F(LogTest, ComputesAMessageOnlyWhenItsLevelIsOn) {
         EXPECT_EQ(sink->lines, expected);
         EXPECT_EQ(computed, static_cast<int>(expected.size()));
     }
+}
+
+TEST_F(LogTest, GoesToTheSystemLogWithoutASinkOfItsOwn) {
+    platform::setLogSink(nullptr, LogLevel::Debug);
+    const Log log("sub.system", "category");
+    for (const LogLevel level : {LogLevel::Debug, LogLevel::Default, LogLevel::Error}) {
+        log.write(level, [] { return "100 %s"; });
+    }
+    const std::string line = "[sub.system:category] 100 %s";
+    EXPECT_THAT(systemLog,
+                ::testing::ElementsAre(std::pair(LOG_DEBUG, line), std::pair(LOG_NOTICE, line),
+                                       std::pair(LOG_ERR, line)));
 }
 
 // Counts lines, and notices a line that reaches it after its end.

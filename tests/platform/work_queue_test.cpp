@@ -228,6 +228,24 @@ TEST(WorkQueue, QueuesWithoutAThreadToBeHadWhenItIsHeld) {
     EXPECT_EQ(dropped.use_count(), 1);
 }
 
+TEST(WorkQueue, IsNotHeldWhenThereIsNoThreadForDelayedItems) {
+    EXPECT_TRUE(eventually([] { return threadsNamed("delayed items") == 0; }));
+    WorkQueue queue("half held", Priority::UserInteractive);
+    std::latch running(1);
+    std::latch go(1);
+    queue.async([&] {
+        running.count_down();
+        go.wait();
+    });
+    running.wait();
+    {
+        const test::NoThreads noThreads;
+        EXPECT_THROW(WorkQueue::Hold hold(queue), std::system_error);
+    }
+    go.count_down();
+    EXPECT_TRUE(eventually([] { return threadsNamed("half held") == 0; }));
+}
+
 TEST(WorkQueue, RunsWhatItHasWhenItsOwnerGoesInsideAnItem) {
     std::latch done(2);
     std::latch delayed(1);

@@ -111,24 +111,24 @@ class Wakeup {
     void wait() {
         const auto begin = Clock::now();
         if (_lastWaitWasShort) {
-            while (_word.load(std::memory_order_relaxed) == kUnset &&
+            while (_word.load(std::memory_order_relaxed) == Unset &&
                    Clock::now() - begin < kShort) {
                 sched_yield();
             }
         }
-        std::uint32_t seen = kUnset;
-        if (_word.compare_exchange_strong(seen, kAsleep, std::memory_order_acquire)) {
-            while (_word.load(std::memory_order_acquire) == kAsleep) {
-                _futex(FUTEX_WAIT_PRIVATE, kAsleep);
+        std::uint32_t seen = Unset;
+        if (_word.compare_exchange_strong(seen, Asleep, std::memory_order_acquire)) {
+            while (_word.load(std::memory_order_acquire) == Asleep) {
+                _futex(FUTEX_WAIT_PRIVATE, Asleep);
             }
         }
-        _word.exchange(kUnset, std::memory_order_acquire);
+        _word.exchange(Unset, std::memory_order_acquire);
         _lastWaitWasShort = Clock::now() - begin < kShort;
     }
 
     // Any thread. The object must live until this returns, even if the waiting thread goes on before.
     void wake() {
-        if (_word.exchange(kSet, std::memory_order_acq_rel) == kAsleep) {
+        if (_word.exchange(Set, std::memory_order_acq_rel) == Asleep) {
             _futex(FUTEX_WAKE_PRIVATE, 1);
         }
     }
@@ -139,13 +139,13 @@ class Wakeup {
     // sleep on a slow machine.
     static constexpr std::chrono::microseconds kShort{40};
 
-    enum : std::uint32_t { kUnset, kSet, kAsleep };
+    enum State : std::uint32_t { Unset, Set, Asleep };
 
     void _futex(int operation, std::uint32_t value) {
         syscall(SYS_futex, &_word, operation, value, nullptr, nullptr, 0);
     }
 
-    std::atomic<std::uint32_t> _word{kUnset};
+    std::atomic<std::uint32_t> _word{Unset};
     bool _lastWaitWasShort = false;  // belongs to the waiting thread
 };
 

@@ -26,10 +26,10 @@
 
 #include "devices/simulator/device.h"
 #include "kirra/image_experiment.h"
-#include "platform/deadline.h"
 #include "platform/log.h"
 #include "platform/run_loop.h"
 #include "platform/services.h"
+#include "tests/support/eventually.h"
 #include "vantor_counters/counter_analysis.h"
 #include "vantor_counters/counter_experiment.h"
 #include "vantor_fault/fault_analysis.h"
@@ -82,7 +82,6 @@ bool allocationFails() {
 namespace {
 
 constexpr double kTimeout = 0.02;  // seconds: it keeps its experiment for so long
-constexpr std::chrono::seconds kGenerous{60};
 
 // What a child reports as its exit status. It ends by a signal when an exception leaves a thread.
 enum Outcome : int { kHealthy, kThrew, kNoStream, kWrong };
@@ -153,17 +152,6 @@ Sizes takeTurn(const Run& run, platform::ErrorSlot error) {
     return {result->measurements().size(), measured, result->auxiliaryData().size()};
 }
 
-bool eventually(const std::function<bool()>& condition) {
-    const auto deadline = platform::deadlineAfter(kGenerous);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() >= deadline) {
-            return false;
-        }
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    return true;
-}
-
 std::size_t threads() {
     return static_cast<std::size_t>(
         std::distance(std::filesystem::directory_iterator("/proc/self/task"), {}));
@@ -194,7 +182,7 @@ Outcome runOnce(const Run& run, long failing, Sizes& sizes) {
         }
         platform::installServices({});
     }
-    if (!eventually([&] { return threads() == 1; })) {
+    if (!test::eventually([&] { return threads() == 1; })) {
         std::cerr << threads() << " threads are left\n";
         return kWrong;
     }
@@ -214,7 +202,7 @@ TEST_P(EveryAllocation, FailsOnceWithoutHarm) {
     platform::installServices(simulator::makeDevice(simulator::DeviceProfile(), 0));
     takeTurn(GetParam(), nullptr);
     platform::installServices({});
-    ASSERT_TRUE(eventually([] { return threads() == 1; }));
+    ASSERT_TRUE(test::eventually([] { return threads() == 1; }));
     Sizes healthy;
     ASSERT_EQ(runOnce(GetParam(), 0, healthy), kHealthy);
 
@@ -228,7 +216,7 @@ TEST_P(EveryAllocation, FailsOnceWithoutHarm) {
         if (child == 0) {
             const rlimit noCore{0, 0};
             setrlimit(RLIMIT_CORE, &noCore);
-            alarm(kGenerous.count());
+            alarm(test::kGenerous.count());
             Sizes sizes;
             Outcome outcome = runOnce(GetParam(), failing, sizes);
             if (outcome == kHealthy && sizes != healthy) {

@@ -3,7 +3,6 @@
 #include <array>
 #include <atomic>
 #include <cmath>
-#include <functional>
 #include <latch>
 #include <random>
 #include <semaphore>
@@ -19,6 +18,7 @@
 #include "platform/log.h"
 #include "platform/run_tag.h"
 #include "tests/platform/threads.h"
+#include "tests/support/eventually.h"
 
 namespace {
 
@@ -27,18 +27,8 @@ using platform::WorkQueue;
 using Clock = std::chrono::steady_clock;
 using Priority = platform::WorkQueue::Priority;
 using std::chrono::nanoseconds;
+using test::eventually;
 using test::threadsNamed;
-
-// Whether the condition comes true, with all the time that a loaded machine may need.
-bool eventually(const std::function<bool()>& condition) {
-    for (const auto limit = Clock::now() + 60s; Clock::now() < limit;
-         std::this_thread::sleep_for(1ms)) {
-        if (condition()) {
-            return true;
-        }
-    }
-    return false;
-}
 
 TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
     constexpr int kThreads = 4;

@@ -10,10 +10,9 @@
 #include "devices/observed/observer.h"
 #include "platform/deadline.h"
 #include "platform/sync.h"
+#include "tests/support/eventually.h"
 
 namespace test {
-
-inline constexpr std::chrono::seconds kGenerous{60};
 
 class CaptureWitness final : public observed::Observer {
   public:

@@ -123,19 +123,22 @@ ROWS = (
     Row("through", "20,000 items through a serial queue, equal nice levels", measure.google("through"),
         (Goal("of the best peer", of_best(QUEUES, "/20000"), 0.9),),
         "The same items, from the first one's posting until the last one ran. " + EQUAL,
-        "The lock or the cache line that poster and worker pass to and fro, and how often the worker falls "
-        "asleep: the figures have the context switches per item."),
+        "The cache lines of the items, which poster and worker pass to and fro. Our worker takes all items "
+        "that are there at once, and yields its core for up to 40 µs before it sleeps, so it is hardly "
+        "ever woken: the figures have the context switches per item."),
     Row("through-raised", "20,000 items through a serial queue, worker raised",
         measure.google("through-raised"),
         (Goal("of mutex + deque at the same levels", of_best(("mutex+deque",), "/20000"), 1.0),),
         RAISED,
-        "As above; the figures have the context switches per item.",
+        "As above. A raised worker preempts a poster that wakes it on its own core; one that is hardly ever "
+        "woken does not.",
         needs_root=True),
     Row("wake", "Wake a sleeping queue", measure.google("wake"),
         (Goal("post to start, of the bare futex", of_best(("bare futex",), " [start]"), 1.1),
          Goal("posting, of the best peer's", of_best(QUEUES, " [posting]"), 1.1)),
         "200 µs of rest before each of 1,000 items; medians in one process. " + EQUAL,
-        "The system call that wakes a thread, and the scheduler's way to it."),
+        "The system call that wakes a thread, and the scheduler's way to it. Beyond the bare futex, our queue "
+        "takes a lock on each side, keeps itself alive while it is woken, and moves the item twice."),
     Row("wake-raised", "Wake a sleeping queue, worker raised", measure.google("wake-raised"),
         (Goal("post to start, of mutex + deque at the same levels", of_best(("mutex+deque",), " [start]")),
          Goal("posting, of mutex + deque at the same levels", of_best(("mutex+deque",), " [posting]"))),
@@ -183,7 +186,9 @@ ROWS = (
         (Goal("time of the best peer pipeline's", of_best(PIPELINES, "/100000"), 0.5),
          Goal("time per frame", value("here/100000", 1e-3), None, "µs")),
         PIPELINE_CONDITIONS + "Receiving runs at nice -5.",
-        "The hand-overs between three threads: the figures have the context switches per frame.",
+        "How often one of the three threads sleeps, on two cores: a wake-up costs microseconds, everything "
+        "else that is done to a frame about one. The figures have the context switches per frame. The camera "
+        "sleeps in all contenders when its eight buffers are out.",
         needs_root=True),
     Row("pipeline-user", "Frames through the fault experiment at full speed, as an ordinary user",
         measure.google("pipeline", measure.WITHOUT_RAISING),

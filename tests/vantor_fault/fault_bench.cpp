@@ -1,7 +1,5 @@
 #include "tests/vantor_fault/fault_bench.h"
 
-#include <thread>
-
 #include "devices/simulator/frame_metadata.h"
 
 namespace test {
@@ -39,17 +37,6 @@ Handler handlerOf(const ZRVantorFaultExperiment& experiment, std::string_view ke
 HandFedStream::HandFedStream() {
     values.set(kRylCaptureStreamProperty_PortType, kRylCapturePortType_FrontFacingInfraredCamera);
     values.set(kRylCaptureStreamProperty_ErrorCounters, platform::Dictionary());
-}
-
-bool eventually(const std::function<bool()>& condition) {
-    const auto deadline = platform::deadlineAfter(kGenerous);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() >= deadline) {
-            return false;
-        }
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    return true;
 }
 
 platform::ErrorRef serviceError(std::string_view text) {

@@ -23,6 +23,7 @@
 #include "platform/log.h"
 #include "platform/services.h"
 #include "tests/support/capture_witness.h"
+#include "tests/support/eventually.h"
 #include "tests/support/is_error.h"
 #include "vantor_fault/fault_experiment.h"
 
@@ -31,9 +32,6 @@ namespace test {
 // Seconds that are never over within a test. What a time-out that long logs belongs to no test: in a
 // process that runs many it may appear in the log of a later one.
 inline constexpr double kLate = 20;
-
-// Whether `condition` comes true in a generous time.
-bool eventually(const std::function<bool()>& condition);
 
 // Records the log's lines, and can hold a thread in one of them.
 class LogRecorder final : public platform::LogSink {

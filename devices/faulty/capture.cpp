@@ -1,9 +1,8 @@
-#include "devices/faulty/capture.h"
-
 #include <algorithm>
 #include <utility>
 
 #include "devices/faulty/damage.h"
+#include "devices/faulty/decorators.h"
 #include "devices/observed/handlers_property.h"
 #include "devices/observed/wrapper_table.h"
 
@@ -16,7 +15,6 @@ using platform::ImageBuffer;
 using platform::ImageBufferRef;
 using platform::MediaTime;
 using platform::Value;
-using InjectorRef = std::shared_ptr<Injector>;
 using StreamsRef = std::optional<WLRylCaptureStreamList>;
 
 constexpr Way kStreamListWays[] = {Way::WithError, Way::WithoutError, Way::AbsentObject,
@@ -212,8 +210,8 @@ class FaultyPlugIn final : public WLISPCapturePlugIn {
 
 }  // namespace
 
-std::shared_ptr<WLISPCapturePlugIn> faultyCapture(std::shared_ptr<WLISPCapturePlugIn> plugIn,
-                                                  std::shared_ptr<Injector> injector) {
+std::shared_ptr<WLISPCapturePlugIn> decorateCapture(std::shared_ptr<WLISPCapturePlugIn> plugIn,
+                                                    InjectorRef injector) {
     return std::make_shared<FaultyPlugIn>(std::move(plugIn), std::move(injector));
 }
 

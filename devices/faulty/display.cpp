@@ -1,9 +1,8 @@
-#include "devices/faulty/display.h"
-
 #include <string_view>
 #include <utility>
 
 #include "devices/faulty/damage.h"
+#include "devices/faulty/decorators.h"
 
 namespace faulty {
 
@@ -15,7 +14,7 @@ constexpr int kFailedStatus = -1;
 
 class FaultyDisplay final : public platform::DisplayService {
   public:
-    FaultyDisplay(std::shared_ptr<DisplayService> inner, std::shared_ptr<Injector> injector)
+    FaultyDisplay(std::shared_ptr<DisplayService> inner, InjectorRef injector)
         : _inner(std::move(inner)), _injector(std::move(injector)) {}
 
     int mainDisplay(platform::DisplayId& display) override {
@@ -34,7 +33,7 @@ class FaultyDisplay final : public platform::DisplayService {
 
 class FaultyRegistry final : public platform::DeviceRegistry {
   public:
-    FaultyRegistry(std::shared_ptr<DeviceRegistry> inner, std::shared_ptr<Injector> injector)
+    FaultyRegistry(std::shared_ptr<DeviceRegistry> inner, InjectorRef injector)
         : _inner(std::move(inner)), _injector(std::move(injector)) {}
 
     platform::Value property(platform::RegistryObject object, std::string_view name) override {
@@ -50,13 +49,13 @@ class FaultyRegistry final : public platform::DeviceRegistry {
 
 }  // namespace
 
-std::shared_ptr<platform::DisplayService> faultyDisplay(
-    std::shared_ptr<platform::DisplayService> service, std::shared_ptr<Injector> injector) {
+std::shared_ptr<platform::DisplayService> decorateDisplay(
+    std::shared_ptr<platform::DisplayService> service, InjectorRef injector) {
     return std::make_shared<FaultyDisplay>(std::move(service), std::move(injector));
 }
 
-std::shared_ptr<platform::DeviceRegistry> faultyRegistry(
-    std::shared_ptr<platform::DeviceRegistry> registry, std::shared_ptr<Injector> injector) {
+std::shared_ptr<platform::DeviceRegistry> decorateRegistry(
+    std::shared_ptr<platform::DeviceRegistry> registry, InjectorRef injector) {
     return std::make_shared<FaultyRegistry>(std::move(registry), std::move(injector));
 }
 

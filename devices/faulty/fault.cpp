@@ -1,6 +1,7 @@
 #include "devices/faulty/fault.h"
 
-#include <utility>
+#include <cstddef>
+#include <iterator>
 
 #include "platform/text_format.h"
 
@@ -8,43 +9,20 @@ namespace faulty {
 
 namespace {
 
-std::string_view nameOf(StepKind kind) {
-    switch (kind) {
-        case StepKind::Service:
-            return "service";
-        case StepKind::Call:
-            return "call";
-        case StepKind::Frame:
-            return "frame";
-        case StepKind::Event:
-            return "event";
-        case StepKind::Report:
-            return "report";
-    }
-    return "";
-}
-
-std::string_view textOf(Way way) {
-    switch (way) {
-        case Way::WithError:
-            return "fails with an error object";
-        case Way::WithoutError:
-            return "fails without an error object";
-        case Way::AbsentObject:
-            return "yields no object";
-        case Way::AbsentValue:
-            return "yields no value";
-        case Way::Empty:
-            return "yields something empty";
-        case Way::WrongKind:
-            return "yields something of the wrong kind";
-        case Way::WrongEntries:
-            return "yields entries of the wrong kind";
-        case Way::Lost:
-            return "is lost";
-    }
-    return "";
-}
+// In the order of the enumerations.
+constexpr std::string_view kKinds[] = {"service", "call", "frame", "event", "report"};
+constexpr std::string_view kWays[] = {
+    "fails with an error object",
+    "fails without an error object",
+    "yields no object",
+    "yields no value",
+    "yields something empty",
+    "yields something of the wrong kind",
+    "yields entries of the wrong kind",
+    "is lost",
+};
+static_assert(std::size(kKinds) == static_cast<std::size_t>(StepKind::Report) + 1);
+static_assert(std::size(kWays) == static_cast<std::size_t>(Way::Lost) + 1);
 
 // 1st, 2nd, 3rd, 4th; 11th, 12th, 13th.
 std::string_view ordinalSuffix(std::uint64_t number) {
@@ -59,11 +37,12 @@ std::string_view ordinalSuffix(std::uint64_t number) {
 
 std::string Step::text() const {
     return platform::format("%lu%@ %@%@%@", place.number, ordinalSuffix(place.number),
-                            nameOf(place.kind), operation.empty() ? "" : ": ", operation);
+                            kKinds[static_cast<std::size_t>(place.kind)],
+                            operation.empty() ? "" : ": ", operation);
 }
 
 std::string Step::text(Way way) const {
-    return platform::format("%@ %@", text(), textOf(way));
+    return platform::format("%@ %@", text(), kWays[static_cast<std::size_t>(way)]);
 }
 
 }  // namespace faulty

@@ -23,12 +23,14 @@ enum class StepKind : std::uint8_t {
     Report,   // a call of an input report callback
 };
 
-// How a step fails. A call that fails or is lost does not reach the device; one that yields something does.
+// How a step fails. Step::ways names those that the step has. Of the calls that fail, only those reach the
+// device whose result is a damaged one of the device's.
 //
 //   way           what it does                                          to which steps
 //   WithError     fails, and stores an error object if there is a slot  calls with a slot; reports
-//   WithoutError  fails, and stores none                                calls with a result
-//   AbsentObject  null; a list of nulls                                 services, objects, streams(), frames
+//   WithoutError  fails, and stores none                                calls with a slot; mainDisplay()
+//   AbsentObject  null; of streams(), as many nulls as there are        services, objects, frames
+//                 streams
 //   AbsentValue   no value; samples without counts; no metadata         registry property, samples, frames
 //   Empty         a list, a dictionary or data without contents         lists, dictionaries, frames, reports
 //   WrongKind     a value of another kind; a report of another ID       values, frames, reports
@@ -55,9 +57,9 @@ struct Place {
 
 // A step that was taken.
 struct Step {
-    Place place;
-    std::string operation;      // "setValue MinimumFrameRate"; empty for a delivery
-    std::span<const Way> ways;  // in which it can fail; valid for good
+    Place place = {};
+    std::string operation = {};      // "setValue MinimumFrameRate"; empty for a delivery
+    std::span<const Way> ways = {};  // in which it can fail; valid for good
 
     // "5th call: setValue MinimumFrameRate", "2nd frame".
     std::string text() const;
@@ -67,7 +69,7 @@ struct Step {
 
 // A step that is to fail.
 struct Fault {
-    Place place;
+    Place place = {};
     Way way = Way::WithError;
 
     friend bool operator==(const Fault& a, const Fault& b) = default;

@@ -1,7 +1,6 @@
-#include "devices/faulty/hid.h"
-
 #include <utility>
 
+#include "devices/faulty/decorators.h"
 #include "devices/observed/wrapper_table.h"
 #include "platform/number.h"
 
@@ -10,7 +9,6 @@ namespace faulty {
 namespace {
 
 using platform::ErrorSlot;
-using InjectorRef = std::shared_ptr<Injector>;
 using RunLoopRef = std::shared_ptr<platform::RunLoop>;
 using HidDevices = std::vector<std::shared_ptr<WLIOHIDDeviceInterface>>;
 
@@ -135,8 +133,8 @@ class FaultyHid final : public platform::HidFacility {
 
 }  // namespace
 
-std::shared_ptr<platform::HidFacility> faultyHid(std::shared_ptr<platform::HidFacility> facility,
-                                                 std::shared_ptr<Injector> injector) {
+std::shared_ptr<platform::HidFacility> decorateHid(std::shared_ptr<platform::HidFacility> facility,
+                                                   InjectorRef injector) {
     return std::make_shared<FaultyHid>(std::move(facility), std::move(injector));
 }
 

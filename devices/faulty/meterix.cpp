@@ -1,6 +1,6 @@
-#include "devices/faulty/meterix.h"
-
 #include <utility>
+
+#include "devices/faulty/decorators.h"
 
 namespace faulty {
 
@@ -27,7 +27,7 @@ SamplesRef damaged(const SamplesRef& samples, Way way) {
 
 class FaultyMeterix final : public platform::MeterixFacility {
   public:
-    FaultyMeterix(std::shared_ptr<MeterixFacility> inner, std::shared_ptr<Injector> injector)
+    FaultyMeterix(std::shared_ptr<MeterixFacility> inner, InjectorRef injector)
         : _inner(std::move(inner)), _injector(std::move(injector)) {}
 
     ChannelsRef simpleChannels(ErrorSlot error) override {
@@ -58,8 +58,8 @@ class FaultyMeterix final : public platform::MeterixFacility {
 
 }  // namespace
 
-std::shared_ptr<platform::MeterixFacility> faultyMeterix(
-    std::shared_ptr<platform::MeterixFacility> facility, std::shared_ptr<Injector> injector) {
+std::shared_ptr<platform::MeterixFacility> decorateMeterix(
+    std::shared_ptr<platform::MeterixFacility> facility, InjectorRef injector) {
     return std::make_shared<FaultyMeterix>(std::move(facility), std::move(injector));
 }
 

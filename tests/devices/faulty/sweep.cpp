@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <thread>
 
 #include "devices/observed/capture.h"
 #include "devices/observed/observe.h"
@@ -90,7 +91,9 @@ platform::Services makeSmallDevice() {
     return simulator::makeDevice(profile, 0);
 }
 
-Sweep::Sweep() : _threads(threads()) {
+Sweep::Sweep() {
+    std::thread([] {}).join();  // a sanitizer starts a thread of its own with the first one
+    _threads = threads();
     platform::setLogSink(std::make_shared<SilentSink>(), platform::LogLevel::Debug);
 }
 

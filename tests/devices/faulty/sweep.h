@@ -49,6 +49,11 @@ struct Ending {
     platform::ErrorRef teardownError = kUntouched;
 };
 
+// Whether every run that gets there takes the step: a device sends what is asked for, and possibly more.
+inline bool isCertain(const faulty::Step& step) {
+    return step.place.kind <= faulty::StepKind::Call || step.place.number <= kAskedFor;
+}
+
 class Sweep : public ::testing::Test {
   protected:
     Sweep();

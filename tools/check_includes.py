@@ -24,6 +24,7 @@ MAY_INCLUDE = {
     "input": ["platform"],
     "devices/device": ["platform"],
     "devices/observed": ["platform"],
+    "devices/faulty": ["platform", "devices/observed/handlers_property", "devices/observed/wrapper_table"],
     "devices/simulator": ["platform", "input", "devices/device"],
     "devices/simulator/profile": ["platform", "input"],
     "host/record": ["platform"],

@@ -143,12 +143,7 @@ class ObservedDevice final : public WLRylCaptureDevice {
     bool requestControlOfStreams(const WLRylCaptureStreamList& streams, ErrorSlot error) override {
         const Call call{"requestControlOfStreams()"};
         _checkValid(call);
-        WLRylCaptureStreamList inner = streams;
-        for (auto& stream : inner) {
-            if (const auto* own = dynamic_cast<const ObservedStream*>(stream.get())) {
-                stream = own->inner();
-            }
-        }
+        const WLRylCaptureStreamList inner = unwrapped<ObservedStream>(streams);
         const bool granted = _reporter().call(call, error, [&](ErrorSlot slot) {
             return _inner->requestControlOfStreams(inner, slot);
         });

@@ -4,8 +4,8 @@
 #include <chrono>
 #include <utility>
 
+#include "devices/observed/handlers_property.h"
 #include "platform/run_tag.h"
-#include "platform/welkin/capture.h"
 
 namespace observed {
 
@@ -13,11 +13,6 @@ namespace {
 
 using platform::Value;
 using Clock = std::chrono::steady_clock;
-
-constexpr std::string_view kOutput = kRylCaptureStreamVideoOutputID_PrimaryScaler;
-constexpr std::string_view kFrameHandler =
-    kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler;
-constexpr std::string_view kEventHandler = kRylCaptureStreamVideoOutputHandlerKey_EventHandler;
 
 thread_local int handlersOnThisThread = 0;
 
@@ -57,8 +52,7 @@ class FrameHandlerCall {
     StreamWatch& _stream;
 };
 
-// These two hold the client's handler as the value that it wrote: a copy of the function would be
-// another object, with a state of its own.
+// These two hold the client's handler as the value that it wrote.
 class WatchedFrameHandler {
   public:
     WatchedFrameHandler(Value client, std::shared_ptr<StreamWatch> stream)
@@ -111,50 +105,14 @@ class WatchedEventHandler {
     platform::RunTag _run = platform::currentRunTag();
 };
 
-// The handlers property with another frame and event handler of the output, if it has those.
-template <class ReplaceFrameHandler, class ReplaceEventHandler>
-Value replaceHandlers(const Value& handlers,
-                      ReplaceFrameHandler replaceFrameHandler,
-                      ReplaceEventHandler replaceEventHandler) {
-    const platform::Dictionary* output = handlers[kOutput].dictionary();
-    if (output == nullptr) {
-        return handlers;
-    }
-    platform::MutableDictionary replaced = output->entries();
-    if (const auto* handler = (*output)[kFrameHandler].object<WLRylFrameHandler>()) {
-        replaced.set(kFrameHandler, replaceFrameHandler((*output)[kFrameHandler], *handler));
-    }
-    if (const auto* handler = (*output)[kEventHandler].object<WLRylEventHandler>()) {
-        replaced.set(kEventHandler, replaceEventHandler((*output)[kEventHandler], *handler));
-    }
-    platform::MutableDictionary outputs = handlers.dictionary()->entries();
-    outputs.set(kOutput, platform::Dictionary(std::move(replaced)));
-    return platform::Dictionary(std::move(outputs));
-}
-
-template <class Handler, class Watched>
-auto watching(const std::shared_ptr<StreamWatch>& stream) {
-    return [&stream](const Value& client, const Handler& handler) {
-        return handler ? Value::opaque(Handler(Watched(client, stream))) : client;
-    };
-}
-
-template <class Handler, class Watched>
-Value clientOf(const Value& value, const Handler& handler) {
-    const auto* watched = handler.template target<Watched>();
-    return watched != nullptr ? watched->client() : value;
-}
-
 }  // namespace
 
 Value watchHandlers(const Value& handlers, const std::shared_ptr<StreamWatch>& stream) {
-    return replaceHandlers(handlers, watching<WLRylFrameHandler, WatchedFrameHandler>(stream),
-                           watching<WLRylEventHandler, WatchedEventHandler>(stream));
+    return wrapHandlers<WatchedFrameHandler, WatchedEventHandler>(handlers, stream);
 }
 
 Value unwatchHandlers(const Value& handlers) {
-    return replaceHandlers(handlers, clientOf<WLRylFrameHandler, WatchedFrameHandler>,
-                           clientOf<WLRylEventHandler, WatchedEventHandler>);
+    return unwrapHandlers<WatchedFrameHandler, WatchedEventHandler>(handlers);
 }
 
 bool hasFrameHandler(const Value& handlers) {

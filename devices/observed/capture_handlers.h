@@ -10,7 +10,7 @@
 namespace observed {
 
 // The value of the handlers property as the device gets it: the frame and the event handler of the
-// primary scaler are wrapped. Every other entry, and what is not a handler, stays as it is.
+// primary scaler are watched.
 platform::Value watchHandlers(const platform::Value& handlers,
                               const std::shared_ptr<StreamWatch>& stream);
 

@@ -62,6 +62,17 @@ class WrapperTable {
     std::vector<Entry> _entries ZR_GUARDED_BY(_mutex);
 };
 
+// The objects with those behind the wrappers among them, each a Wrapper with inner(), in their place.
+template <class Wrapper, class Object>
+std::vector<std::shared_ptr<Object>> unwrapped(std::vector<std::shared_ptr<Object>> objects) {
+    for (auto& object : objects) {
+        if (const auto* wrapper = dynamic_cast<const Wrapper*>(object.get())) {
+            object = wrapper->inner();
+        }
+    }
+    return objects;
+}
+
 }  // namespace observed
 
 #endif

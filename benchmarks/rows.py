@@ -17,6 +17,7 @@ STANDARD_MAPS = ("std::map", "std::unordered_map")
 PIPELINES = ("mutex+deque", "asio io_context", "moodycamel (lock-free)")
 
 USERS = ("here", "ordinary user")  # "here": the user who runs the benchmarks
+REPEATS = 5
 FRAMES = (25_000, 50_000, 100_000)
 IMAGES = (2500, 5000, 10_000)
 
@@ -56,6 +57,7 @@ class Row:
     unit: str = "ns"  # of the contenders' values
     curves: tuple = ()
     needs_root: bool = False
+    repeats: int = REPEATS  # how often the row is sampled
 
 
 def over(numerator, denominator):
@@ -88,7 +90,8 @@ PIPELINE_CONDITIONS = (
 def report_row(name, title, experiment, parameter, sizes, more=()):
     last, first = sizes[-1], sizes[0]
     judged = []
-    for form in ("html", "json", "jsonl"):
+    forms = measure.FORMS[1:]
+    for form in forms:
         judged += [
             Goal(f"{form}: seconds at {last:,}", value(f"{form}/{last} [seconds]"), 5, "s"),
             Goal(f"{form}: peak memory at {last:,}", value(f"{form}/{last} [megabytes]"), 200, "MB"),
@@ -97,11 +100,11 @@ def report_row(name, title, experiment, parameter, sizes, more=()):
         ]
     judged.append(Goal(f"jsonl: peak memory at {last:,} of the text form's",
                        growth(f"jsonl/{last} [megabytes]", f"text/{last} [megabytes]"), 1.03))
-    forms = ("html", "json", "jsonl")
     return Row(
         name, title, measure.report(experiment, parameter, sizes), (*judged, *more),
-        "Whole zrlab sessions with --speed max and --log off; the report goes to a file. Time is CPU time "
-        "beyond the same session with the text form, peak memory is the whole process's.",
+        "Whole zrlab sessions with --speed max and --log off; the report goes to a file. The four forms' sessions "
+        "run side by side, each paced by its device. Time is CPU time beyond the same session with the text form, "
+        "peak memory is the whole process's.",
         "HTML and JSON are made at the session's end from the record, which holds every item; jsonl is "
         "written as the session goes on.",
         curves=(
@@ -233,10 +236,11 @@ ROWS = (
     Row("memory-runs", "Memory of a session by its number of runs", measure.memory_of_runs,
         (Goal("100,000 runs of 1,000", growth("here/100000", "here/1000"), 1.03),),
         "Peak memory of zrlab run VantorFaultDiagnostic --repeat N, five frames per run, --speed max; the "
-        "time-out of 0.1 s is well below what 1,000 runs take.",
+        "time-out of 0.1 s is well below what 1,000 runs take. The median of five sessions of 1,000 runs beside one "
+        "of each longer series, once: 100,000 runs take minutes.",
         "A pending time-out keeps its experiment until it has passed: a tenth of a second of runs is "
         "alive at once.",
-        unit="MB",
+        unit="MB", repeats=1,
         curves=(Curve("memory-runs.svg", "Peak memory of a session", "runs", "MB", "{series}/{size}", ("here",),
                       (1000, 10_000, 100_000)),)),
     report_row("report-frames", "Report of a run of frames", "VantorFaultDiagnostic", "frameCount", FRAMES,

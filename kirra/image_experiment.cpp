@@ -1,5 +1,7 @@
 #include "kirra/image_experiment.h"
 
+#include <algorithm>
+#include <cstdint>
 #include <new>
 #include <optional>
 #include <string>
@@ -14,6 +16,8 @@ namespace {
 constexpr std::string_view kImages = "images";
 constexpr std::string_view kTimeout = "timeout";
 constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
+// Room for so many images is made beforehand; a list that grows is copied again and again.
+constexpr std::uint64_t kMostExpected = 16'384;
 constexpr std::string_view kNoRunLoop = "Kirra is a HID device that requires a current run loop.";
 
 // Why the display does not count as powered; empty when it does.
@@ -109,6 +113,7 @@ ZRExperimentResultRef ZRKirraImageExperiment::run(platform::ErrorSlot error) {
     } catch (const std::bad_alloc&) {
         return platform::fail(error, kDomain, 3, nullptr, "Failed to create kirra stream.");
     }
+    _images.reserve(std::min(_imagesToCapture, kMostExpected));
     _stream->setDelegate(shared_from_this());
     if (!_stream->openWithRunLoop(runLoop, error)) {
         return nullptr;

@@ -10,6 +10,7 @@
 
 #include <algorithm>
 #include <bit>
+#include <concepts>
 #include <cstddef>
 #include <cstdint>
 #include <iterator>
@@ -55,12 +56,21 @@ class StringMap {
     }
     void reserve(std::size_t entries) { reserve(entries, entries * kUsualKeySize); }
 
-    // Stores `value` under `key`; a value already there is replaced.
-    void set(const StringKey& key, T value) {
+    // Stores `value`, or what T makes of it, under `key`; a value already there is replaced. Both may be
+    // parts of this map.
+    template <std::convertible_to<T> U = T>
+    void set(const StringKey& key, U&& value) {
         if (Stored* stored = _find(key)) {
-            stored->value = std::move(value);
+            stored->value = T(std::forward<U>(value));
+        } else if (_size < _block.capacity &&
+                   key.text().size() <= _block.keysCapacity - _keysSize) {
+            _place(key.text(), std::forward<U>(value));
+            _enter(key.hash(), _size);
         } else {
-            _append(key, std::move(value));
+            T made(std::forward<U>(value));  // before what it may be part of moves
+            const Block before = _grow(key.text().size());
+            _place(key.text(), std::move(made));
+            _enter(key.hash(), _size);
         }
     }
 
@@ -109,8 +119,8 @@ class StringMap {
     // An entry; its key is in the block's keys.
     struct Stored {
         T value;
-        std::size_t keyAt;
-        std::size_t keySize;
+        std::uint32_t keyAt;
+        std::uint32_t keySize;
     };
 
     // Where the entry of a hash lies: one past its place, 0 in a free slot. An entry that finds its slot
@@ -127,7 +137,7 @@ class StringMap {
             : capacity(entryCount), keysCapacity(keyBytes) {
             static_assert(alignof(Stored) <= __STDCPP_DEFAULT_NEW_ALIGNMENT__ &&
                           sizeof(Stored) % alignof(Slot) == 0);
-            if (entryCount >= std::numeric_limits<std::uint32_t>::max()) {
+            if (std::max(entryCount, keyBytes) >= std::numeric_limits<std::uint32_t>::max()) {
                 throw std::bad_alloc();
             }
             slotCount = std::bit_ceil(entryCount + entryCount / 2 + 1);
@@ -168,18 +178,12 @@ class StringMap {
         }
     }
 
-    // `key` is not in the map. It may be a view of a key that was.
-    void _append(const StringKey& key, T&& value) {
-        const std::size_t keySize = key.text().size();
-        Block before;
-        if (_size == _block.capacity || keySize > _block.keysCapacity - _keysSize) {
-            const std::size_t capacity =
-                _size < _block.capacity ? _block.capacity : _nextCapacity();
-            before = _moveTo(capacity,
-                             std::max(2 * (_liveKeysSize() + keySize), capacity * kUsualKeySize));
-        }
-        _place(key.text(), std::move(value));
-        _enter(key.hash(), _size);
+    // Makes room for another entry with a key of that size. Returns the old block, which the key may be a
+    // view of.
+    Block _grow(std::size_t keySize) {
+        const std::size_t capacity = _size < _block.capacity ? _block.capacity : _nextCapacity();
+        return _moveTo(capacity,
+                       std::max(2 * (_liveKeysSize() + keySize), capacity * kUsualKeySize));
     }
 
     // A small map quadruples: a dictionary of some thirty keys moves its entries once.
@@ -188,10 +192,12 @@ class StringMap {
     }
 
     // Stores an entry that has room, but does not enter it in the index.
-    void _place(std::string_view key, T&& value) {
+    template <class U>
+    void _place(std::string_view key, U&& value) {
         std::copy_n(key.data(), key.size(), _block.keys + _keysSize);
         ::new (static_cast<void*>(_block.entries + _size))
-            Stored{std::move(value), _keysSize, key.size()};
+            Stored{T(std::forward<U>(value)), static_cast<std::uint32_t>(_keysSize),
+                   static_cast<std::uint32_t>(key.size())};
         _keysSize += key.size();
         ++_size;
     }

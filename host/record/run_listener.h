@@ -2,13 +2,17 @@
 #ifndef ZR_HOST_RECORD_RUN_LISTENER_H
 #define ZR_HOST_RECORD_RUN_LISTENER_H
 
+#include <span>
+
 #include "host/record/run_record.h"
 
 namespace host {
 
 // Called by one thread at a time: the session's, or the run's own between runStarted() and runEnded(). Except
 // logged(), which any thread may call, several at once, also after sessionEnded(): a time-out may outlive its
-// run, and its line is then marked as late. A record holds everything known so far.
+// run, and its line is then marked as late. And except framesDelivered(), which comes on a thread of its own
+// before the experiment's partEnded(), or before runEnded() when the part does not end. A record holds
+// everything known so far.
 class RunListener {
   public:
     virtual ~RunListener() = default;
@@ -18,6 +22,8 @@ class RunListener {
     // A part begins: its name, summary and parameters are known.
     virtual void partStarted(const RunRecord& /*run*/, Part /*part*/) {}
     virtual void logged(const LogRecord& /*line*/) {}
+    // The next frames of the run. Called when a report asks for frames and writes as the session goes on.
+    virtual void framesDelivered(std::span<const FrameRecord> /*frames*/) {}
     // A part has ended: its measurements or results, and its failures, are in the record.
     virtual void partEnded(const RunRecord& /*run*/, Part /*part*/) {}
     // The verdict is known.

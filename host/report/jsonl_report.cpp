@@ -2,9 +2,11 @@
 
 #include <chrono>
 #include <functional>
+#include <iterator>
 #include <optional>
 #include <vector>
 
+#include <fmt/compile.h>
 #include <fmt/format.h>
 #include <nlohmann/json.hpp>
 
@@ -121,12 +123,9 @@ Json errorOf(const std::string& symptom, const std::string& message) {
             {"softwareInfoIds", Json::array({kSoftwareId})}};
 }
 
-// When the frame was delivered.
-platform::Date timeOf(const FrameRecord& frame, const RunRecord& run) {
-    const std::chrono::duration<double> sinceStart(frame.delivered);
-    return platform::Date(
-        run.started.moment() +
-        std::chrono::duration_cast<std::chrono::system_clock::duration>(sinceStart));
+// Text that is not UTF-8 (it may come from a device) must not stop the report.
+std::string textOf(const Json& value) {
+    return value.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
 // A quantity of the frames that is written as a series; `value` is absent where a frame lacks it.
@@ -136,25 +135,28 @@ struct FrameSeries {
     std::function<std::optional<double>(const FrameRecord& frame, const FrameRecord* before)> value;
 };
 
-std::vector<FrameSeries> frameSeries() {
+const std::vector<FrameSeries>& frameSeries() {
     const auto interval = [](double FrameRecord::*clock) {
         return [clock](const FrameRecord& frame, const FrameRecord* before) {
             return before != nullptr ? std::optional((frame.*clock - before->*clock) * 1000)
                                      : std::nullopt;
         };
     };
-    std::vector<FrameSeries> all = {
-        {"frame interval, device's clock", "ms", interval(&FrameRecord::presentation)},
-        {"frame interval, arrival", "ms", interval(&FrameRecord::delivered)},
-        {"light source", "",
-         [](const FrameRecord& frame, const FrameRecord*) { return frame.lightSource; }}};
-    for (std::size_t at = 0; at < kTemperatureCount; ++at) {
-        all.push_back({std::string(kTemperatures[at].key), "",
-                       [at](const FrameRecord& frame, const FrameRecord*) {
-                           return frame.temperatures[at];
-                       }});
-    }
-    return all;
+    static const std::vector<FrameSeries> kAll = [&interval] {
+        std::vector<FrameSeries> all = {
+            {"frame interval, device's clock", "ms", interval(&FrameRecord::presentation)},
+            {"frame interval, arrival", "ms", interval(&FrameRecord::delivered)},
+            {"light source", "",
+             [](const FrameRecord& frame, const FrameRecord*) { return frame.lightSource; }}};
+        for (std::size_t at = 0; at < kTemperatureCount; ++at) {
+            all.push_back({std::string(kTemperatures[at].key), "",
+                           [at](const FrameRecord& frame, const FrameRecord*) {
+                               return frame.temperatures[at];
+                           }});
+        }
+        return all;
+    }();
+    return kAll;
 }
 
 }  // namespace
@@ -168,8 +170,9 @@ void JsonlReport::sessionStarted(const SessionRecord& session) {
                                {"dutInfo", deviceOf(session)}});
 }
 
-void JsonlReport::runStarted(const RunRecord& /*run*/) {
+void JsonlReport::runStarted(const RunRecord& run) {
     const platform::MutexLock lock(_mutex);
+    _runStarted = run.started;
     _failuresWritten = 0;
 }
 
@@ -178,6 +181,12 @@ void JsonlReport::partStarted(const RunRecord& run, Part part) {
     _closeStep();
     _part = part;
     _step = fmt::format("{}-{}-{}-{}", _steps++, run.plan.name, run.number, partText(part));
+    if (part == Part::Experiment) {
+        _stepText = textOf(_step);
+        _firstSeries += _seriesLengths.size();
+        _seriesLengths.assign(frameSeries().size(), 0);
+        _lastFrame.reset();
+    }
     _writeStep("testStepStart", {{"name", partOf(run, part).name}});
 }
 
@@ -218,7 +227,7 @@ void JsonlReport::_writePart(const RunRecord& run, Part part) {
                              content.is_object() ? std::move(content) : Json{{"value", content}}}});
             }
         }
-        _writeFrames(run);
+        _endFrames(run);
     } else {
         for (const ResultRecord& one : run.results) {
             Json measurement = measurementOf(one.name, one.value, one.unit);
@@ -273,8 +282,8 @@ void JsonlReport::_write(std::string_view kind, Json artifact) {
     Json line{{"sequenceNumber", _sequenceNumber++},
               {"timestamp", platform::Date::now().timestamp()}};
     line[kind] = std::move(artifact);
-    // Text that is not UTF-8 (it may come from a device) must not stop the report.
-    _sink(line.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n");
+    _unwritten += textOf(line) + "\n";
+    _flush();
 }
 
 void JsonlReport::_writeRun(std::string_view kind, Json content) {
@@ -305,7 +314,7 @@ void JsonlReport::_writeFailures(const RunRecord& run) {
     }
 }
 
-void JsonlReport::_writeFrames(const RunRecord& run) {
+void JsonlReport::_endFrames(const RunRecord& run) {
     if (run.framesDelivered > 0) {
         Json content{{"delivered", run.framesDelivered}};
         if (run.framesLost.has_value()) {
@@ -313,39 +322,72 @@ void JsonlReport::_writeFrames(const RunRecord& run) {
         }
         _writeStep("extension", {{"name", "frames"}, {"content", std::move(content)}});
     }
-    for (const FrameSeries& one : frameSeries()) {
-        const std::string id = fmt::format("series-{}", _series++);
-        std::uint64_t count = 0;
-        const FrameRecord* before = nullptr;
-        for (const FrameRecord& frame : run.frames) {
-            const std::optional<double> value = one.value(frame, before);
-            before = &frame;
-            if (!value.has_value()) {
-                continue;
-            }
-            if (count == 0) {
-                Json start{{"name", one.name}, {"measurementSeriesId", id}};
-                if (!one.unit.empty()) {
-                    start["unit"] = one.unit;
-                }
-                start["hardwareInfoId"] = kHardwareId;
-                _writeStep("measurementSeriesStart", std::move(start));
-            }
-            Json element{{"index", count++},
-                         {"value", jsonOf(*value)},
-                         {"timestamp", timeOf(frame, run).timestamp()},
-                         {"measurementSeriesId", id},
-                         {"metadata", {{"frame", frame.number}}}};
-            if (isNumberedApart(frame)) {
-                element["metadata"]["sensorFrame"] = *frame.sensorNumber;
-            }
-            _writeStep("measurementSeriesElement", std::move(element));
-        }
-        if (count > 0) {
-            _writeStep("measurementSeriesEnd",
-                       {{"measurementSeriesId", id}, {"totalCount", count}});
+    for (std::size_t at = 0; at < _seriesLengths.size(); ++at) {
+        if (_seriesLengths[at] > 0) {
+            _writeStep("measurementSeriesEnd", {{"measurementSeriesId", _seriesId(at)},
+                                                {"totalCount", _seriesLengths[at]}});
         }
     }
+}
+
+void JsonlReport::framesDelivered(std::span<const FrameRecord> frames) {
+    const platform::MutexLock lock(_mutex);
+    if (_part != Part::Experiment) {
+        return;
+    }
+    for (const FrameRecord& frame : frames) {
+        _writeFrame(frame);
+        _flush();
+        _lastFrame = frame;
+    }
+}
+
+// There are ten lines per frame, so they are made without a tree of values, and written together.
+void JsonlReport::_writeFrame(const FrameRecord& frame) {
+    const std::string now = platform::Date::now().timestamp();
+    const std::chrono::duration<double> sinceStart(frame.delivered);
+    const std::string delivered =
+        platform::Date(_runStarted.moment() +
+                       std::chrono::duration_cast<std::chrono::system_clock::duration>(sinceStart))
+            .timestamp();
+    std::string metadata = fmt::format(R"({{"frame":{})", frame.number);
+    if (isNumberedApart(frame)) {
+        metadata += fmt::format(R"(,"sensorFrame":{})", *frame.sensorNumber);
+    }
+    const std::vector<FrameSeries>& all = frameSeries();
+    for (std::size_t at = 0; at < all.size(); ++at) {
+        const FrameSeries& one = all[at];
+        const std::optional<double> value =
+            one.value(frame, _lastFrame.has_value() ? &*_lastFrame : nullptr);
+        if (!value.has_value()) {
+            continue;
+        }
+        if (_seriesLengths[at] == 0) {
+            Json start{{"name", one.name}, {"measurementSeriesId", _seriesId(at)}};
+            if (!one.unit.empty()) {
+                start["unit"] = one.unit;
+            }
+            start["hardwareInfoId"] = kHardwareId;
+            _writeStep("measurementSeriesStart", std::move(start));
+        }
+        fmt::format_to(
+            std::back_inserter(_unwritten),
+            FMT_COMPILE(
+                R"({{"sequenceNumber":{},"timestamp":"{}","testStepArtifact":{{"testStepId":{},)"
+                R"("measurementSeriesElement":{{"index":{},"value":{},"timestamp":"{}",)"
+                R"("measurementSeriesId":"{}","metadata":{}}}}}}}}}{})"),
+            _sequenceNumber++, now, _stepText, _seriesLengths[at]++, textOf(jsonOf(*value)),
+            delivered, _seriesId(at), metadata, '\n');
+    }
+}
+
+std::string JsonlReport::_seriesId(std::size_t at) const {
+    return fmt::format("series-{}", _firstSeries + at);
+}
+
+void JsonlReport::_flush() {
+    _sink(_unwritten);
+    _unwritten.clear();
 }
 
 void JsonlReport::_closeStep() {

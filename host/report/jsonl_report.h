@@ -6,7 +6,8 @@
 //   testRunStart   the planned runs with their parameters, the device as the unit under test
 //   measurement    in an experiment's step what it measured; in an analysis's step each judged result
 //                  with its limit as validators, which carry the limit's name
-//   measurementSeries…  in the experiment's step one series per quantity of the frames that the page draws
+//   measurementSeries…  in the experiment's step one series per quantity of the frames that the page draws,
+//                  side by side, some frames at a time
 //   extension      one for each element of a list in the experiment's auxiliary data ("images"); one with
 //                  the counts of frames delivered and lost ("frames")
 //   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
@@ -24,9 +25,11 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 #include <nlohmann/json_fwd.hpp>
 
@@ -38,8 +41,8 @@ namespace host {
 
 class JsonlReport final : public RunListener {
   public:
-    // `sink` takes one whole line, its line end included. It is called on the thread that makes the
-    // line, one call at a time, with this report's lock held: it must not log.
+    // `sink` takes one or more whole lines, their line ends included. It is called on the thread that
+    // makes them, one call at a time, with this report's lock held: it must not log.
     explicit JsonlReport(ReportSink sink) : _sink(std::move(sink)) {}
 
     void sessionStarted(const SessionRecord& session) override;
@@ -47,6 +50,7 @@ class JsonlReport final : public RunListener {
     void partStarted(const RunRecord& run, Part part) override;
     // A line that comes after the session's end is dropped: nothing may follow the run's end.
     void logged(const LogRecord& line) override;
+    void framesDelivered(std::span<const FrameRecord> frames) override;
     void partEnded(const RunRecord& run, Part part) override;
     void runEnded(const RunRecord& run) override;
     void sessionEnded(const SessionRecord& session) override;
@@ -61,22 +65,35 @@ class JsonlReport final : public RunListener {
     void _writeHere(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
     // What the part has found, and its failures.
     void _writePart(const RunRecord& run, Part part) ZR_REQUIRES(_mutex);
-    void _writeFrames(const RunRecord& run) ZR_REQUIRES(_mutex);
+    // The frame's elements, not yet to the sink.
+    void _writeFrame(const FrameRecord& frame) ZR_REQUIRES(_mutex);
+    // Their counts, and the end of their series.
+    void _endFrames(const RunRecord& run) ZR_REQUIRES(_mutex);
+    std::string _seriesId(std::size_t at) const ZR_REQUIRES(_mutex);
     void _writeFailures(const RunRecord& run) ZR_REQUIRES(_mutex);
     void _closeStep() ZR_REQUIRES(_mutex);
+    // Hands the lines made so far to the sink.
+    void _flush() ZR_REQUIRES(_mutex);
 
     const ReportSink _sink;
 
     platform::Mutex _mutex;
     std::uint64_t _sequenceNumber ZR_GUARDED_BY(_mutex) = 0;
     std::uint64_t _steps ZR_GUARDED_BY(_mutex) = 0;
-    std::uint64_t _series ZR_GUARDED_BY(_mutex) = 0;
+    std::string _unwritten ZR_GUARDED_BY(_mutex);  // lines on their way to the sink
     // The step that is open; empty when none is. It stays open until the next one begins or the
     // verdict is known: a diagnosis can only be written in a step.
     std::string _step ZR_GUARDED_BY(_mutex);
     bool _stepFailed ZR_GUARDED_BY(_mutex) = false;
     // The part that has started and not ended.
     std::optional<Part> _part ZR_GUARDED_BY(_mutex);
+    platform::Date _runStarted ZR_GUARDED_BY(_mutex) = platform::Date::now();
+    // Of the frames of the run's experiment: its step as JSON text, the number of its first series, the
+    // elements in each series so far, and the last frame written.
+    std::string _stepText ZR_GUARDED_BY(_mutex);
+    std::uint64_t _firstSeries ZR_GUARDED_BY(_mutex) = 0;
+    std::vector<std::uint64_t> _seriesLengths ZR_GUARDED_BY(_mutex);
+    std::optional<FrameRecord> _lastFrame ZR_GUARDED_BY(_mutex);
     std::size_t _failuresWritten ZR_GUARDED_BY(_mutex) = 0;
     bool _ended ZR_GUARDED_BY(_mutex) = false;
 };

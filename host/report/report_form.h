@@ -44,7 +44,8 @@ struct ReportForm {
     std::string_view name;
     std::string_view ending;  // of a file in this form, with its dot
     bool streams;             // writes as the session goes on, else once at its end
-    bool showsFrames;         // needs RunRecord::frames
+    // Needs the frames: as they come when it writes as the session goes on, else RunRecord::frames.
+    bool showsFrames;
     OpenReport open;
 };
 

@@ -17,6 +17,12 @@ constexpr std::size_t kMostLines = 5000;
 // A rule that is broken at every frame is known well enough after these.
 constexpr std::size_t kMostMisuses = 50;
 
+// How many frames are handed on at a time, how often that may be behind, and for how long the device's thread
+// then waits: less than a camera's interval between two frames.
+constexpr std::size_t kFramesAtOnce = 32;
+constexpr std::size_t kMostQueued = 8;
+constexpr std::chrono::milliseconds kPatience(20);
+
 std::optional<double> numberOf(const platform::Dictionary& metadata, std::string_view key) {
     const platform::Number* number = metadata[key].number();
     return number != nullptr ? std::optional(number->asDouble()) : std::nullopt;
@@ -24,8 +30,21 @@ std::optional<double> numberOf(const platform::Dictionary& metadata, std::string
 
 }  // namespace
 
-RunRecorder::RunRecorder(std::function<void(const LogRecord&)> lineLogged, bool keepFrames)
-    : _lineLogged(std::move(lineLogged)), _keepFrames(keepFrames) {}
+RunRecorder::RunRecorder(std::function<void(const LogRecord&)> lineLogged,
+                         bool keepFrames,
+                         FramesDelivered framesDelivered)
+    : _lineLogged(std::move(lineLogged))
+    , _keepFrames(keepFrames)
+    , _framesDelivered(std::move(framesDelivered)) {
+    if (_framesDelivered) {
+        _hold.emplace(_queue);
+    }
+}
+
+RunRecorder::~RunRecorder() {
+    const platform::MutexLock lock(_mutex);
+    _awaitHandedOn();
+}
 
 platform::RunTag RunRecorder::begin() {
     _frameCount = 0;
@@ -33,6 +52,7 @@ platform::RunTag RunRecorder::begin() {
     const platform::MutexLock lock(_mutex);
     _began = std::chrono::steady_clock::now();
     _frames.clear();
+    _toHandOn.clear();
     _lostFrames = {};
     _current = ++_last;
     return _last;
@@ -40,6 +60,8 @@ platform::RunTag RunRecorder::begin() {
 
 void RunRecorder::takeFrames(RunRecord& run) {
     const platform::MutexLock lock(_mutex);
+    _handOn();
+    _awaitHandedOn();
     run.framesDelivered = _frameCount;
     run.framesLost = _lostFrames.count();
     run.imagesDelivered = _imageCount;
@@ -55,6 +77,7 @@ void RunRecorder::end(RunRecord& run) {
     takeFrames(run);
     const platform::MutexLock lock(_mutex);
     _current = 0;
+    _awaitHandedOn();  // of what came since: nothing comes between two runs
     run.tag = _last;
     run.log = std::exchange(_log, {});
     if (_linesLeftOut > 0) {
@@ -108,7 +131,7 @@ void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
                        .delivered = 0,
                        .lightSource = std::nullopt,
                        .temperatures = {}};
-    if (_keepFrames) {
+    if (_keepFrames || _framesDelivered) {
         record.lightSource = numberOf(frame.metadata, kLightSource);
         std::transform(std::begin(kTemperatures), std::end(kTemperatures),
                        record.temperatures.begin(), [&frame](const TemperatureEntry& entry) {
@@ -117,9 +140,39 @@ void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
     }
     const platform::MutexLock lock(_mutex);
     _lostFrames.before(record.sensorNumber);
+    record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
     if (_keepFrames) {
-        record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
         _frames.push_back(record);
+    }
+    if (_framesDelivered) {
+        _toHandOn.reserve(kFramesAtOnce);
+        _toHandOn.push_back(record);
+        if (_toHandOn.size() >= kFramesAtOnce) {
+            const auto deadline = std::chrono::steady_clock::now() + kPatience;
+            while (_queued >= kMostQueued && std::chrono::steady_clock::now() < deadline) {
+                _handedOn.waitUntil(_mutex, deadline);
+            }
+            _handOn();
+        }
+    }
+}
+
+void RunRecorder::_handOn() {
+    if (_toHandOn.empty()) {
+        return;
+    }
+    ++_queued;
+    _queue.async([this, frames = std::exchange(_toHandOn, {})] {
+        _framesDelivered(frames);
+        const platform::MutexLock lock(_mutex);
+        --_queued;
+        _handedOn.notifyAll();
+    });
+}
+
+void RunRecorder::_awaitHandedOn() {
+    while (_queued > 0) {
+        _handedOn.wait(_mutex);
     }
 }
 

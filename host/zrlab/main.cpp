@@ -4,6 +4,8 @@
 #include <string>
 #include <string_view>
 
+#include <malloc.h>
+
 #include <fmt/format.h>
 
 #include "frame/host_interface.h"
@@ -27,6 +29,11 @@ namespace {
 // The command of the completion scripts. It is not a part of the command line: the words behind it can
 // be anything.
 constexpr std::string_view kComplete = "complete";
+
+// A thread that finds the C library's allocator busy gets an arena of its own, up to eight per core, which is
+// never given back. Every run has new threads, so without a bound the memory of a long series grows with
+// their luck.
+constexpr int kMostArenas = 2;
 
 int print(std::string_view text) {
     if (!Terminal::shared().output(text)) {
@@ -147,6 +154,7 @@ int main(int count, char** arguments) {
         host::Terminal::shared().complain(problem);
         return status;
     };
+    mallopt(M_ARENA_MAX, host::kMostArenas);
     try {
         return host::run(count, arguments);
     } catch (const host::Problem& problem) {

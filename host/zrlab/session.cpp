@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <span>
 #include <stop_token>
 #include <string>
 #include <string_view>
@@ -84,7 +85,16 @@ class Session {
                 report->logged(line);
             }
         };
-        _recorder = std::make_shared<RunRecorder>(lineLogged, _reports->showFrames());
+        RunRecorder::FramesDelivered framesDelivered;
+        if (_reports->followFrames()) {
+            framesDelivered = [reports = _reports](std::span<const FrameRecord> frames) {
+                for (const auto& report : reports->listeners()) {
+                    report->framesDelivered(frames);
+                }
+            };
+        }
+        _recorder = std::make_shared<RunRecorder>(lineLogged, _reports->keepFrames(),
+                                                  std::move(framesDelivered));
         platform::setLogSink(_recorder, log.minimum);
         platform::installServices(observed::observe(std::move(device.services), _recorder));
     }

@@ -25,7 +25,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
                 }
             },
             style));
-        _showFrames = format.showsFrames;
+        _noteFrames(format);
     } else {
         const ReportForm* meant = reportFormOf(options.output);
         if (meant != nullptr && meant != &format) {
@@ -58,7 +58,12 @@ SessionReports::SessionReports(const SessionOptions& options) {
 
 void SessionReports::_addFile(const std::string& path, const ReportForm& form) {
     _files.push_back({path, &form, nullptr});
-    _showFrames = _showFrames || form.showsFrames;
+    _noteFrames(form);
+}
+
+void SessionReports::_noteFrames(const ReportForm& form) {
+    _followFrames = _followFrames || (form.showsFrames && form.streams);
+    _keepFrames = _keepFrames || (form.showsFrames && !form.streams);
 }
 
 // Two reports in one file, or a report over the file that describes the device.

@@ -33,8 +33,9 @@ class SessionReports {
     // The reports, in the order in which they were asked for.
     const std::vector<std::shared_ptr<RunListener>>& listeners() const { return _listeners; }
 
-    // Whether one of them shows frames.
-    bool showFrames() const { return _showFrames; }
+    // Whether one of them shows frames as they come, and whether one needs the frames of a whole run.
+    bool followFrames() const { return _followFrames; }
+    bool keepFrames() const { return _keepFrames; }
 
     // Whether standard output takes no more: its reader has gone.
     bool outputFailed() const { return _outputFailed; }
@@ -51,12 +52,14 @@ class SessionReports {
         std::shared_ptr<OutputFile> content;
     };
 
+    void _noteFrames(const ReportForm& form);
     void _addFile(const std::string& path, const ReportForm& form);
     void _refuseClashes(const std::string& device) const;
 
     std::vector<File> _files;
     std::vector<std::shared_ptr<RunListener>> _listeners;
-    bool _showFrames = false;
+    bool _followFrames = false;
+    bool _keepFrames = false;
     // Set by the thread that makes a line, read by the session's.
     std::atomic<bool> _outputFailed{false};
 };

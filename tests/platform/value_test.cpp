@@ -198,6 +198,21 @@ TEST(StringMap, HoldsWhatATreeHolds) {
     }
 }
 
+// A map that grows moves what its keys and values are read from.
+TEST(StringMap, TakesAPartOfItselfAsItGrows) {
+    platform::StringMap<std::string> map;
+    map.set(std::string(200, 'k'), std::string(30, 'v'));
+    for (int more = 1; more < 200; ++more) {
+        const auto [key, value] = *map.begin();  // the shortest key
+        map.set(key.substr(1), value);
+    }
+    EXPECT_EQ(map.size(), 200U);
+    for (const auto& [key, value] : map) {
+        EXPECT_EQ(key, std::string(key.size(), 'k'));
+        EXPECT_EQ(value, std::string(30, 'v'));
+    }
+}
+
 TEST(StringKey, HasOneHashAtCompileTimeAndAtRunTime) {
     constexpr platform::StringKey kKeys[] = {"",         "a",         "1234567",
                                              "12345678", "123456789", "\xC3\xA9 345678901234567"};

@@ -2,6 +2,7 @@
 
 #include <latch>
 #include <map>
+#include <sstream>
 #include <string>
 #include <thread>
 #include <vector>
@@ -19,14 +20,17 @@ using Json = nlohmann::json;
 // number and time.
 std::vector<Json> artifactsOf(const host::SessionRecord& session) {
     std::vector<Json> artifacts;
-    host::JsonlReport report([&artifacts](std::string_view line) {
-        EXPECT_EQ(line.find('\n'), line.size() - 1);
-        Json artifact = Json::parse(line);
-        EXPECT_EQ(artifact["sequenceNumber"], artifacts.size());
-        EXPECT_EQ(artifact["timestamp"].get<std::string>().back(), 'Z');
-        artifact.erase("sequenceNumber");
-        artifact.erase("timestamp");
-        artifacts.push_back(std::move(artifact));
+    host::JsonlReport report([&artifacts](std::string_view lines) {
+        EXPECT_EQ(lines.back(), '\n');
+        std::istringstream whole{std::string(lines)};
+        for (std::string line; std::getline(whole, line);) {
+            Json artifact = Json::parse(line);
+            EXPECT_EQ(artifact["sequenceNumber"], artifacts.size());
+            EXPECT_EQ(artifact["timestamp"].get<std::string>().back(), 'Z');
+            artifact.erase("sequenceNumber");
+            artifact.erase("timestamp");
+            artifacts.push_back(std::move(artifact));
+        }
     });
     test::play(session, report);
     return artifacts;
@@ -184,7 +188,12 @@ TEST(JsonlReport, KeepsLinesWholeWhateverThreadLogs) {
     constexpr int kThreads = 4;
     constexpr int kLines = 500;
     std::vector<std::string> lines;
-    host::JsonlReport report([&lines](std::string_view line) { lines.emplace_back(line); });
+    host::JsonlReport report([&lines](std::string_view some) {
+        std::istringstream whole{std::string(some)};
+        for (std::string line; std::getline(whole, line);) {
+            lines.push_back(std::move(line));
+        }
+    });
     const host::LogRecord line{platform::Date::now(), platform::LogLevel::Default, "line"};
     report.logged(line);
     {

@@ -10,6 +10,7 @@
 #include <limits>
 #include <memory>
 #include <optional>
+#include <span>
 
 #include <gtest/gtest.h>
 
@@ -250,6 +251,12 @@ void play(const SessionRecord& session, host::RunListener& listener) {
         listener.partStarted(run, host::Part::Experiment);
         for (const host::LogRecord& line : run.log) {
             listener.logged(line);
+        }
+        // Some at a time, as they come.
+        for (std::size_t at = 0; at < run.frames.size(); at += 32) {
+            listener.framesDelivered(
+                std::span(run.frames)
+                    .subspan(at, std::min<std::size_t>(32, run.frames.size() - at)));
         }
         tell(host::Part::Experiment, false);
         // What was given up does not end its part.

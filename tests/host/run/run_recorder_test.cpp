@@ -1,10 +1,22 @@
 #include "host/run/run_recorder.h"
 
+#include <latch>
+#include <numeric>
+#include <span>
+#include <vector>
+
 #include <gtest/gtest.h>
 
 namespace {
 
 using platform::Value;
+
+observed::DeliveredFrame frameNumbered(std::uint64_t number, const Value& sensorNumber) {
+    return {.number = number,
+            .time = platform::MediaTime(),
+            .delivered = std::chrono::steady_clock::now(),
+            .metadata = {{"FrameNumber", sensorNumber}}};
+}
 
 TEST(RunRecorder, CountsFramesAndLossesWhetherItKeepsThemOrNot) {
     for (const bool keeps : {false, true}) {
@@ -12,10 +24,7 @@ TEST(RunRecorder, CountsFramesAndLossesWhetherItKeepsThemOrNot) {
         host::RunRecord run;
         std::uint64_t number = 0;
         const auto deliver = [&](const Value& sensorNumber) {
-            recorder.frameDelivered({.number = ++number,
-                                     .time = platform::MediaTime(),
-                                     .delivered = std::chrono::steady_clock::now(),
-                                     .metadata = {{"FrameNumber", sensorNumber}}});
+            recorder.frameDelivered(frameNumbered(++number, sensorNumber));
         };
         recorder.begin();
         deliver(1);
@@ -38,6 +47,43 @@ TEST(RunRecorder, CountsFramesAndLossesWhetherItKeepsThemOrNot) {
         recorder.begin();
         recorder.end(run = {});
         EXPECT_EQ(run.framesLost, std::nullopt);
+    }
+}
+
+// Whoever takes the frames may have stopped: the device's thread goes on, and no frame is lost.
+TEST(RunRecorder, HandsOnEveryFrameInItsOrderWithoutWaitingForItsReader) {
+    constexpr std::uint64_t kFrames = 333;
+    for (const bool stops : {false, true}) {
+        std::latch goesOn(1);
+        std::vector<std::uint64_t> numbers;
+        host::RunRecorder recorder([](const host::LogRecord&) {}, false,
+                                   [&](std::span<const host::FrameRecord> frames) {
+                                       goesOn.wait();
+                                       for (const host::FrameRecord& frame : frames) {
+                                           numbers.push_back(frame.number);
+                                       }
+                                   });
+        if (!stops) {
+            goesOn.count_down();
+        }
+        host::RunRecord run;
+        recorder.begin();
+        for (std::uint64_t number = 1; number <= kFrames; ++number) {
+            recorder.frameDelivered(frameNumbered(number, number));
+        }
+        if (stops) {
+            goesOn.count_down();
+        }
+        recorder.takeFrames(run);
+        std::vector<std::uint64_t> expected(kFrames);
+        std::iota(expected.begin(), expected.end(), 1);
+        EXPECT_EQ(numbers, expected);
+        EXPECT_EQ(run.framesDelivered, kFrames);
+        EXPECT_TRUE(run.frames.empty());
+
+        recorder.frameDelivered(frameNumbered(kFrames + 1, Value()));
+        recorder.end(run);
+        EXPECT_EQ(numbers.back(), kFrames + 1);
     }
 }
 

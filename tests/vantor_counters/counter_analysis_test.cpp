@@ -6,6 +6,7 @@
 
 #include <gmock/gmock.h>
 
+#include "tests/support/is_error.h"
 #include "vantor_counters/expected_channels.h"
 
 namespace {
@@ -47,6 +48,22 @@ TEST(CounterAnalysis, GivesEachChannelItsOwnMeasurementAndLimit) {
             EXPECT_EQ(&bound->value()->unit(), &ZRDimensionlessUnit::events());
         }
     }
+}
+
+TEST(CounterAnalysis, NamesTheFirstMeasurementThatIsMissing) {
+    ZRExperimentResult result;
+    for (const std::string_view name : kVantorCounterChannelNames) {
+        if (name != kVantorCounterChannelNames[7] && name != kVantorCounterChannelNames[40]) {
+            result.measurements().set(
+                name, std::make_shared<const Measurement>(0.0, ZRDimensionlessUnit::events()));
+        }
+    }
+    platform::ErrorRef error;
+    EXPECT_EQ(ZRVantorMeterixAnalysis().analyzeExperimentResult(result, nullptr), nullptr);
+    EXPECT_EQ(ZRVantorMeterixAnalysis().analyzeExperimentResult(result, &error), nullptr);
+    EXPECT_THAT(error, test::IsPlainError(ZRErrorDomain, 6,
+                                          "Missing measurement for " +
+                                              std::string(kVantorCounterChannelNames[7])));
 }
 
 TEST(CounterDescriptions, SayWhatTheyAreFor) {

@@ -10,6 +10,7 @@
 
 #include <array>
 #include <deque>
+#include <filesystem>
 #include <limits>
 
 #include "fuzz/expect.h"
@@ -201,12 +202,26 @@ struct Real {
     Player<Real> player;
 };
 
+// Waits until the threads of the queue and of the delayed items have ended: no run sees those of another.
+void waitForThreads() {
+    using Tasks = std::filesystem::directory_iterator;
+    const auto count = [] { return std::distance(Tasks("/proc/self/task"), Tasks()); };
+    static const auto without = count();
+    while (count() > without) {
+        std::this_thread::yield();
+    }
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const fuzz::Input input(data, size);
+    waitForThreads();
     const Model model(input);
-    const Real real(input, model);
+    Real real(input, model);
+    real.holds.clear();
+    real.drop();
+    waitForThreads();
     if (real.events != model.events) {
         std::fprintf(stderr, "the model:\n%sthe queue:\n%s", model.events.c_str(),
                      real.events.c_str());

@@ -4,6 +4,7 @@
 #define ZR_FUZZ_CLOCK_H
 
 #include <chrono>
+#include <cstdint>
 
 namespace fuzz {
 
@@ -11,8 +12,13 @@ using TimePoint = std::chrono::steady_clock::time_point;
 
 void setClock(TimePoint now);
 
-inline TimePoint atSecond(double second) {
-    return TimePoint(std::chrono::nanoseconds(static_cast<std::int64_t>(second * 1e9)));
+// The same in seconds.
+inline void setNow(double seconds) {
+    setClock(TimePoint(std::chrono::nanoseconds(static_cast<std::int64_t>(seconds * 1e9))));
+}
+inline double now() {
+    return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch())
+        .count();
 }
 
 }  // namespace fuzz

@@ -71,7 +71,7 @@ class Script {
     void silence() {
         expect(!isStopped && !isLate, "nothing ends the run");
         seconds += _input.isAtEnd() ? kTimeout : 1;
-        fuzz::setClock(fuzz::atSecond(seconds));
+        fuzz::setNow(seconds);
         if (!_input.isAtEnd()) {
             sensor->source->signal();
         }

@@ -1,4 +1,4 @@
-// Whatever a profile's file holds: it gives a device, or lines that each name a culprit and show no
+// Whatever a profile's file holds: it gives a device, or lines that each name the file and show no
 // control character. A device that is written as a profile has all that the file says, and is the same when
 // it is read again.
 //
@@ -54,13 +54,20 @@ std::string rangeText(const std::string& text) {
     return std::to_string(number(first)) + "-" + std::to_string(end);
 }
 
-// Every value of the file is in what was written, where it was; null takes away or stands for nothing.
+// Every value of the file is in what was written, where it was; null takes away or stands for
+// nothing.
 void expectIn(const input::Json& written, const input::Json& given) {
     if (given.is_object()) {
         for (const auto& [key, value] : given.items()) {
-            if (!value.is_null() && key != "extends" && key != "$schema") {
-                expect(written.contains(key), "the key is written");
-                expectIn(written[key], value);
+            if (key == "extends" || key == "$schema") {
+                continue;
+            }
+            const input::Json* const place = written.contains(key) ? &written[key] : nullptr;
+            if (value.is_null()) {
+                expect(place == nullptr || place->is_null() || *place == false, "null is nothing");
+            } else {
+                expect(place != nullptr, "the key is written");
+                expectIn(*place, value);
             }
         }
     } else if (given.is_array()) {
@@ -85,7 +92,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const auto device = load(text, problems);
     expect(device.has_value() == problems.empty(), "a device or problems");
     for (const std::string& problem : problems) {
-        expect(problem.find(": ") != std::string::npos, "the culprit");
+        expect(problem.starts_with(profileFile() + ": "), "the culprit");
         expect(std::none_of(problem.begin(), problem.end(),
                             [](unsigned char c) { return std::iscntrl(c) != 0; }),
                "one line");

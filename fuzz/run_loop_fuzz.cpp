@@ -8,158 +8,14 @@
 #include "platform/run_loop.h"
 
 #include <cmath>
-#include <map>
 
-#include "fuzz/clock.h"
 #include "fuzz/expect.h"
 #include "fuzz/input.h"
+#include "fuzz/naive_run_loop.h"
 
 namespace {
 
-using platform::RunLoopOutcome;
-
-double now = 0;  // seconds
-
-void setNow(double seconds) {
-    now = seconds;
-    fuzz::setClock(fuzz::atSecond(seconds));
-}
-
-// The model: copies of lists, searched from the start, and no thread.
-struct NaiveLoop {
-    struct Source {
-        explicit Source(std::function<void()> body) : callback(std::move(body)) {}
-        void signal() { isSignalled = true; }
-        std::function<void()> callback;
-        bool isSignalled = false;
-    };
-    using Observer = platform::RunLoopObserver;
-    // By order, then by when it was added.
-    template <class T>
-    using Entries = std::map<std::pair<int, int>, std::pair<std::shared_ptr<T>, std::string>>;
-
-    Entries<Source> sources;
-    Entries<Observer> observers;
-    int added = 0;
-    std::vector<bool> stops;  // of the runs in progress
-
-    static std::string member(std::string_view mode) {
-        return std::string(mode == platform::kRunLoopCommonModes ? platform::kRunLoopDefaultMode
-                                                                 : mode);
-    }
-    template <class T>
-    static auto find(Entries<T>& entries, const std::shared_ptr<T>& one, std::string_view mode) {
-        return std::find_if(entries.begin(), entries.end(), [&](const auto& entry) {
-            return entry.second == std::pair(one, member(mode));
-        });
-    }
-    template <class T>
-    void add(Entries<T>& entries, const std::shared_ptr<T>& one, std::string_view mode, int order) {
-        if (find(entries, one, mode) == entries.end()) {
-            entries[{order, ++added}] = {one, member(mode)};
-        }
-    }
-    template <class T>
-    void remove(Entries<T>& entries, const std::shared_ptr<T>& one, std::string_view mode) {
-        if (const auto found = find(entries, one, mode); found != entries.end()) {
-            entries.erase(found);
-        }
-    }
-    void addSource(const std::shared_ptr<Source>& one, std::string_view mode) {
-        add(sources, one, mode, 0);
-    }
-    void removeSource(const std::shared_ptr<Source>& one, std::string_view mode) {
-        remove(sources, one, mode);
-    }
-    void addObserver(const std::shared_ptr<Observer>& one, std::string_view mode) {
-        add(observers, one, mode, one->order);
-    }
-    void removeObserver(const std::shared_ptr<Observer>& one, std::string_view mode) {
-        remove(observers, one, mode);
-    }
-    void stop() {
-        if (!stops.empty()) {
-            stops.back() = true;
-        }
-    }
-
-    // Calls `visit` with those of the mode that were there at the start and still are.
-    template <class T, class Visit>
-    void each(Entries<T>& entries, const std::string& mode, const Visit& visit) {
-        for (const auto& [place, entry] : Entries<T>(entries)) {
-            if (entry.second == mode && entries.count(place) != 0) {
-                visit(*entry.first);
-            }
-        }
-    }
-    void notify(const std::string& mode, std::uint32_t activity) {
-        each(observers, mode, [&](Observer& one) {
-            if ((one.activities & activity) != 0) {
-                one.callback(activity);
-            }
-        });
-    }
-    bool has(const std::string& mode, bool signalled) {
-        bool found = false;
-        each(sources, mode, [&](Source& one) { found = found || !signalled || one.isSignalled; });
-        return found;
-    }
-    RunLoopOutcome serve(const std::string& mode, double limit) {
-        while (true) {
-            for (const bool before : {true, false}) {
-                if (stops.back()) {
-                    return RunLoopOutcome::Stopped;
-                }
-                if (!has(mode, false)) {
-                    return RunLoopOutcome::Finished;
-                }
-                if (before) {
-                    notify(mode, platform::RunLoopBeforeSources);
-                    each(sources, mode, [&](Source& one) {
-                        if (one.isSignalled && !stops.back()) {
-                            one.isSignalled = false;
-                            one.callback();
-                        }
-                    });
-                }
-            }
-            if (now >= limit) {
-                return RunLoopOutcome::TimedOut;
-            }
-            if (!has(mode, true)) {
-                notify(mode, platform::RunLoopBeforeWaiting);
-                notify(mode, platform::RunLoopAfterWaiting);
-            }
-        }
-    }
-    RunLoopOutcome run(std::string_view in, double seconds) {
-        const std::string mode = member(in);
-        const double limit = seconds > 0 ? now + seconds : now;
-        stops.push_back(false);
-        std::exception_ptr thrown;
-        RunLoopOutcome outcome{};
-        try {
-            notify(mode, platform::RunLoopEntry);
-            outcome = serve(mode, limit);
-        } catch (int) {
-            thrown = std::current_exception();
-        }
-        each(observers, mode, [&](Observer& one) {
-            try {
-                if ((one.activities & platform::RunLoopExit) != 0) {
-                    one.callback(platform::RunLoopExit);
-                }
-            } catch (int) {
-                thrown = thrown != nullptr ? thrown : std::current_exception();
-            }
-        });
-        stops.pop_back();
-        if (thrown != nullptr) {
-            std::rethrow_exception(thrown);
-        }
-        return outcome;
-    }
-};
+using fuzz::NaiveLoop;
 
 constexpr std::string_view kModes[] = {"a", "b", platform::kRunLoopDefaultMode,
                                        platform::kRunLoopCommonModes};
@@ -170,7 +26,7 @@ template <class Loop, class Source>
 class Player {
   public:
     Player(Loop& loop, fuzz::Input input) : _loop(loop), _input(input) {
-        setNow(0);
+        fuzz::setNow(0);
         for (std::size_t k = 0; k < 4; ++k) {
             _sources.push_back(std::make_shared<Source>([this, k] {
                 _say("source", k);
@@ -217,36 +73,32 @@ class Player {
         events += what;
         events += ' ' + std::to_string(number) + '\n';
     }
-    std::string_view _mode() { return kModes[_input.below(4)]; }
-
     void _carryOn() {
         while (!_input.isAtEnd()) {
-            switch (_input.letter("saroptx!R.")) {
+            const char letter = _input.letter("saroptx!R.");
+            const auto needs = [letter](std::string_view letters) {
+                return letters.find(letter) != std::string_view::npos;
+            };
+            const std::size_t k = needs("sarop") ? _input.below(4) : 0;
+            const std::string_view mode = needs("aropR") ? kModes[_input.below(4)] : "";
+            switch (letter) {
                 case 's':
-                    _sources[_input.below(4)]->signal();
+                    _sources[k]->signal();
                     break;
-                case 'a': {
-                    const auto k = _input.below(4);
-                    _loop.addSource(_sources[k], _mode());
+                case 'a':
+                    _loop.addSource(_sources[k], mode);
                     break;
-                }
-                case 'r': {
-                    const auto k = _input.below(4);
-                    _loop.removeSource(_sources[k], _mode());
+                case 'r':
+                    _loop.removeSource(_sources[k], mode);
                     break;
-                }
-                case 'o': {
-                    const auto k = _input.below(4);
-                    _loop.addObserver(_observers[k], _mode());
+                case 'o':
+                    _loop.addObserver(_observers[k], mode);
                     break;
-                }
-                case 'p': {
-                    const auto k = _input.below(4);
-                    _loop.removeObserver(_observers[k], _mode());
+                case 'p':
+                    _loop.removeObserver(_observers[k], mode);
                     break;
-                }
                 case 't':
-                    setNow(now + 0.25);
+                    fuzz::setNow(fuzz::now() + 0.25);
                     break;
                 case 'x':
                     _loop.stop();
@@ -254,16 +106,14 @@ class Player {
                 case '!':
                     throw static_cast<int>(_input.rest().size());
                 case 'R':
-                    _run();
+                    _run(mode, kLimits[_input.below(8)]);
                     break;
-                case '.':
+                default:
                     return;
             }
         }
     }
-    void _run() {
-        const std::string_view mode = _mode();
-        const double limit = kLimits[_input.below(8)];
+    void _run(std::string_view mode, double limit) {
         if (_runs.size() == 4) {
             return;
         }
@@ -283,7 +133,7 @@ class Player {
         if (_input.isAtEnd() && limit > 10) {
             _loop.stop();
         } else if (_input.isAtEnd() || (byte == 'z' && !(limit > 10))) {
-            setNow(now + 100);
+            fuzz::setNow(fuzz::now() + 100);
         } else {
             const auto& source = _sources[static_cast<std::size_t>(byte) % 4];
             _loop.addSource(source, mode);

@@ -10,51 +10,30 @@
 #include "devices/simulator/meterix_facility.h"
 #include "platform/services.h"
 #include "platform/welkin/capture.h"
+#include "tests/support/hand_fed_camera.h"
 
 namespace fuzz {
 
-struct OneStream final : WLISPCapturePlugIn,
-                         WLRylCaptureDevice,
-                         WLRylCaptureStream,
-                         std::enable_shared_from_this<OneStream> {
-    std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot /*error*/) override {
-        return shared_from_this();
-    }
-    std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot /*error*/) override {
-        return WLRylCaptureStreamList{shared_from_this()};
-    }
-    bool requestControlOfStreams(const WLRylCaptureStreamList& /*streams*/,
-                                 platform::ErrorSlot /*error*/) override {
-        return true;
-    }
-    bool invalidate(platform::ErrorSlot /*error*/) override {
-        handler = nullptr;
-        return true;
-    }
-    platform::Value valueForProperty(std::string_view property,
-                                     platform::ErrorSlot /*error*/) override {
-        return property == kRylCaptureStreamProperty_PortType
-                   ? platform::Value(kRylCapturePortType_FrontFacingInfraredCamera)
-                   : platform::Value(platform::Dictionary());
-    }
+struct OneStream final : test::HandFedCapture {
+    OneStream() : HandFedCapture([](std::int64_t /*frame*/) { return nullptr; }) {}
+
     bool setValue(const platform::Value& value,
                   std::string_view forProperty,
                   platform::ErrorSlot /*error*/) override {
         if (forProperty == kRylCaptureStreamProperty_VideoOutputHandlers) {
-            handler = *value[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                            [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                                .object<WLRylFrameHandler>();
+            handlers = value;
         }
         return true;
     }
     bool start(platform::ErrorSlot /*error*/) override {
-        onStart(handler);
+        onStart(*handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
+                         [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
+                             .object<WLRylFrameHandler>());
         return true;
     }
-    bool stop(platform::ErrorSlot /*error*/) override { return true; }
 
     std::function<void(const WLRylFrameHandler& handler)> onStart;
-    WLRylFrameHandler handler;
+    platform::Value handlers;
 };
 
 // Installs a new one, and a facility with one counter.

@@ -17,6 +17,7 @@
 #include "fuzz/input.h"
 #include "platform/run_tag.h"
 #include "platform/sync.h"
+#include "tests/support/eventually.h"
 
 namespace {
 
@@ -119,7 +120,7 @@ platform::Semaphore delayedOver{0};
 
 void waitFor(platform::Semaphore& semaphore, std::size_t count) {
     for (; count > 0; --count) {
-        expect(semaphore.try_acquire_for(std::chrono::seconds(60)), "no item is lost");
+        expect(semaphore.try_acquire_for(test::kGenerous), "no item is lost");
     }
 }
 
@@ -207,9 +208,7 @@ void waitForThreads() {
     using Tasks = std::filesystem::directory_iterator;
     const auto count = [] { return std::distance(Tasks("/proc/self/task"), Tasks()); };
     static const auto without = count();
-    while (count() > without) {
-        std::this_thread::yield();
-    }
+    expect(test::eventually([&] { return count() <= without; }), "no thread is left");
 }
 
 }  // namespace

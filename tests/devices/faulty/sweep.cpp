@@ -1,14 +1,13 @@
 #include "tests/devices/faulty/sweep.h"
 
 #include <algorithm>
-#include <filesystem>
-#include <fstream>
 #include <thread>
 
 #include "devices/observed/capture.h"
 #include "devices/observed/observe.h"
 #include "devices/simulator/device.h"
 #include "kirra/image_experiment.h"
+#include "tests/platform/threads.h"
 #include "tests/support/capture_witness.h"
 #include "tests/support/eventually.h"
 #include "vantor_counters/counter_experiment.h"
@@ -23,16 +22,10 @@ struct SilentSink final : platform::LogSink {
 };
 
 // The threads of the process but for the one of the delayed items, which a pending time-out keeps.
-std::vector<std::string> threads() {
-    std::vector<std::string> names;
-    for (const auto& task : std::filesystem::directory_iterator("/proc/self/task")) {
-        std::string name;
-        std::getline(std::ifstream(task.path() / "comm"), name);
-        if (!name.empty() && name != "delayed items") {  // empty: it ended just now
-            names.push_back(std::move(name));
-        }
-    }
-    std::sort(names.begin(), names.end());
+Threads threads() {
+    Threads names = threadNames();
+    names.erase("delayed items");
+    names.erase("");  // one that ended just now
     return names;
 }
 

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -54,6 +55,9 @@ inline bool isCertain(const faulty::Step& step) {
     return step.place.kind <= faulty::StepKind::Call || step.place.number <= kAskedFor;
 }
 
+// How many threads there are, by name.
+using Threads = std::map<std::string, std::size_t>;
+
 class Sweep : public ::testing::Test {
   protected:
     Sweep();
@@ -76,7 +80,7 @@ class Sweep : public ::testing::Test {
         std::weak_ptr<ZRExperiment> experiment;
     };
     std::shared_ptr<platform::RunLoop> _runLoop = platform::RunLoop::forThisThread();
-    std::vector<std::string> _threads;
+    Threads _threads;
     std::vector<Left> _left;
 };
 

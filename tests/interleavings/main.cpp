@@ -1,18 +1,21 @@
 // Runs scenarios in many orders, and one order again.
 //
-//   interleavings SCENARIO|all [--preemptions N] [--seeds N] [--first-seed S]
+//   interleavings BEGINNING [--more N] [--seeds N] [--first-seed S]
 //   interleavings SCENARIO --replay ORDER        prints every step of that order
 //   interleavings --list
 //
-// First every order with at most N preemptions (2), then one random order for each of N seeds (2000). Ends
-// with status 1 at the first order that fails, and prints the command that replays it.
+// For each scenario whose name has that beginning: every order with at most the scenario's number of
+// preemptions and N more (0), then one random order for each of N seeds (2000). Ends with status 1 at the
+// first order that fails, and prints the command that replays it.
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 #include <random>
 #include <string>
 
+#include <fmt/format.h>
+
 #include "platform/log.h"
+#include "platform/services.h"
 #include "platform/work_queue.h"
 #include "tests/interleavings/scenario.h"
 #include "tests/interleavings/scheduler.h"
@@ -26,8 +29,7 @@ std::string text(const Order& order) {
     std::string text;
     for (std::size_t place = 0; place < order.size(); ++place) {
         if (order[place].chosen != 0) {
-            text += text.empty() ? "" : ",";
-            text += std::to_string(place) + ":" + std::to_string(order[place].chosen);
+            text += fmt::format("{}{}:{}", text.empty() ? "" : ",", place, order[place].chosen);
         }
     }
     return text.empty() ? "-" : text;
@@ -68,9 +70,9 @@ Execution replay(const Scenario& scenario, const std::vector<unsigned>& chosen) 
         true);
 }
 
-[[noreturn]] void report(const Scenario& scenario, const Execution& failed, const char* how) {
-    std::printf("%s: FAILED%s: %s\nreplay: interleavings %s --replay %s\n", scenario.name.data(), how,
-                failed.failure.c_str(), scenario.name.data(), text(failed.order).c_str());
+[[noreturn]] void report(const Scenario& scenario, const Execution& failed, std::string_view how) {
+    fmt::print("{}: FAILED{}: {}\nreplay: interleavings {} --replay {}\n", scenario.name, how,
+               failed.failure, scenario.name, text(failed.order));
     std::fflush(stdout);
     std::_Exit(1);
 }
@@ -114,13 +116,13 @@ void exploreSeed(const Scenario& scenario, unsigned seed) {
         return goesOn ? 0U : static_cast<unsigned>(random() % most);
     });
     if (!execution.failure.empty()) {
-        report(scenario, execution, (" with seed " + std::to_string(seed)).c_str());
+        report(scenario, execution, fmt::format(" with seed {}", seed));
     }
 }
 
 std::vector<Scenario> scenarios() {
     std::vector<Scenario> all;
-    for (const auto& some : {queueScenarios()}) {
+    for (const auto& some : {queueScenarios(), runLoopScenarios(), logScenarios(), faultStopScenarios()}) {
         all.insert(all.end(), some.begin(), some.end());
     }
     return all;
@@ -129,11 +131,14 @@ std::vector<Scenario> scenarios() {
 // What is made at its first use and never destroyed is made before objects are counted.
 void warmUp() {
     const Scenario scenario{"warm-up", [] {
+        makeApart(true);
+        platform::Log::isEnabled(platform::LogLevel::Debug);
+        platform::installServices({});
+        makeApart(false);
         platform::WorkQueue queue("warm-up", platform::WorkQueue::Priority::Background);
         const platform::WorkQueue::Hold hold(queue);
-        platform::Log::isEnabled(platform::LogLevel::Debug);
         return [] {};
-    }};
+    }, 0};
     once(scenario, [](std::size_t, const Choice&) { return 0U; });
 }
 
@@ -143,7 +148,7 @@ int main(int argc, char** argv) {
     const std::vector<Scenario> all = scenarios();
     std::string name;
     const char* order = nullptr;
-    unsigned preemptions = 2;
+    unsigned more = 0;
     unsigned seeds = 2000;
     unsigned firstSeed = 1;
     for (int at = 1; at < argc; ++at) {
@@ -159,8 +164,8 @@ int main(int argc, char** argv) {
             }
             return 0;
         }
-        if (word == "--preemptions") {
-            preemptions = number();
+        if (word == "--more") {
+            more = number();
         } else if (word == "--seeds") {
             seeds = number();
         } else if (word == "--first-seed") {
@@ -176,27 +181,28 @@ int main(int argc, char** argv) {
     warmUp();
     bool found = false;
     for (const Scenario& scenario : all) {
-        if (name != "all" && name != scenario.name) {
+        if (!scenario.name.starts_with(name)) {
             continue;
         }
         found = true;
         if (order != nullptr) {
             const Execution execution = replay(scenario, readOrder(order));
-            std::printf("%s%s\n", execution.trace.c_str(),
-                        execution.failure.empty() ? "passed" : execution.failure.c_str());
+            fmt::print("{}{}\n", execution.trace,
+                       execution.failure.empty() ? "passed" : execution.failure);
             std::fflush(stdout);
             std::_Exit(execution.failure.empty() ? 0 : 1);
         }
+        const unsigned preemptions = scenario.preemptions + more;
         const std::size_t orders = exploreAll(scenario, preemptions);
         for (unsigned seed = firstSeed; seed - firstSeed < seeds; ++seed) {
             exploreSeed(scenario, seed);
         }
-        std::printf("%s: %zu orders with at most %u preemptions, %u random orders: passed\n",
-                    scenario.name.data(), orders, preemptions, seeds);
+        fmt::print("{}: {} orders with at most {} preemptions, {} random orders: passed\n",
+                   scenario.name, orders, preemptions, seeds);
         std::fflush(stdout);
     }
     if (!found) {
-        std::fprintf(stderr, "interleavings: no scenario \"%s\"; see --list\n", name.c_str());
+        fmt::print(stderr, "interleavings: no scenario \"{}\"; see --list\n", name);
         return 64;
     }
     return 0;

@@ -14,6 +14,7 @@ using Body = std::function<std::function<void()>()>;
 struct Scenario {
     std::string_view name;
     Body body;
+    unsigned preemptions;  // of the orders that the short form explores
 };
 
 // The scenarios of each file.

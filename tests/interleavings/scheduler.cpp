@@ -24,7 +24,7 @@ constexpr std::uint64_t kAlive = 0x616c697665616c69;
 constexpr std::size_t kStack = 256 * 1024;
 constexpr std::size_t kMostSteps = 20'000;  // of one execution
 constexpr TimePoint kBegin{std::chrono::hours(1)};
-constexpr std::chrono::microseconds kYield{15};
+constexpr std::chrono::microseconds kYield{40};
 
 // The program's thread-local variables, which every fiber has for itself.
 struct ThreadLocals {
@@ -104,12 +104,14 @@ struct World {
     std::size_t steps = 0;
     unsigned startsThatMayFail = 0;
     bool traces = false;
+    bool leavesOutApart = false;
     TimePoint now = kBegin;
 };
 
 World world;
 long liveObjects = 0;
 unsigned objectsMade = 0;
+bool objectsAreApart = false;
 
 Exceptions& exceptionsOfThisThread() {
     return *reinterpret_cast<Exceptions*>(abi::__cxa_get_globals());
@@ -198,7 +200,7 @@ Fiber* next(Stance stance) {
     const unsigned all = add([](const Fiber& fiber) {
         return !isReady(fiber) && fiber.deadline == TimePoint::max() && fiber.loosely;
     });
-    return options[choose(stance == Stance::Stays ? 1 : ready, rare, all)];
+    return options[choose(stance == Stance::Waits ? ready : 1, rare, all)];
 }
 
 void reschedule(Stance stance) {
@@ -216,20 +218,13 @@ void reschedule(Stance stance) {
     }
 }
 
-[[noreturn]] void fail(std::string text) {
-    world.execution.failure = std::move(text);
-    world.nextUp = nullptr;
-    leaveFiber();
-    std::abort();  // never resumed
-}
-
-void trace(const std::string& operation) {
+template <class... Args>
+void trace(fmt::format_string<Args...> text, Args&&... args) {
     if (world.traces) {
-        world.execution.trace += world.running->name + ": " + operation + "\n";
+        world.execution.trace += world.running->name + ": ";
+        world.execution.trace += fmt::format(text, std::forward<Args>(args)...) + '\n';
     }
-    if (++world.steps > kMostSteps) {
-        fail("the threads go on for ever");
-    }
+    expect(++world.steps <= kMostSteps, "the threads go on for ever");
 }
 
 void runFiber() {
@@ -246,7 +241,7 @@ void runFiber() {
             last.destroy(last.object);
         }
     } catch (const std::exception& error) {
-        fail(std::string("an exception left a thread: ") + error.what());
+        expect(false, "an exception left a thread: {}", error.what());
     }
     self.ended = true;
     reschedule(Stance::Waits);
@@ -255,7 +250,7 @@ void runFiber() {
 Fiber& addFiber(std::function<void()> body) {
     auto made = std::make_unique<Fiber>();
     made->number = static_cast<unsigned>(world.fibers.size());
-    made->name = "thread " + std::to_string(made->number);
+    made->name = fmt::format("thread {}", made->number);
     made->body = std::move(body);
     made->locals = threadLocals().fresh;
     if (!world.stacks.empty()) {
@@ -277,7 +272,7 @@ std::string standstill() {
     std::string text = "nothing can go on:";
     for (const auto& fiber : world.fibers) {
         if (!fiber->ended) {
-            text += "\n  " + fiber->name + " waits in " + fiber->waitsFor;
+            text += fmt::format("\n  {} waits in {}", fiber->name, fiber->waitsFor);
         }
     }
     return text;
@@ -285,16 +280,14 @@ std::string standstill() {
 
 }  // namespace
 
-Object::Object(const char* kind) : _mark(kAlive), _kind(kind), _number(++objectsMade) {
+Object::Object(const char* kind) : _mark(kAlive), _kind(kind), _number(++objectsMade), _apart(objectsAreApart) {
     ++liveObjects;
 }
 
 Object::~Object() {
     if (world.running != nullptr) {
         for (const auto& fiber : world.fibers) {
-            if (fiber->waitsAt == this) {
-                fail(std::string("a ") + _kind + " ends while " + fiber->name + " waits at it");
-            }
+            expect(fiber->waitsAt != this, "a {} ends while {} waits at it", _kind, fiber->name);
         }
     }
     static_cast<volatile std::uint64_t&>(_mark) = 0;
@@ -303,7 +296,7 @@ Object::~Object() {
 
 void Object::_expectAlive(const char* operation) const {
     expect(static_cast<const volatile std::uint64_t&>(_mark) == kAlive,
-           std::string(operation) + " is called on an object that has ended");
+           "{} is called on an object that has ended", operation);
 }
 
 void Object::step(const char* operation) const {
@@ -311,15 +304,22 @@ void Object::step(const char* operation) const {
         return;
     }
     _expectAlive(operation);
-    trace(std::string(operation) + " " + _kind + " " + std::to_string(_number));
+    if (isLeftOut()) {
+        return;
+    }
+    trace("{} {} {}", operation, _kind, _number);
     reschedule(Stance::Stays);
     _expectAlive(operation);
+}
+
+bool Object::isLeftOut() const {
+    return _apart && world.leavesOutApart;
 }
 
 void Object::wait(const char* operation, TimePoint deadline, bool loosely) {
     _expectAlive(operation);
     Fiber& self = *world.running;
-    trace(std::string("waits in ") + operation + " " + _kind + " " + std::to_string(_number));
+    trace("waits in {} {} {}", operation, _kind, _number);
     self.waitsAt = this;
     self.waitsFor = operation;
     self.deadline = deadline;
@@ -359,12 +359,28 @@ void start(std::function<void()> body) {
         throw std::system_error(std::make_error_code(std::errc::resource_unavailable_try_again));
     }
     const Fiber& made = addFiber(std::move(body));
-    step("starts " + made.name);
+    step("starts {}", made.name);
 }
 
-void step(const std::string& operation) {
+void note(std::string_view text) {
+    trace("{}", text);
+}
+
+void makeApart(bool apart) {
+    objectsAreApart = apart;
+}
+
+void leaveOutApart() {
+    world.leavesOutApart = true;
+}
+
+bool isTraced() {
+    return world.traces && world.running != nullptr;
+}
+
+void stepAs(const std::string& operation) {
     if (world.running != nullptr) {
-        trace(operation);
+        trace("{}", operation);
         reschedule(Stance::Stays);
     }
 }
@@ -383,12 +399,14 @@ unsigned thisThread() {
     return world.running->number;
 }
 
-void expect(bool condition, const std::string& otherwise) {
-    if (!condition && world.execution.failure.empty()) {
-        if (world.running != nullptr) {
-            fail(otherwise);
-        }
-        world.execution.failure = otherwise;
+void fail(std::string text) {
+    if (world.execution.failure.empty()) {
+        world.execution.failure = std::move(text);
+    }
+    if (world.running != nullptr) {
+        world.nextUp = nullptr;
+        leaveFiber();
+        std::abort();  // never resumed
     }
 }
 
@@ -404,6 +422,7 @@ Execution execute(const std::function<void()>& body,
     world.steps = 0;
     world.startsThatMayFail = 0;
     world.traces = traces;
+    world.leavesOutApart = false;
     world.now = kBegin;
     objectsMade = 0;
 
@@ -415,12 +434,11 @@ Execution execute(const std::function<void()>& body,
     if (world.execution.failure.empty()) {
         const bool ended = std::all_of(world.fibers.begin(), world.fibers.end(),
                                        [](const auto& fiber) { return fiber->ended; });
-        expect(ended, standstill());
+        expect(ended, "{}", standstill());
     }
     if (world.execution.failure.empty()) {
         after();
-        expect(liveObjects == liveBefore,
-               std::to_string(liveObjects - liveBefore) + " objects are left over");
+        expect(liveObjects == liveBefore, "{} objects are left over", liveObjects - liveBefore);
     }
     return std::move(world.execution);
 }

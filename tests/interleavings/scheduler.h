@@ -16,7 +16,10 @@
 #include <functional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
+
+#include <fmt/core.h>
 
 namespace interleavings {
 
@@ -38,26 +41,32 @@ class Object {
     void wakeOne();  // any one of those that wait
     void wakeAll();
 
+    bool isLeftOut() const;  // see leaveOutApart()
+
   private:
     void _expectAlive(const char* operation) const;
 
     std::uint64_t _mark;
     const char* _kind;
     unsigned _number;
+    bool _apart;
 };
 
 // In an execution: starts a thread. Throws std::system_error when the order has the start fail.
 void start(std::function<void()> body);
-// A step at no object.
-void step(const std::string& operation);
 // Another thread goes first, if any can; a little time passes.
 void yield();
 // How many starts of threads may fail from here on, in this execution; none at first.
 void letStartsFail(unsigned number);
 // The running thread's number; the scenario's own is 0.
 unsigned thisThread();
-// Ends the execution as a failure when `condition` is false.
-void expect(bool condition, const std::string& otherwise);
+
+// A step at no object, with its text for the trace.
+template <class... Args>
+void step(fmt::format_string<Args...> text, Args&&... args);
+// Ends the execution as a failure, with the text, when `condition` is false.
+template <class... Args>
+void expect(bool condition, fmt::format_string<Args...> otherwise, Args&&... args);
 
 // What chooses. Options below `free` cost nothing, from there on a preemption; those from `rare` on (a wake-up
 // for no reason) are only for random orders.
@@ -83,6 +92,30 @@ Execution execute(const std::function<void()>& body,
                   const std::function<void()>& after,
                   const std::function<unsigned(std::size_t place, const Choice& from)>& choose,
                   bool trace);
+
+// A line of the trace; not a step.
+void note(std::string_view text);
+
+// Objects made between true and false are apart: leaveOutApart() makes the rest of an execution pass over
+// their steps. Sound where other threads cannot tell, as with a log whose sink stays the same.
+void makeApart(bool apart);
+void leaveOutApart();
+
+// How step() and expect() are done.
+bool isTraced();
+void stepAs(const std::string& operation);
+void fail(std::string text);
+
+template <class... Args>
+void step(fmt::format_string<Args...> text, Args&&... args) {
+    stepAs(isTraced() ? fmt::format(text, std::forward<Args>(args)...) : std::string());
+}
+template <class... Args>
+void expect(bool condition, fmt::format_string<Args...> otherwise, Args&&... args) {
+    if (!condition) {
+        fail(fmt::format(otherwise, std::forward<Args>(args)...));
+    }
+}
 
 }  // namespace interleavings
 

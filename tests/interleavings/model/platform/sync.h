@@ -25,8 +25,11 @@ class Mutex {
         _take();
     }
     void unlock() {
+        const bool isLeftOut = _object.isLeftOut();
         _give();
-        interleavings::step("after unlock");
+        if (!isLeftOut) {  // the mutex may have ended when others have gone
+            interleavings::step("after unlock");
+        }
     }
     bool tryLock() {
         _object.step("tryLock");

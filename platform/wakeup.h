@@ -20,23 +20,23 @@ class Wakeup {
     void wait() {
         const auto begin = Clock::now();
         if (_lastWaitWasShort) {
-            while (_word.load(std::memory_order_relaxed) == kUnset &&
+            while (_word.load(std::memory_order_relaxed) == Unset &&
                    Clock::now() - begin < kShort) {
                 yieldProcessor();
             }
         }
-        if (_word.replace(kUnset, kAsleep, std::memory_order_acquire)) {
-            while (_word.load(std::memory_order_acquire) == kAsleep) {
-                _word.sleepAt(kAsleep);
+        if (_word.replace(Unset, Asleep, std::memory_order_acquire)) {
+            while (_word.load(std::memory_order_acquire) == Asleep) {
+                _word.sleepAt(Asleep);
             }
         }
-        _word.exchange(kUnset, std::memory_order_acquire);
+        _word.exchange(Unset, std::memory_order_acquire);
         _lastWaitWasShort = Clock::now() - begin < kShort;
     }
 
     // Any thread. The object must live until this returns, even if the waiting thread goes on before.
     void wake() {
-        if (_word.exchange(kSet, std::memory_order_acq_rel) == kAsleep) {
+        if (_word.exchange(Set, std::memory_order_acq_rel) == Asleep) {
             _word.wakeOne();
         }
     }
@@ -47,9 +47,9 @@ class Wakeup {
     // sleep on a slow machine.
     static constexpr std::chrono::microseconds kShort{40};
 
-    enum : std::uint32_t { kUnset, kSet, kAsleep };
+    enum State : std::uint32_t { Unset, Set, Asleep };
 
-    SleepWord _word{kUnset};
+    SleepWord _word{Unset};
     bool _lastWaitWasShort = false;  // belongs to the waiting thread
 };
 

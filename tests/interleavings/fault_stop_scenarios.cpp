@@ -25,8 +25,8 @@ enum class Trigger { None, LastFrame, UnlitFrame, BadMetadata, TimeOut };
 struct Settings {
     std::vector<Frame> frames;
     int stopCount;
-    bool hostKeeps = false;       // the experiment, until everything has ended
-    bool stopWaits = false;       // for a handler in progress
+    bool hostKeeps = false;         // the experiment, until everything has ended
+    bool stopWaits = false;         // for a handler in progress
     bool firstInsideStart = false;  // the service delivers its first frame before start() returns
 };
 
@@ -47,8 +47,9 @@ platform::ImageBufferRef makeBuffer(Frame frame) {
     }();
     platform::MutableDictionary metadata = everyColumn;
     metadata.set(kRylCaptureStreamMetadata_InfraredLightSource, frame == Frame::Lit ? 1 : 0);
-    return std::make_shared<const platform::ImageBuffer>(platform::Dictionary{
-        {kRylCaptureSampleBufferAttachmentKey_MetadataDictionary, platform::Dictionary(std::move(metadata))}});
+    return std::make_shared<const platform::ImageBuffer>(
+        platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
+                              platform::Dictionary(std::move(metadata))}});
 }
 
 // What one execution showed. Threads run one at a time: no lock.
@@ -192,8 +193,7 @@ class NoCounters final : public platform::MeterixFacility {
         return std::make_shared<const platform::MeterixChannels>();
     }
     std::shared_ptr<const platform::MeterixSamples> sample(
-        const platform::MeterixChannels& /*channels*/,
-        platform::ErrorSlot /*error*/) override {
+        const platform::MeterixChannels& /*channels*/, platform::ErrorSlot /*error*/) override {
         step("sample");
         return std::make_shared<const platform::MeterixSamples>();
     }

@@ -1,12 +1,13 @@
 // Runs scenarios in many orders, and one order again.
 //
-//   interleavings BEGINNING [--more N] [--seeds N] [--first-seed S]
+//   interleavings BEGINNING [--more N] [--most N] [--seeds N] [--first-seed S]
 //   interleavings SCENARIO --replay ORDER        prints every step of that order
 //   interleavings --list
 //
 // For each scenario whose name has that beginning: every order with at most the scenario's number of
-// preemptions and N more (0), then one random order for each of N seeds (2000). Ends with status 1 at the
+// preemptions and N more (0), though at most N, then one random order for each of N seeds (2000). Ends with status 1 at the
 // first order that fails, and prints the command that replays it.
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <random>
@@ -122,7 +123,8 @@ void exploreSeed(const Scenario& scenario, unsigned seed) {
 
 std::vector<Scenario> scenarios() {
     std::vector<Scenario> all;
-    for (const auto& some : {queueScenarios(), runLoopScenarios(), logScenarios(), faultStopScenarios()}) {
+    for (const auto& some :
+         {queueScenarios(), runLoopScenarios(), logScenarios(), faultStopScenarios()}) {
         all.insert(all.end(), some.begin(), some.end());
     }
     return all;
@@ -130,15 +132,18 @@ std::vector<Scenario> scenarios() {
 
 // What is made at its first use and never destroyed is made before objects are counted.
 void warmUp() {
-    const Scenario scenario{"warm-up", [] {
-        makeApart(true);
-        platform::Log::isEnabled(platform::LogLevel::Debug);
-        platform::installServices({});
-        makeApart(false);
-        platform::WorkQueue queue("warm-up", platform::WorkQueue::Priority::Background);
-        const platform::WorkQueue::Hold hold(queue);
-        return [] {};
-    }, 0};
+    const Scenario scenario{"warm-up",
+                            [] {
+                                makeApart(true);
+                                platform::Log::isEnabled(platform::LogLevel::Debug);
+                                platform::installServices({});
+                                makeApart(false);
+                                platform::WorkQueue queue(
+                                    "warm-up", platform::WorkQueue::Priority::Background);
+                                const platform::WorkQueue::Hold hold(queue);
+                                return [] {};
+                            },
+                            0};
     once(scenario, [](std::size_t, const Choice&) { return 0U; });
 }
 
@@ -149,6 +154,7 @@ int main(int argc, char** argv) {
     std::string name;
     const char* order = nullptr;
     unsigned more = 0;
+    unsigned most = 99;
     unsigned seeds = 2000;
     unsigned firstSeed = 1;
     for (int at = 1; at < argc; ++at) {
@@ -166,6 +172,8 @@ int main(int argc, char** argv) {
         }
         if (word == "--more") {
             more = number();
+        } else if (word == "--most") {
+            most = number();
         } else if (word == "--seeds") {
             seeds = number();
         } else if (word == "--first-seed") {
@@ -192,7 +200,7 @@ int main(int argc, char** argv) {
             std::fflush(stdout);
             std::_Exit(execution.failure.empty() ? 0 : 1);
         }
-        const unsigned preemptions = scenario.preemptions + more;
+        const unsigned preemptions = std::min(scenario.preemptions + more, most);
         const std::size_t orders = exploreAll(scenario, preemptions);
         for (unsigned seed = firstSeed; seed - firstSeed < seeds; ++seed) {
             exploreSeed(scenario, seed);

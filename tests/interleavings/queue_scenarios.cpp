@@ -62,9 +62,7 @@ std::function<void()> twoPosters(bool held) {
     });
     queue->async(record->item(3));
     queue = nullptr;
-    return [record] {
-        record->expectRan({{1, 2, 3}, {1, 3, 2}, {3, 1, 2}});
-    };
+    return [record] { record->expectRan({{1, 2, 3}, {1, 3, 2}, {3, 1, 2}}); };
 }
 
 // The queue's thread is about to end when the second item comes.
@@ -131,9 +129,8 @@ std::function<void()> holdAndOwnerEnd() {
     auto queue = makeQueue();
     WorkQueue& same = *queue;
     auto hold = std::make_unique<WorkQueue::Hold>(same);
-    platform::startThread([other = std::make_unique<WorkQueue::Hold>(same)]() mutable {
-        other = nullptr;
-    });
+    platform::startThread(
+        [other = std::make_unique<WorkQueue::Hold>(same)]() mutable { other = nullptr; });
     same.async([record, owner = std::move(queue), hold = std::move(hold)]() mutable {
         record->run(1);
         hold = nullptr;
@@ -172,9 +169,7 @@ std::function<void()> startsFail() {
     attempt(1, [&] { queue->async(record->item(1)); });
     attempt(2, [&] { queue->after(milliseconds(1), record->item(2)); });
     auto reversed = std::vector<int>(accepted.rbegin(), accepted.rend());
-    return [record, accepted, reversed] {
-        record->expectRan({accepted, reversed});
-    };
+    return [record, accepted, reversed] { record->expectRan({accepted, reversed}); };
 }
 
 }  // namespace

@@ -72,9 +72,8 @@ std::function<void()> sourceComesAndGoes() {
     const auto loop = RunLoop::forThisThread();
     const auto idle = std::make_shared<Counter>(-1);
     loop->addSource(idle->source, platform::kRunLoopDefaultMode);
-    platform::startThread([loop, idle] {
-        loop->removeSource(idle->source, platform::kRunLoopDefaultMode);
-    });
+    platform::startThread(
+        [loop, idle] { loop->removeSource(idle->source, platform::kRunLoopDefaultMode); });
     const RunLoopOutcome outcome = loop->run(platform::kRunLoopDefaultMode, kNoLimit);
     return [idle, outcome] {
         expect(outcome == RunLoopOutcome::Finished, "the run did not end with its last source");

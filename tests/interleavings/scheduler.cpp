@@ -280,7 +280,8 @@ std::string standstill() {
 
 }  // namespace
 
-Object::Object(const char* kind) : _mark(kAlive), _kind(kind), _number(++objectsMade), _apart(objectsAreApart) {
+Object::Object(const char* kind)
+    : _mark(kAlive), _kind(kind), _number(++objectsMade), _apart(objectsAreApart) {
     ++liveObjects;
 }
 

@@ -69,6 +69,7 @@ class Condition {
   public:
     void wait(Mutex& mutex) { waitUntil(mutex, interleavings::TimePoint::max()); }
     void waitUntil(Mutex& mutex, interleavings::TimePoint deadline) {
+        _object.step("wait");
         mutex._give();
         _object.wait("wait", deadline, true);
         mutex._take();

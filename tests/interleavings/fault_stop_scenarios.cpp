@@ -281,13 +281,13 @@ std::vector<Scenario> faultStopScenarios() {
         scenario("fault-stop.last-frame-and-bad-metadata",
                  {.frames = {Lit, WithoutMetadata}, .stopCount = 1}, 1),
         scenario("fault-stop.all", {.frames = {Lit, Unlit, WithoutMetadata, Lit}, .stopCount = 2},
-                 1),
+                 0),
         scenario("fault-stop.frames-after",
-                 {.frames = {Lit, Lit, Lit}, .stopCount = 1, .hostKeeps = true}, 1),
+                 {.frames = {Lit, Lit, Lit}, .stopCount = 1, .hostKeeps = true}, 0),
         scenario("fault-stop.bad-frame-inside-start",
-                 {.frames = {WithoutMetadata, Lit}, .stopCount = 2, .firstInsideStart = true}, 1),
+                 {.frames = {WithoutMetadata, Lit}, .stopCount = 2, .firstInsideStart = true}, 0),
         scenario("fault-stop.stop-waits-for-handler",
-                 {.frames = {Lit, WithoutMetadata, Unlit}, .stopCount = 2, .stopWaits = true}, 1),
+                 {.frames = {Lit, WithoutMetadata, Unlit}, .stopCount = 2, .stopWaits = true}, 0),
     };
 }
 

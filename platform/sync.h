@@ -1,6 +1,6 @@
 // What threads synchronize through: a mutex whose uses clang's thread-safety analysis checks, its scoped
-// lock and its condition, atomics, semaphores, a wake-up for one thread, and the start of a thread. The
-// platform and the module use nothing else, so that another header in place of this one sees, and can
+// lock and its condition, atomics, semaphores, a word to sleep on, and the start of a thread. The platform
+// and the module use nothing else, so that another header in place of this one sees, and can
 // order, every step.
 //
 // Fields say which mutex guards them with ZR_GUARDED_BY; functions that need it held with
@@ -98,56 +98,37 @@ using Atomic = std::atomic<T>;
 
 using Semaphore = std::counting_semaphore<>;
 
-// What one thread waits on until another wakes it. The thread sleeps on the bare system call: no lock is
+// A word that any thread may change and that threads can sleep on, on the bare system call: no lock is
 // taken and none is taken back.
-//
-// Waking a sleeping thread costs both sides microseconds. So a wait that follows a short one first watches
-// for its end without sleeping, and lets others have the processor meanwhile: who is to wake this thread
-// may wait for the same core.
-class Wakeup {
+class SleepWord {
   public:
-    // Returns when wake() has been called since the last wait returned, once for any number of calls. One
-    // thread at a time.
-    void wait() {
-        const auto begin = Clock::now();
-        if (_lastWaitWasShort) {
-            while (_word.load(std::memory_order_relaxed) == Unset &&
-                   Clock::now() - begin < kShort) {
-                sched_yield();
-            }
-        }
-        std::uint32_t seen = Unset;
-        if (_word.compare_exchange_strong(seen, Asleep, std::memory_order_acquire)) {
-            while (_word.load(std::memory_order_acquire) == Asleep) {
-                _futex(FUTEX_WAIT_PRIVATE, Asleep);
-            }
-        }
-        _word.exchange(Unset, std::memory_order_acquire);
-        _lastWaitWasShort = Clock::now() - begin < kShort;
+    explicit SleepWord(std::uint32_t value) : _word(value) {}
+
+    std::uint32_t load(std::memory_order order) const { return _word.load(order); }
+    std::uint32_t exchange(std::uint32_t value, std::memory_order order) {
+        return _word.exchange(value, order);
+    }
+    // Whether the word was `expected`; it is `value` then.
+    bool replace(std::uint32_t expected, std::uint32_t value, std::memory_order order) {
+        return _word.compare_exchange_strong(expected, value, order);
     }
 
-    // Any thread. The object must live until this returns, even if the waiting thread goes on before.
-    void wake() {
-        if (_word.exchange(Set, std::memory_order_acq_rel) == Asleep) {
-            _futex(FUTEX_WAKE_PRIVATE, 1);
-        }
-    }
+    // Sleeps when the word is `value`, until wakeOne(); may wake for no reason.
+    void sleepAt(std::uint32_t value) { _futex(FUTEX_WAIT_PRIVATE, value); }
+    void wakeOne() { _futex(FUTEX_WAKE_PRIVATE, 1); }
 
   private:
-    using Clock = std::chrono::steady_clock;
-    // Ten times what it takes to wake a thread. With half of it, frames at full speed still put threads to
-    // sleep on a slow machine.
-    static constexpr std::chrono::microseconds kShort{40};
-
-    enum State : std::uint32_t { Unset, Set, Asleep };
-
     void _futex(int operation, std::uint32_t value) {
         syscall(SYS_futex, &_word, operation, value, nullptr, nullptr, 0);
     }
 
-    std::atomic<std::uint32_t> _word{Unset};
-    bool _lastWaitWasShort = false;  // belongs to the waiting thread
+    std::atomic<std::uint32_t> _word;
 };
+
+// Lets other threads have the processor.
+inline void yieldProcessor() {
+    sched_yield();
+}
 
 // Runs `body` on a thread of its own that is not joined. An exception that leaves it ends the process
 // where it was thrown, so that the debugger shows the culprit. Throws std::system_error when no thread

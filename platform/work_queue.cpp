@@ -14,6 +14,7 @@
 #include "platform/item_line.h"
 #include "platform/run_tag.h"
 #include "platform/sync.h"
+#include "platform/wakeup.h"
 
 namespace platform {
 

@@ -36,7 +36,7 @@ MAY_INCLUDE = {
                    "host/run"],
 }
 # Where anything may be included from, and where no rule is needed.
-FREE = ["tests", "benchmarks", "fuzz", "examples"]
+FREE = ["tests", "benchmarks", "fuzz", "examples", "tools"]
 FOLDERS = sorted({key.split("/")[0] for key in MAY_INCLUDE})
 INCLUDE = re.compile(r'^\s*#\s*include\s*["<]([^">]+)[">]')
 

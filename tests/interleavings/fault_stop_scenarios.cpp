@@ -10,8 +10,8 @@
 #include "platform/log.h"
 #include "platform/services.h"
 #include "platform/sync.h"
-#include "tests/interleavings/scenario.h"
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scenario.h"
+#include "tools/explore/scheduler.h"
 #include "vantor_fault/fault_experiment.h"
 #include "vantor_fault/frame_description.h"
 

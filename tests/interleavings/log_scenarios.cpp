@@ -4,8 +4,8 @@
 
 #include "platform/log.h"
 #include "platform/sync.h"
-#include "tests/interleavings/scenario.h"
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scenario.h"
+#include "tools/explore/scheduler.h"
 
 namespace interleavings {
 

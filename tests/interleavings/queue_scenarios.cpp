@@ -9,8 +9,8 @@
 
 #include "platform/sync.h"
 #include "platform/work_queue.h"
-#include "tests/interleavings/scenario.h"
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scenario.h"
+#include "tools/explore/scheduler.h"
 
 namespace interleavings {
 

@@ -4,8 +4,8 @@
 #include <vector>
 
 #include "platform/run_loop.h"
-#include "tests/interleavings/scenario.h"
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scenario.h"
+#include "tools/explore/scheduler.h"
 
 namespace interleavings {
 

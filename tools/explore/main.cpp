@@ -18,8 +18,8 @@
 #include "platform/log.h"
 #include "platform/services.h"
 #include "platform/work_queue.h"
-#include "tests/interleavings/scenario.h"
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scenario.h"
+#include "tools/explore/scheduler.h"
 
 using namespace interleavings;
 

@@ -9,7 +9,7 @@
 #include <memory>
 #include <utility>
 
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scheduler.h"
 
 #define ZR_GUARDED_BY(mutex)
 #define ZR_REQUIRES(mutex)

@@ -1,4 +1,4 @@
-#include "tests/interleavings/scheduler.h"
+#include "tools/explore/scheduler.h"
 
 #include <algorithm>
 #include <cstring>

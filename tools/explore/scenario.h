@@ -1,6 +1,6 @@
 // A scenario: what is run in every order, and what must hold after each.
-#ifndef ZR_TESTS_INTERLEAVINGS_SCENARIO_H
-#define ZR_TESTS_INTERLEAVINGS_SCENARIO_H
+#ifndef ZR_TOOLS_EXPLORE_SCENARIO_H
+#define ZR_TOOLS_EXPLORE_SCENARIO_H
 
 #include <functional>
 #include <string_view>

@@ -7,8 +7,8 @@
 //
 // An order is the list of choices that were not the first one. The first choice lets the running thread go
 // on; another one then is a preemption.
-#ifndef ZR_TESTS_INTERLEAVINGS_SCHEDULER_H
-#define ZR_TESTS_INTERLEAVINGS_SCHEDULER_H
+#ifndef ZR_TOOLS_EXPLORE_SCHEDULER_H
+#define ZR_TOOLS_EXPLORE_SCHEDULER_H
 
 #include <chrono>
 #include <cstddef>

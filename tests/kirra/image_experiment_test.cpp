@@ -40,6 +40,8 @@ TEST_F(ImageExperiment, IsSetUpOnAPoweredDisplayAndARunLoop) {
     } kCases[] = {
         {[](auto&) {}, ""},
         {[](auto& profile) { profile.mainDisplayStatus = -536870212; }, kNoDisplay},
+        {[](auto& profile) { profile.registryService = false; },
+         "Could not get the frame buffer to determine device power state."},
         {[](auto& profile) { profile.powered = "on"; }, "The display is not powered."},
         {[](auto& profile) { profile.powered = -0.5; }, ""},
     };
@@ -103,6 +105,14 @@ TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
     }
 }
 
+TEST_F(ImageExperiment, EndsWithTheErrorOfTheSensor) {
+    sensor().errorAtReport = {.report = 2, .error = test::sensorError("overheated")};
+    EXPECT_EQ(run(3, kGenerous), std::nullopt);
+    EXPECT_EQ(error, sensor().errorAtReport->error);
+    EXPECT_EQ(journal(),
+              joined(kOpening, joined(kClosing, kClosing)));  // the stream, then the exit
+}
+
 TEST_F(ImageExperiment, TimesOutAndDropsWhatCame) {
     sensor().maxReports = 2;
     EXPECT_EQ(run(3, 1), std::nullopt);
@@ -121,12 +131,15 @@ TEST_F(ImageExperiment, RunsOnlyOnTheThreadOfItsSetup) {
     EXPECT_EQ(std::make_shared<ZRKirraImageExperiment>()->run(&error), nullptr);
     EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
     const auto experiment = make(1, kGenerous);
-    error = nullptr;
-    std::thread([&] {
-        const auto itsOwn = platform::RunLoop::forThisThread();
-        EXPECT_EQ(experiment->run(&error), nullptr);
-    }).join();
-    EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
+    for (const bool hasRunLoop : {true, false}) {
+        const auto other = hasRunLoop ? experiment : std::make_shared<ZRKirraImageExperiment>();
+        error = nullptr;
+        std::thread([&] {
+            const auto itsOwn = hasRunLoop ? platform::RunLoop::forThisThread() : nullptr;
+            EXPECT_EQ(other->run(&error), nullptr);
+        }).join();
+        EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
+    }
     EXPECT_THAT(journal(), ElementsAre());
 }
 

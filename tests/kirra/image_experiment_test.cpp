@@ -166,6 +166,16 @@ TEST_F(ImageExperiment, ClosesTheSensorAndGoesWhenTheRunThrows) {
         EXPECT_EQ(runLoop->run(platform::kRunLoopDefaultMode, kGenerous), RunLoopOutcome::Finished);
         EXPECT_EQ(journal(), joined(kOpening, kClosing));  // no observer is left
     }
+
+    // An observer that is added first but comes later in the order finds the sensor closed.
+    install();
+    test::Journal seen;
+    const auto after = std::make_shared<platform::RunLoopObserver>(platform::RunLoopObserver{
+        platform::RunLoopExit, 1, [&](std::uint32_t) { seen = journal(); }});
+    runLoop->addObserver(after, platform::kRunLoopDefaultMode);
+    EXPECT_NE(make(1, kGenerous)->run(nullptr), nullptr);
+    EXPECT_EQ(seen, joined(kOpening, kClosing));
+    runLoop->removeObserver(after, platform::kRunLoopDefaultMode);
 }
 
 // Nothing clears the images, nothing is left on the run loop that would act on the next run, and a

@@ -88,7 +88,11 @@ TEST_F(ImageExperiment, CapturesTheImagesInOrder) {
         const List captured = run(images, timeout).value_or(List());
         ASSERT_EQ(captured.size(), expected) << images.text();
         for (std::size_t at = 0; at < captured.size(); ++at) {
-            EXPECT_EQ(captured[at]["frameID"], Value(static_cast<std::uint32_t>(at - 1)));
+            const Value image = captured[at];
+            EXPECT_EQ(image["frameID"], Value(static_cast<std::uint32_t>(at - 1)));
+            EXPECT_EQ(image.dictionary()->size(), 5U);
+            EXPECT_EQ(image["dScanI"].list()->size() + image["dScanQ"].list()->size(), 96U);
+            EXPECT_TRUE(image["tmonDataInC"].number() && image["timestampInMilliseconds"].number());
         }
         EXPECT_EQ(journal(), joined(kOpening, kClosing));
     }
@@ -107,8 +111,12 @@ TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
 
 TEST_F(ImageExperiment, EndsWithTheErrorOfTheSensor) {
     sensor().errorAtReport = {.report = 2, .error = test::sensorError("overheated")};
+    const auto other = std::make_shared<platform::RunLoopSource>([] {});
+    runLoop->addSource(other,
+                       platform::kRunLoopDefaultMode);  // so that the loop does not end by itself
     EXPECT_EQ(run(3, kGenerous), std::nullopt);
     EXPECT_EQ(error, sensor().errorAtReport->error);
+    runLoop->removeSource(other, platform::kRunLoopDefaultMode);
     EXPECT_EQ(journal(),
               joined(kOpening, joined(kClosing, kClosing)));  // the stream, then the exit
 }

@@ -34,6 +34,7 @@ MAY_INCLUDE = {
     "host/zrlab": ["platform", "frame/host_interface", "input", "devices/device",
                    "devices/observed", "devices/simulator/kind", "host/record", "host/report",
                    "host/run"],
+    "tools/mutate": [],
 }
 # Where anything may be included from, and where no rule is needed.
 FREE = ["tests", "benchmarks", "fuzz", "examples", "tools"]

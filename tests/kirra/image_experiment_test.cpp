@@ -40,6 +40,8 @@ TEST_F(ImageExperiment, IsSetUpOnAPoweredDisplayAndARunLoop) {
     } kCases[] = {
         {[](auto&) {}, ""},
         {[](auto& profile) { profile.mainDisplayStatus = -536870212; }, kNoDisplay},
+        {[](auto& profile) { profile.registryService = false; },
+         "Could not get the frame buffer to determine device power state."},
         {[](auto& profile) { profile.powered = "on"; }, "The display is not powered."},
         {[](auto& profile) { profile.powered = -0.5; }, ""},
     };
@@ -86,7 +88,11 @@ TEST_F(ImageExperiment, CapturesTheImagesInOrder) {
         const List captured = run(images, timeout).value_or(List());
         ASSERT_EQ(captured.size(), expected) << images.text();
         for (std::size_t at = 0; at < captured.size(); ++at) {
-            EXPECT_EQ(captured[at]["frameID"], Value(static_cast<std::uint32_t>(at - 1)));
+            const Value image = captured[at];
+            EXPECT_EQ(image["frameID"], Value(static_cast<std::uint32_t>(at - 1)));
+            EXPECT_EQ(image.dictionary()->size(), 5U);
+            EXPECT_EQ(image["dScanI"].list()->size() + image["dScanQ"].list()->size(), 96U);
+            EXPECT_TRUE(image["tmonDataInC"].number() && image["timestampInMilliseconds"].number());
         }
         EXPECT_EQ(journal(), joined(kOpening, kClosing));
     }
@@ -101,6 +107,18 @@ TEST_F(ImageExperiment, SucceedsWithFewerImagesWhenTheSensorIsUnplugged) {
         EXPECT_EQ(images->size(), report - 1);
         EXPECT_EQ(journal(), joined(kOpening, kClosing));
     }
+}
+
+TEST_F(ImageExperiment, EndsWithTheErrorOfTheSensor) {
+    sensor().errorAtReport = {.report = 2, .error = test::sensorError("overheated")};
+    const auto other = std::make_shared<platform::RunLoopSource>([] {});
+    runLoop->addSource(other,
+                       platform::kRunLoopDefaultMode);  // so that the loop does not end by itself
+    EXPECT_EQ(run(3, kGenerous), std::nullopt);
+    EXPECT_EQ(error, sensor().errorAtReport->error);
+    runLoop->removeSource(other, platform::kRunLoopDefaultMode);
+    EXPECT_EQ(journal(),
+              joined(kOpening, joined(kClosing, kClosing)));  // the stream, then the exit
 }
 
 TEST_F(ImageExperiment, TimesOutAndDropsWhatCame) {
@@ -121,12 +139,15 @@ TEST_F(ImageExperiment, RunsOnlyOnTheThreadOfItsSetup) {
     EXPECT_EQ(std::make_shared<ZRKirraImageExperiment>()->run(&error), nullptr);
     EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
     const auto experiment = make(1, kGenerous);
-    error = nullptr;
-    std::thread([&] {
-        const auto itsOwn = platform::RunLoop::forThisThread();
-        EXPECT_EQ(experiment->run(&error), nullptr);
-    }).join();
-    EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
+    for (const bool hasRunLoop : {true, false}) {
+        const auto other = hasRunLoop ? experiment : std::make_shared<ZRKirraImageExperiment>();
+        error = nullptr;
+        std::thread([&] {
+            const auto itsOwn = hasRunLoop ? platform::RunLoop::forThisThread() : nullptr;
+            EXPECT_EQ(other->run(&error), nullptr);
+        }).join();
+        EXPECT_THAT(error, IsPlainError(kDomain, 1, kNoRunLoop));
+    }
     EXPECT_THAT(journal(), ElementsAre());
 }
 
@@ -153,6 +174,16 @@ TEST_F(ImageExperiment, ClosesTheSensorAndGoesWhenTheRunThrows) {
         EXPECT_EQ(runLoop->run(platform::kRunLoopDefaultMode, kGenerous), RunLoopOutcome::Finished);
         EXPECT_EQ(journal(), joined(kOpening, kClosing));  // no observer is left
     }
+
+    // An observer that is added first but comes later in the order finds the sensor closed.
+    install();
+    test::Journal seen;
+    const auto after = std::make_shared<platform::RunLoopObserver>(platform::RunLoopObserver{
+        platform::RunLoopExit, 1, [&](std::uint32_t) { seen = journal(); }});
+    runLoop->addObserver(after, platform::kRunLoopDefaultMode);
+    EXPECT_NE(make(1, kGenerous)->run(nullptr), nullptr);
+    EXPECT_EQ(seen, joined(kOpening, kClosing));
+    runLoop->removeObserver(after, platform::kRunLoopDefaultMode);
 }
 
 // Nothing clears the images, nothing is left on the run loop that would act on the next run, and a

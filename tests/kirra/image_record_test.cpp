@@ -90,4 +90,16 @@ TEST(ImageRecord, IsZeroByDefault) {
                                                       Number(0.0F), Number(std::uint32_t{0})));
 }
 
+TEST(ImageRecord, HasWhatItsOwnerPutsThere) {
+    ZRKirraMendraImage image;
+    image.setFrameID(1);
+    const platform::List two{2};
+    const platform::List three{3};
+    image.setDScanI(two);
+    image.setDScanQ(three);
+    image.setTmonDataInC(4.5F);
+    image.setTimestampInMilliseconds(5);
+    EXPECT_EQ(parts(image), std::tuple(Number(1), two, three, Number(4.5F), Number(5)));
+}
+
 }  // namespace

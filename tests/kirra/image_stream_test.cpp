@@ -7,6 +7,7 @@
 #include "platform/internal_inconsistency.h"
 #include "platform/services.h"
 #include "tests/kirra/kirra_bench.h"
+#include "tests/support/hand_fed_sensor.h"
 
 namespace {
 
@@ -106,9 +107,39 @@ TEST_F(ImageStream, OpensUpToTheStepThatFails) {
     }
 }
 
+// A sensor that leaves an error behind in calls that succeed: none of it is put down to a later call.
+TEST_F(ImageStream, AFailureWithoutAnErrorHasNone) {
+    struct Sensor final : test::HandFedSensor {
+        bool open(platform::ErrorSlot slot) override {
+            *slot = test::sensorError("left by open");
+            return true;
+        }
+        bool setFeatureReportWithID(std::int64_t reportID,
+                                    std::span<const std::byte> /*data*/,
+                                    platform::ErrorSlot slot) override {
+            if (reportID == refused) {
+                return false;
+            }
+            *slot = test::sensorError("left by a report");
+            return true;
+        }
+        std::int64_t refused = 171;
+    };
+    const auto misleading = std::make_shared<Sensor>();
+    platform::installServices({.hid = std::make_shared<test::OneSensorBus>(misleading)});
+    for (const int code : {4, 5}) {
+        EXPECT_FALSE(stream->openWithRunLoop(runLoop, &error));
+        EXPECT_EQ(error->code(), code);
+        EXPECT_EQ(error->underlyingError(), nullptr);
+        misleading->refused = 172;
+    }
+}
+
 TEST_F(ImageStream, ThrowsWithoutHid) {
     platform::installServices({});
-    EXPECT_THROW(stream->openWithRunLoop(runLoop, &error), platform::InternalInconsistency);
+    EXPECT_THAT(
+        [&] { stream->openWithRunLoop(runLoop, &error); },
+        ::testing::ThrowsMessage<platform::InternalInconsistency>("No HID Manager available?!"));
     EXPECT_EQ(error, nullptr);
 }
 
@@ -154,7 +185,7 @@ TEST_F(ImageStream, ClosesAnyNumberOfTimes) {
     std::thread([&] { orphan->openWithRunLoop(RunLoop::forThisThread(), nullptr); }).join();
     journal().clear();
     orphan->close();
-    EXPECT_EQ(journal(), kClosing);
+    EXPECT_THAT(journal(), ElementsAre("no callback", kClosing[1] + " of no loop", "close"));
 }
 
 TEST_F(ImageStream, ReportsWithoutADelegateGoNowhere) {

@@ -42,7 +42,8 @@ struct TappedDevice final : WLIOHIDDeviceInterface {
     }
     void unscheduleFromRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                                std::string_view mode) override {
-        tap->journal.push_back(platform::format("unschedule from %@", mode));
+        tap->journal.push_back(platform::format("unschedule from %@%@", mode,
+                                                runLoop != nullptr ? "" : " of no loop"));
         device->unscheduleFromRunLoop(runLoop, mode);
     }
     bool close(platform::ErrorSlot error) override {

@@ -31,9 +31,7 @@ void reportPerFrame(benchmark::State& state, double switchesBefore) {
 
 void here(benchmark::State& state) {
     platform::setLogSink(nullptr, platform::LogLevel::Error);
-    const auto image = std::make_shared<const platform::ImageBuffer>(
-        platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
-                              metadata::Here::build(metadata::frameEntries())}});
+    const auto image = test::bufferWith(metadata::Here::build(metadata::frameEntries()));
     const double switches = queues::contextSwitches();
     for (auto _ : state) {
         platform::installServices(

@@ -132,7 +132,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const auto log = std::make_shared<LastLine>();
     platform::setLogSink(log, platform::LogLevel::Debug);
     fuzz::installOneStream()->onStart = [&](const WLRylFrameHandler& handler) {
-        handler(fuzz::bufferWith(attached), time);
+        handler(test::bufferWith(attached), time);
         fuzz::runQueued();
     };
     const auto experiment = std::make_shared<ZRVantorFaultExperiment>();

@@ -39,7 +39,7 @@ struct LoopSensor final : test::HandFedSensor {
     bool isClosed = false;
 };
 
-// Installs a new one beside a display that is on.
+// Installs a new one, and a display that is on.
 inline std::shared_ptr<LoopSensor> installLoopSensor() {
     auto sensor = std::make_shared<LoopSensor>();
     const simulator::DisplayProfile display;

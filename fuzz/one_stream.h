@@ -9,31 +9,18 @@
 
 #include "devices/simulator/meterix_facility.h"
 #include "platform/services.h"
-#include "platform/welkin/capture.h"
-#include "tests/support/hand_fed_camera.h"
+#include "tests/support/one_stream_capture.h"
 
 namespace fuzz {
 
-struct OneStream final : test::HandFedCapture {
-    OneStream() : HandFedCapture([](std::int64_t /*frame*/) { return nullptr; }) {}
-
-    bool setValue(const platform::Value& value,
-                  std::string_view forProperty,
-                  platform::ErrorSlot /*error*/) override {
-        if (forProperty == kRylCaptureStreamProperty_VideoOutputHandlers) {
-            handlers = value;
-        }
-        return true;
-    }
+struct OneStream final : test::OneStreamCapture {
     bool start(platform::ErrorSlot /*error*/) override {
-        onStart(*handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                         [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                             .object<WLRylFrameHandler>());
+        onStart(frameHandler());
         return true;
     }
+    bool stop(platform::ErrorSlot /*error*/) override { return true; }
 
     std::function<void(const WLRylFrameHandler& handler)> onStart;
-    platform::Value handlers;
 };
 
 // Installs a new one, and a facility with one counter.
@@ -46,11 +33,6 @@ inline std::shared_ptr<OneStream> installOneStream() {
          .meterix = simulator::makeMeterixFacility(std::move(counters),
                                                    std::make_shared<simulator::StreamProgress>())});
     return stream;
-}
-
-inline platform::ImageBufferRef bufferWith(platform::Value metadata) {
-    return std::make_shared<const platform::ImageBuffer>(platform::Dictionary{
-        {kRylCaptureSampleBufferAttachmentKey_MetadataDictionary, std::move(metadata)}});
 }
 
 }  // namespace fuzz

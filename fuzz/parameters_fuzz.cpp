@@ -52,7 +52,7 @@ void tryFault(const Dictionary& parameters) {
     static const auto camera = simulator::healthyCapture().streams.back();
     fuzz::installOneStream()->onStart = [](const WLRylFrameHandler& handler) {
         for (std::uint64_t frame = 1; frame <= kDelivered; ++frame) {
-            handler(fuzz::bufferWith(simulator::frameMetadata(camera, frame, 0)), {});
+            handler(test::bufferWith(simulator::frameMetadata(camera, frame, 0)), {});
             fuzz::runQueued();
         }
     };

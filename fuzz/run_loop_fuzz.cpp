@@ -2,9 +2,14 @@
 // order of events on both. The clock stands still but where the program sets it.
 //
 // Input: operations, each a letter and what it needs (sources 0 to 3, observers 0 to 3, modes 0 to 3):
-// s signal a source, a add and r remove one in a mode, o add and p remove an observer in a mode, t a quarter of
-// a second passes, x stop, ! throw, R run a mode with one of eight limits, . the callback returns. When a loop
-// is about to wait for good: z the time passes, any other digit a source is added and signalled.
+//   s     signals a source
+//   a, r  add and remove a source in a mode
+//   o, p  add and remove an observer in a mode
+//   t     lets a quarter of a second pass
+//   x, !  stop, and throw
+//   R     runs a mode with one of eight limits
+//   .     returns from the callback
+// When a loop is about to wait for good, z lets the time pass, and any other digit adds and signals a source.
 #include "platform/run_loop.h"
 
 #include <cmath>

@@ -2,10 +2,14 @@
 // with the tag of who queued them, and let go of what they own before the next one starts, also when items
 // queue items, end holds and drop the queue.
 //
-// Input: operations, by the maker up to the first '.', then by each item up to the next one: q queue an item,
-// Q one that owns too much to fit inside, n one with a delay that is none (0, -1, NaN or minus infinity), d one
-// with a delay of a nanosecond, h hold, u end a hold, g change the tag, x drop the queue. The delayed ones
-// have an order of their own, and do nothing.
+// Input: operations, by the maker up to the first '.', then by each item up to the next one:
+//   q     queues an item
+//   Q     queues an item that owns too much to fit inside
+//   n     queues an item with a delay of 0, -1, NaN or minus infinity: it is not delayed
+//   d     queues an item with a delay of a nanosecond; these have an order of their own, and do nothing
+//   h, u  hold the queue, and end a hold
+//   g     changes the tag
+//   x     drops the queue
 #include "platform/work_queue.h"
 
 #include <array>

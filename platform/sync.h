@@ -1,7 +1,7 @@
 // What threads synchronize through: a mutex whose uses clang's thread-safety analysis checks, its scoped
 // lock and its condition, atomics, semaphores, a word to sleep on, and the start of a thread. The platform
-// and the module use nothing else, so that another header in place of this one sees, and can
-// order, every step.
+// and the module use nothing else, so that another header in place of this one sees, and can order, every
+// step.
 //
 // Fields say which mutex guards them with ZR_GUARDED_BY; functions that need it held with
 // ZR_REQUIRES. Under other compilers the annotations expand to nothing.

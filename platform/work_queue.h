@@ -9,11 +9,12 @@
 // Threads  Every operation may be called on any thread, and never waits for a running item.
 // Cost     Queueing takes a lock that the queue's thread holds only for a moment, and wakes the thread
 //          when it sleeps. While items come less than 40 µs apart, the thread watches for the next one
-//          instead of sleeping, and yields its core to whoever wants it. While no more than 32 items wait, one that captured up to 64 bytes
-//          allocates nothing; a longer queue allocates once per 32 items. The queue's thread exists
-//          while there are items or the queue is held (see Hold). An item for a queue that is not held
-//          and has no items costs the start of a thread. The delayed items of all queues wait on one
-//          further thread, which exists while there are any or a queue is held.
+//          instead of sleeping, and lets other threads use its core meanwhile. While no more than 32
+//          items wait, one that captured up to 64 bytes allocates nothing; a longer queue allocates once
+//          per 32 items. The queue's thread exists while there are items or the queue is held (see
+//          Hold). An item for a queue that is not held and has no items costs the start of a thread. The
+//          delayed items of all queues wait on one further thread, which exists while there are any or a
+//          queue is held.
 // Failure  Queueing and holding throw std::system_error when they need a thread and none can be
 //          started; the item is then dropped. A held queue needs no new thread, so neither throws. A
 //          delayed item whose time has come and for which no thread can be started stays queued, and

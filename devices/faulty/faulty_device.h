@@ -40,7 +40,7 @@ class Injector;
 class FaultyDevice {
   public:
     // Makes a device with its state as at the start; a service that it leaves null counts as not
-    // available, and is no step.
+    // available, and is not a step.
     using Factory = std::function<platform::Services()>;
 
     // The steps of each kind that steps() has at most; later ones are counted and can fail as well.

@@ -10,6 +10,7 @@
 #include "platform/log.h"
 #include "platform/services.h"
 #include "platform/sync.h"
+#include "tests/support/one_stream_capture.h"
 #include "tools/explore/scenario.h"
 #include "tools/explore/scheduler.h"
 #include "vantor_fault/fault_experiment.h"
@@ -47,9 +48,7 @@ platform::ImageBufferRef makeBuffer(Frame frame) {
     }();
     platform::MutableDictionary metadata = everyColumn;
     metadata.set(kRylCaptureStreamMetadata_InfraredLightSource, frame == Frame::Lit ? 1 : 0);
-    return std::make_shared<const platform::ImageBuffer>(
-        platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
-                              platform::Dictionary(std::move(metadata))}});
+    return test::bufferWith(platform::Dictionary(std::move(metadata)));
 }
 
 // What one execution showed. Threads run one at a time: no lock.
@@ -95,45 +94,19 @@ class WitnessLog final : public platform::LogSink {
 };
 
 // The capture service with one camera: delivers the frames on a thread of its own, also after the stop.
-class Camera final : public WLISPCapturePlugIn,
-                     public WLRylCaptureDevice,
-                     public WLRylCaptureStream,
-                     public std::enable_shared_from_this<Camera> {
+class Camera final : public test::OneStreamCapture {
   public:
     Camera(Settings settings, std::shared_ptr<Witness> witness)
         : _settings(std::move(settings)), _witness(std::move(witness)) {}
 
-    std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot /*error*/) override {
-        return shared_from_this();
-    }
-    std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot /*error*/) override {
-        return WLRylCaptureStreamList{shared_from_this()};
-    }
-    bool requestControlOfStreams(const WLRylCaptureStreamList& /*streams*/,
-                                 platform::ErrorSlot /*error*/) override {
-        return true;
-    }
-    bool invalidate(platform::ErrorSlot /*error*/) override {
+    bool invalidate(platform::ErrorSlot error) override {
         step("invalidate");
-        return true;
+        return OneStreamCapture::invalidate(error);
     }
-
     platform::Value valueForProperty(std::string_view property,
-                                     platform::ErrorSlot /*error*/) override {
+                                     platform::ErrorSlot error) override {
         step("valueForProperty");
-        return property == kRylCaptureStreamProperty_PortType
-                   ? platform::Value(kRylCapturePortType_FrontFacingInfraredCamera)
-                   : platform::Value(platform::Dictionary());
-    }
-    bool setValue(const platform::Value& value,
-                  std::string_view forProperty,
-                  platform::ErrorSlot /*error*/) override {
-        if (forProperty == kRylCaptureStreamProperty_VideoOutputHandlers) {
-            _handler = *value[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                             [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                                 .object<WLRylFrameHandler>();
-        }
-        return true;
+        return OneStreamCapture::valueForProperty(property, error);
     }
     bool start(platform::ErrorSlot /*error*/) override {
         step("start");
@@ -141,9 +114,9 @@ class Camera final : public WLISPCapturePlugIn,
         if (_settings.firstInsideStart) {
             _deliver(next++);
         }
-        platform::startThread([self = shared_from_this(), next]() mutable {
-            while (next < self->_settings.frames.size()) {
-                self->_deliver(next++);
+        platform::startThread([this, self = shared_from_this(), next]() mutable {
+            while (next < _settings.frames.size()) {
+                _deliver(next++);
             }
         });
         return true;
@@ -173,13 +146,12 @@ class Camera final : public WLISPCapturePlugIn,
             }
         };
         setInside(true);
-        _handler(buffer, {});
+        frameHandler()(buffer, {});
         setInside(false);
     }
 
     const Settings _settings;
     const std::shared_ptr<Witness> _witness;
-    WLRylFrameHandler _handler;
     platform::Mutex _mutex;
     platform::Condition _changed;
     bool _inside = false;  // a handler is in progress

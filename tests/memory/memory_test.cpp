@@ -6,10 +6,8 @@
 #include <chrono>
 #include <csignal>
 #include <cstdlib>
-#include <filesystem>
 #include <functional>
 #include <iostream>
-#include <iterator>
 #include <map>
 #include <memory>
 #include <new>
@@ -29,6 +27,7 @@
 #include "platform/log.h"
 #include "platform/run_loop.h"
 #include "platform/services.h"
+#include "tests/platform/threads.h"
 #include "tests/support/eventually.h"
 #include "vantor_counters/counter_analysis.h"
 #include "vantor_counters/counter_experiment.h"
@@ -152,11 +151,6 @@ Sizes takeTurn(const Run& run, platform::ErrorSlot error) {
     return {result->measurements().size(), measured, result->auxiliaryData().size()};
 }
 
-std::size_t threads() {
-    return static_cast<std::size_t>(
-        std::distance(std::filesystem::directory_iterator("/proc/self/task"), {}));
-}
-
 // A run on a device of its own in which the n-th allocation fails; 0: none does. Says on the standard
 // error what it finds wrong.
 Outcome runOnce(const Run& run, long failing, Sizes& sizes) {
@@ -182,8 +176,8 @@ Outcome runOnce(const Run& run, long failing, Sizes& sizes) {
         }
         platform::installServices({});
     }
-    if (!test::eventually([&] { return threads() == 1; })) {
-        std::cerr << threads() << " threads are left\n";
+    if (!test::eventually([&] { return test::threadCount() == 1; })) {
+        std::cerr << test::threadCount() << " threads are left\n";
         return kWrong;
     }
     if (liveAllocations != before) {
@@ -202,7 +196,7 @@ TEST_P(EveryAllocation, FailsOnceWithoutHarm) {
     platform::installServices(simulator::makeDevice(simulator::DeviceProfile(), 0));
     takeTurn(GetParam(), nullptr);
     platform::installServices({});
-    ASSERT_TRUE(test::eventually([] { return threads() == 1; }));
+    ASSERT_TRUE(test::eventually([] { return test::threadCount() == 1; }));
     Sizes healthy;
     ASSERT_EQ(runOnce(GetParam(), 0, healthy), kHealthy);
 

@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <map>
 #include <string>
 #include <system_error>
@@ -23,6 +24,11 @@ inline std::map<std::string, std::size_t> threadNames() {
         ++names[name];
     }
     return names;
+}
+
+inline std::size_t threadCount() {
+    return static_cast<std::size_t>(
+        std::distance(std::filesystem::directory_iterator("/proc/self/task"), {}));
 }
 
 inline std::size_t threadsNamed(const std::string& name) {

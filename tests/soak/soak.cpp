@@ -18,7 +18,6 @@
 #include <random>
 #include <string>
 #include <string_view>
-#include <thread>
 #include <utility>
 #include <vector>
 
@@ -32,6 +31,8 @@
 #include "kirra/image_experiment.h"
 #include "platform/log.h"
 #include "platform/services.h"
+#include "tests/platform/threads.h"
+#include "tests/support/eventually.h"
 #include "tests/support/hand_fed_camera.h"
 #include "vantor_counters/counter_experiment.h"
 #include "vantor_fault/fault_experiment.h"
@@ -56,11 +57,6 @@ const auto kFails = simulator::Fault::failing(nullptr);
 
 using Image = std::shared_ptr<const ImageBuffer>;
 
-Image imageWith(platform::Value metadata) {
-    return std::make_shared<const ImageBuffer>(
-        Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary, std::move(metadata)}});
-}
-
 // A lit frame in which one number is another; an absent one is missing.
 Image imageWith(std::string_view key, platform::Value changed) {
     const auto camera = simulator::healthyCapture().streams.back();
@@ -73,7 +69,7 @@ Image imageWith(std::string_view key, platform::Value changed) {
             metadata.set(name, changed);
         }
     }
-    return imageWith(Dictionary(std::move(metadata)));
+    return test::bufferWith(Dictionary(std::move(metadata)));
 }
 
 // What is wrong in a run, and the code of its error; 0: it has a result.
@@ -93,7 +89,7 @@ std::vector<CaptureFault> captureFaults() {
         {.name = "unlit", .code = 206, .image = imageWith(light, 0)},
         {.name = "a number is missing", .code = 206, .image = imageWith("HardwareEvents", {})},
         {.name = "a text for a number", .code = 206, .image = imageWith(light, "1")},
-        {.name = "metadata are no dictionary", .code = 206, .image = imageWith(7)},
+        {.name = "metadata are no dictionary", .code = 206, .image = test::bufferWith(7)},
         {.name = "no metadata", .code = 206, .image = std::make_shared<ImageBuffer>(Dictionary())},
         {.name = "no start", .code = 204, .starts = false},
         {.name = "no stop", .code = 205, .stops = false},
@@ -248,12 +244,13 @@ class Soak {
 struct Figures {
     double kilobytes;  // allocated and not freed, by all of the process's threads
     double megabytes;  // resident, after what is free was given back
-    std::ptrdiff_t threads;
-    std::ptrdiff_t descriptors;
+    std::size_t threads;
+    std::size_t descriptors;
 };
 
-std::ptrdiff_t entriesOf(const char* folder) {
-    return std::distance(std::filesystem::directory_iterator(folder), {});
+std::size_t descriptors() {
+    return static_cast<std::size_t>(
+        std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {}));
 }
 
 // From the totals that end the allocator's own report of its state.
@@ -277,20 +274,17 @@ double kilobytesInUse() {
            1e3;
 }
 
-// Waits, within reason, until the threads of earlier runs are gone and their time-outs have passed.
-Figures settle(std::ptrdiff_t threads) {
+// Waits until the threads of earlier runs are gone and their time-outs have passed.
+Figures settle() {
     platform::installServices({});
-    const auto deadline = Clock::now() + std::chrono::minutes(1);
-    while (entriesOf("/proc/self/task") > threads && Clock::now() < deadline) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
+    test::eventually([] { return test::threadCount() == 1; });
     malloc_trim(0);
     std::ifstream statm("/proc/self/statm");
     double pages = 0;
     double resident = 0;
     statm >> pages >> resident;
     return {kilobytesInUse(), resident * static_cast<double>(sysconf(_SC_PAGESIZE)) / 1e6,
-            entriesOf("/proc/self/task"), entriesOf("/proc/self/fd")};
+            test::threadCount(), descriptors()};
 }
 
 // Kilobytes. The allocator keeps that much for threads of its choice.
@@ -302,9 +296,9 @@ void soak(const char* what, std::int64_t amount, const std::function<void(std::i
     Figures first{};
     for (int tenth = 1; tenth <= 10; ++tenth) {
         work(amount * tenth / 10 - amount * (tenth - 1) / 10);
-        const Figures now = settle(1);
+        const Figures now = settle();
         std::printf(
-            "%12lld %s %9.1f kB allocated %7.1f MB resident %3td threads %3td descriptors\n",
+            "%12lld %s %9.1f kB allocated %7.1f MB resident %3zu threads %3zu descriptors\n",
             static_cast<long long>(amount * tenth / 10), what, now.kilobytes, now.megabytes,
             now.threads, now.descriptors);
         std::fflush(stdout);

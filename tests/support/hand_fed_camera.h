@@ -11,7 +11,7 @@
 #include <thread>
 #include <utility>
 
-#include "platform/welkin/capture.h"
+#include "tests/support/one_stream_capture.h"
 
 namespace test {
 
@@ -63,35 +63,15 @@ class Camera {
     std::thread _thread;
 };
 
-// The camera as the capture service's stream, device and plug-in. Ends with its last owner, which must not
-// be a thread of the run: it waits for the camera.
-class HandFedCapture : public WLRylCaptureStream,
-                       public WLRylCaptureDevice,
-                       public WLISPCapturePlugIn,
-                       public std::enable_shared_from_this<HandFedCapture> {
+// The camera as a capture service. Ends with its last owner, which must not be a thread of the run: it waits
+// for the camera.
+class HandFedCapture : public OneStreamCapture {
   public:
     explicit HandFedCapture(Camera<platform::ImageBuffer>::Source source)
         : _camera(std::move(source)) {}
 
-    platform::Value valueForProperty(std::string_view property,
-                                     platform::ErrorSlot /*error*/) override {
-        if (property == kRylCaptureStreamProperty_PortType) {
-            return kRylCapturePortType_FrontFacingInfraredCamera;
-        }
-        return platform::Dictionary();
-    }
-    bool setValue(const platform::Value& value,
-                  std::string_view forProperty,
-                  platform::ErrorSlot /*error*/) override {
-        if (forProperty == kRylCaptureStreamProperty_VideoOutputHandlers) {
-            _handlers = value;
-        }
-        return true;
-    }
     bool start(platform::ErrorSlot /*error*/) override {
-        _camera.start(*_handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler]
-                                [kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler]
-                                    .object<WLRylFrameHandler>());
+        _camera.start(frameHandler());
         return true;
     }
     bool stop(platform::ErrorSlot /*error*/) override {
@@ -99,20 +79,7 @@ class HandFedCapture : public WLRylCaptureStream,
         return true;
     }
 
-    std::shared_ptr<WLRylCaptureDevice> device(platform::ErrorSlot /*error*/) override {
-        return shared_from_this();
-    }
-    std::optional<WLRylCaptureStreamList> streams(platform::ErrorSlot /*error*/) override {
-        return WLRylCaptureStreamList{shared_from_this()};
-    }
-    bool requestControlOfStreams(const WLRylCaptureStreamList& /*streams*/,
-                                 platform::ErrorSlot /*error*/) override {
-        return true;
-    }
-    bool invalidate(platform::ErrorSlot /*error*/) override { return true; }
-
   private:
-    platform::Value _handlers;
     Camera<platform::ImageBuffer> _camera;
 };
 

@@ -1,6 +1,7 @@
 #include "tests/vantor_fault/fault_bench.h"
 
 #include "devices/simulator/frame_metadata.h"
+#include "tests/support/one_stream_capture.h"
 
 namespace test {
 
@@ -112,9 +113,7 @@ WLRylEventHandler FaultTest::eventHandler(const Experiment& experiment) {
 
 platform::ImageBufferRef FaultTest::buffer() {
     const auto profile = simulator::healthyCapture().streams.back();
-    return std::make_shared<const platform::ImageBuffer>(
-        platform::Dictionary{{kRylCaptureSampleBufferAttachmentKey_MetadataDictionary,
-                              simulator::frameMetadata(profile, 1, 0)}});
+    return bufferWith(simulator::frameMetadata(profile, 1, 0));
 }
 
 std::size_t FaultTest::liveBuffers() const {

@@ -2,8 +2,8 @@
 //
 //     ZR_FAULT_PAIRS=100000 ZR_FAULT_SEED=17 faulty_test --gtest_filter='FaultPairs.*'
 //
-// tries so many pairs of each experiment, chosen by the seed; or all of them when there are no more. Without the
-// variables there are a few, and the seed is another one every time.
+// tries that many pairs of each experiment, chosen by the seed, or all of them if there are fewer. Without the
+// variables it tries a few, and the seed is another one every time.
 #include <algorithm>
 #include <cstdlib>
 #include <random>

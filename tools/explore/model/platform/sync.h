@@ -74,10 +74,6 @@ class Condition {
         _object.wait("wait", deadline, true);
         mutex._take();
     }
-    void notifyOne() {
-        _object.step("notifyOne");
-        _object.wakeOne();
-    }
     void notifyAll() {
         _object.step("notifyAll");
         _object.wakeAll();

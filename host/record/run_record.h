@@ -17,6 +17,7 @@
 #include <utility>
 #include <vector>
 
+#include "host/record/identity.h"
 #include "host/record/plugin_data.h"
 #include "host/record/run_plan.h"
 #include "platform/error.h"
@@ -110,6 +111,7 @@ struct FrameRecord {
 
 // One run of a diagnostic, or of an experiment on its own.
 struct RunRecord {
+    std::string uuid;          // names the run everywhere, see newUuid()
     RunPlan plan;              // what was run
     std::uint64_t number = 1;  // which repetition, from 1
     platform::RunTag tag = 0;  // under which its log lines come
@@ -184,6 +186,7 @@ inline constexpr std::size_t kMostOutcomes = 1000;
 struct SessionRecord {
     std::string version;      // of the program
     std::string commandLine;  // as it was given
+    Identity identity;        // of the unit, and of the place
     std::string deviceName;
     std::string deviceSummary;
     // What the device says of itself: names and texts, in its order.

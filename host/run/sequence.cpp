@@ -10,6 +10,7 @@
 #include <thread>
 #include <utility>
 
+#include "host/record/uuid.h"
 #include "host/run/judge.h"
 #include "platform/run_loop.h"
 #include "platform/run_tag.h"
@@ -31,6 +32,7 @@ class Sequence {
   public:
     Sequence(const Bench& bench, const RunPlan& plan, std::uint64_t number)
         : _bench(bench), _plan(plan), _tag(bench.recorder.begin()) {
+        _run.uuid = newUuid();
         _run.plan = plan;
         _run.number = number;
     }

@@ -47,13 +47,13 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
     const std::string label;
     const Priority priority;
 
-    void push(Queued&& item) {
+    void push(WorkItem&& item, RunTag run) {
         // Once the lock is given up, the item may have run and dropped every other reference.
         std::shared_ptr<State> waiting;
         {
             const MutexLock lock(_mutex);
             _needThread();  // first: if none can be started, nothing was queued
-            _items.add(std::move(item));
+            _items.add(std::move(item), run);
             if (std::exchange(_isWaiting, false)) {
                 waiting = shared_from_this();
             }
@@ -69,7 +69,7 @@ class WorkQueue::State : public std::enable_shared_from_this<State> {
         {
             const MutexLock lock(_mutex);
             if (item.has_value()) {
-                _items.add(std::move(*item));
+                _items.add(std::move(item->item), item->run);
             }
             try {
                 if (!_items.isEmpty()) {
@@ -253,7 +253,7 @@ WorkQueue::Priority WorkQueue::priority() const {
 }
 
 void WorkQueue::async(Item&& item) {
-    _state->push({std::move(item), currentRunTag()});
+    _state->push(std::move(item), currentRunTag());
 }
 
 void WorkQueue::after(std::chrono::duration<double> delay, Item&& item) {

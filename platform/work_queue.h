@@ -9,9 +9,9 @@
 // Threads  Every operation may be called on any thread, and never waits for a running item.
 // Cost     Queueing takes a lock that the queue's thread holds only for a moment, and wakes the thread
 //          when it sleeps. While items come less than 40 µs apart, the thread watches for the next one
-//          instead of sleeping, and lets other threads use its core meanwhile. While no more than 32
-//          items wait, one that captured up to 64 bytes allocates nothing; a longer queue allocates once
-//          per 32 items. The queue's thread exists while there are items or the queue is held (see
+//          instead of sleeping, and lets other threads use its core meanwhile. An item that captured up to
+//          64 bytes allocates nothing, once as many items have waited before; where more than 1,024 wait,
+//          every 32nd allocates. The queue's thread exists while there are items or the queue is held (see
 //          Hold). An item for a queue that is not held and has no items costs the start of a thread. The
 //          delayed items of all queues wait on one further thread, which exists while there are any or a
 //          queue is held.

@@ -22,6 +22,7 @@ FUNCTIONS = {Kind.FUNCTION_DECL, Kind.CXX_METHOD, Kind.CONSTRUCTOR, Kind.DESTRUC
              Kind.CONVERSION_FUNCTION, Kind.FUNCTION_TEMPLATE}
 BLOCKS = {Kind.IF_STMT, Kind.FOR_STMT, Kind.WHILE_STMT, Kind.CXX_FOR_RANGE_STMT, Kind.SWITCH_STMT,
           Kind.CXX_TRY_STMT}
+INITIALIZER = re.compile(r"(\[\[gnu::constructor\]\])( void (\w+)\(\))")
 NAMED = {Kind.DECL_REF_EXPR, Kind.MEMBER_REF_EXPR, Kind.CXX_THIS_EXPR}
 
 
@@ -176,7 +177,11 @@ class File:
         return min(held, key=lambda r: r[1] - r[0])[2] if held else None
 
     def write(self, folder):
-        text = self.written()
+        # An initializer of the loader runs before the constants of its file are made, once they are chosen at
+        # run time. Here it runs behind them, as the file's last.
+        text = INITIALIZER.sub(lambda found: " " * len(found[1]) + found[2], self.written())
+        for found in INITIALIZER.finditer(self.text):
+            text += f"static const bool zrInitialized{found.start()} = ({found[3]}(), true);\n"
         self._written_starts = [0] + [at + 1 for at, c in enumerate(text) if c == "\n"]
         target = folder / self.name
         target.parent.mkdir(parents=True, exist_ok=True)

@@ -20,6 +20,13 @@ constexpr std::string_view kDomain = ZRKirraImageExperimentErrorDomain;
 constexpr std::uint64_t kMostExpected = 16'384;
 constexpr std::string_view kNoRunLoop = "Kirra is a HID device that requires a current run loop.";
 
+// Keys of an image's dictionary.
+constexpr platform::StringKey kFrameID("frameID");
+constexpr platform::StringKey kDScanI("dScanI");
+constexpr platform::StringKey kDScanQ("dScanQ");
+constexpr platform::StringKey kTmonDataInC("tmonDataInC");
+constexpr platform::StringKey kTimestampInMilliseconds("timestampInMilliseconds");
+
 // Why the display does not count as powered; empty when it does.
 std::string_view displayProblem() {
     const platform::Services services = platform::services();
@@ -44,11 +51,14 @@ std::string_view displayProblem() {
 }
 
 platform::Dictionary dictionaryOf(const ZRKirraMendraImage& image) {
-    return {{"frameID", image.frameID()},
-            {"dScanI", image.dScanI()},
-            {"dScanQ", image.dScanQ()},
-            {"tmonDataInC", image.tmonDataInC()},
-            {"timestampInMilliseconds", image.timestampInMilliseconds()}};
+    platform::MutableDictionary entries;
+    entries.reserve(5);
+    entries.set(kFrameID, image.frameID());
+    entries.set(kDScanI, image.dScanI());
+    entries.set(kDScanQ, image.dScanQ());
+    entries.set(kTmonDataInC, image.tmonDataInC());
+    entries.set(kTimestampInMilliseconds, image.timestampInMilliseconds());
+    return entries;
 }
 
 // Observes a run loop as long as it lives.

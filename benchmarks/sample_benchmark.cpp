@@ -10,6 +10,7 @@
 #include <benchmark/benchmark.h>
 
 #include "benchmarks/metadata.h"
+#include "platform/string_key.h"
 #include "vantor_counters/counter_analysis.h"
 #include "vantor_counters/counter_report.h"
 #include "vantor_counters/expected_channels.h"
@@ -81,6 +82,18 @@ struct HashMap
     static constexpr const char* kName = "std::unordered_map";
 };
 
+// Each sample's name is read and hashed, and nothing made of it: what the samples' own memory costs.
+void readNames(benchmark::State& state) {
+    const platform::MeterixSamples samples = channels(state.range(0));
+    for (auto _ : state) {
+        for (const WLMeterixSample& sample : samples) {
+            benchmark::DoNotOptimize(
+                platform::StringKey(sample.channel().channelDescription().name()).hash());
+        }
+    }
+    state.SetItemsProcessed(state.iterations() * state.range(0));
+}
+
 template <class Contender>
 void measure(benchmark::State& state) {
     const platform::MeterixSamples samples = channels(state.range(0));
@@ -103,6 +116,7 @@ bool registerFor() {
                                       measure<Contenders>)
              ->Arg(count),
          ...);
+        benchmark::RegisterBenchmark("samples/names read only", readNames)->Arg(count);
     }
     return true;
 }

@@ -17,15 +17,15 @@ class WorkItem {
   public:
     WorkItem() = default;  // empty; must not be run
 
-    template <class Given, class Callable = std::decay_t<Given>>
+    template <class Callable>
     requires(!std::same_as<Callable, WorkItem> && std::invocable<Callable&>)
-        WorkItem(Given&& callable) {
+        WorkItem(Callable callable) {
         if constexpr (kFitsInside<Callable>) {
-            ::new (static_cast<void*>(_inside)) Callable(std::forward<Given>(callable));
+            ::new (static_cast<void*>(_inside)) Callable(std::move(callable));
             _operations = &kOperationsOf<Callable>;
         } else {
-            *this = WorkItem(
-                [kept = std::make_unique<Callable>(std::forward<Given>(callable))] { (*kept)(); });
+            *this =
+                WorkItem([kept = std::make_unique<Callable>(std::move(callable))] { (*kept)(); });
         }
     }
 

@@ -254,9 +254,11 @@ void play(const SessionRecord& session, host::RunListener& listener) {
         }
         // Some at a time, as they come.
         for (std::size_t at = 0; at < run.frames.size(); at += 32) {
-            listener.framesDelivered(
-                std::span(run.frames)
-                    .subspan(at, std::min<std::size_t>(32, run.frames.size() - at)));
+            const auto frames = std::span(run.frames)
+                                    .subspan(at, std::min<std::size_t>(32, run.frames.size() - at));
+            listener.framesDelivered({.frames = {frames.begin(), frames.end()},
+                                      .metadata = std::vector<platform::Dictionary>(frames.size()),
+                                      .events = {}});
         }
         tell(host::Part::Experiment, false);
         // What was given up does not end its part.

@@ -2,7 +2,6 @@
 
 #include <latch>
 #include <numeric>
-#include <span>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -57,9 +56,9 @@ TEST(RunRecorder, HandsOnEveryFrameInItsOrderWithoutWaitingForItsReader) {
         std::latch goesOn(1);
         std::vector<std::uint64_t> numbers;
         host::RunRecorder recorder([](const host::LogRecord&) {}, false,
-                                   [&](std::span<const host::FrameRecord> frames) {
+                                   [&](const host::FrameBatch& batch) {
                                        goesOn.wait();
-                                       for (const host::FrameRecord& frame : frames) {
+                                       for (const host::FrameRecord& frame : batch.frames) {
                                            numbers.push_back(frame.number);
                                        }
                                    });

@@ -1,0 +1,62 @@
+#include "host/run/figure.h"
+
+#include <cmath>
+
+namespace host {
+
+namespace {
+
+constexpr std::size_t kInterval = 1;
+constexpr std::size_t kArrivalInterval = 2;
+constexpr std::size_t kFirstTemperature = 3;
+constexpr std::size_t kImageTemperature = kFirstTemperature + kTemperatureCount;
+constexpr std::size_t kImageAmplitude = kImageTemperature + 1;
+static_assert(kImageAmplitude + 1 == kFigureCount);
+
+// Absent when the image has no samples.
+std::optional<double> amplitudeOf(const ImageView& image) {
+    if (image.samplesI == nullptr || image.samplesQ == nullptr) {
+        return std::nullopt;
+    }
+    Range amplitudes;
+    const std::size_t count = std::min(image.samplesI->size(), image.samplesQ->size());
+    for (std::size_t at = 0; at < count; ++at) {
+        amplitudes.add(std::hypot((*image.samplesI)[at].asNumber().asDouble(),
+                                  (*image.samplesQ)[at].asNumber().asDouble()));
+    }
+    return amplitudes.isEmpty() ? std::nullopt : std::optional(amplitudes.greatest());
+}
+
+}  // namespace
+
+void Figures::addFrame(const FrameRecord& frame) {
+    if (_last.has_value()) {
+        _ranges[kInterval].add((frame.presentation - _last->presentation) * 1000);
+        _ranges[kArrivalInterval].add((frame.delivered - _last->delivered) * 1000);
+    }
+    for (std::size_t at = 0; at < kTemperatureCount; ++at) {
+        if (frame.temperatures[at].has_value()) {
+            _ranges[kFirstTemperature + at].add(*frame.temperatures[at]);
+        }
+    }
+    _last = frame;
+}
+
+void Figures::addRest(const RunRecord& run) {
+    if (run.framesLost.has_value()) {
+        _ranges[kFramesLostFigure].add(static_cast<double>(*run.framesLost));
+    }
+    const platform::List* images = imagesOf(run.auxiliaryData);
+    for (std::size_t at = 0; images != nullptr && at < images->size(); ++at) {
+        const platform::Value value = (*images)[at];
+        const ImageView image(value);
+        if (image.celsius.isPresent()) {
+            _ranges[kImageTemperature].add(image.celsius.asDouble());
+        }
+        if (const std::optional<double> amplitude = amplitudeOf(image)) {
+            _ranges[kImageAmplitude].add(*amplitude);
+        }
+    }
+}
+
+}  // namespace host

@@ -1,6 +1,7 @@
 #include "host/run/figure.h"
 
 #include <cmath>
+#include <cstdlib>
 
 namespace host {
 
@@ -12,6 +13,13 @@ constexpr std::size_t kFirstTemperature = 3;
 constexpr std::size_t kImageTemperature = kFirstTemperature + kTemperatureCount;
 constexpr std::size_t kImageAmplitude = kImageTemperature + 1;
 static_assert(kImageAmplitude + 1 == kFigureCount);
+
+// A float through its own shortest text, or 86.1 would be judged and shown as 86.0999984741211.
+double asWritten(const platform::Number& number) {
+    return number.kind() == platform::Number::Kind::Float
+               ? std::strtod(number.text().c_str(), nullptr)
+               : number.asDouble();
+}
 
 // Absent when the image has no samples.
 std::optional<double> amplitudeOf(const ImageView& image) {
@@ -51,7 +59,7 @@ void Figures::addRest(const RunRecord& run) {
         const platform::Value value = (*images)[at];
         const ImageView image(value);
         if (image.celsius.isPresent()) {
-            _ranges[kImageTemperature].add(image.celsius.asDouble());
+            _ranges[kImageTemperature].add(asWritten(image.celsius));
         }
         if (const std::optional<double> amplitude = amplitudeOf(image)) {
             _ranges[kImageAmplitude].add(*amplitude);

@@ -21,6 +21,11 @@ double asWritten(const platform::Number& number) {
                : number.asDouble();
 }
 
+// To the nanosecond, or a difference of 33.334 ms would be 33.33400000000009.
+double milliseconds(double seconds) {
+    return std::round(seconds * 1e9) / 1e6;
+}
+
 // Absent when the image has no samples.
 std::optional<double> amplitudeOf(const ImageView& image) {
     if (image.samplesI == nullptr || image.samplesQ == nullptr) {
@@ -39,8 +44,8 @@ std::optional<double> amplitudeOf(const ImageView& image) {
 
 void Figures::addFrame(const FrameRecord& frame) {
     if (_last.has_value()) {
-        _ranges[kInterval].add((frame.presentation - _last->presentation) * 1000);
-        _ranges[kArrivalInterval].add((frame.delivered - _last->delivered) * 1000);
+        _ranges[kInterval].add(milliseconds(frame.presentation - _last->presentation));
+        _ranges[kArrivalInterval].add(milliseconds(frame.delivered - _last->delivered));
     }
     for (std::size_t at = 0; at < kTemperatureCount; ++at) {
         if (frame.temperatures[at].has_value()) {

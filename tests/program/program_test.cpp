@@ -443,7 +443,7 @@ TEST(Program, JudgesByTheLimitsOfTheBench) {
     const Row rows[] = {
         {"healthy", false, 0,
          "PASS  VantorFaultDiagnostic  all 64 limits met; all 6 bench limits met"},
-        {"unjudged-errors", false, 1, "  ✗ UART           11 errors  mine: ≤ 0 errors\n"},
+        {"unjudged-errors", false, 1, "  ✗ UART            11 errors  mine: ≤ 0 errors\n"},
         {"frames-dropped", false, 1, "  ✗ frames lost        5 frames  mine: ≤ 0 frames\n"},
         {"module-hot", false, 1, "  ✗ DIE active, greatest   "},
         {"flood-temperature-absent", false, 2, "  ? Flood active, greatest    not measured  "},
@@ -477,10 +477,27 @@ TEST(Program, JudgesByTheLimitsOfTheBench) {
 TEST(Program, WritesFramesAndImagesAsTheyCome) {
     const fs::path folder = newFolder();
     const std::string frames = (folder / "frames.csv").string();
-    const test::Outcome outcome = zrlab(
-        {"run", "VantorFaultDiagnostic", "KirraImageExperiment", "--set", "frameCount=40", "--set",
-         "images=3", "--set", "timeout=60", "--speed", "max", "--device", "stream-events",
-         "--repeat", "2", "--frames", frames, "--images", (folder / "images.csv").string()});
+    const test::Outcome outcome = zrlab({"run",
+                                         "VantorFaultDiagnostic",
+                                         "KirraImageExperiment",
+                                         "--set",
+                                         "frameCount=40",
+                                         "--set",
+                                         "images=3",
+                                         "--set",
+                                         "timeout=60",
+                                         "--speed",
+                                         "max",
+                                         "--device",
+                                         "stream-events",
+                                         "--repeat",
+                                         "2",
+                                         "--format",
+                                         "json",
+                                         "--frames",
+                                         frames,
+                                         "--images",
+                                         (folder / "images.csv").string()});
     EXPECT_EQ(outcome.status, 0) << outcome.errors;
     const auto countOf = [](const std::string& text, const std::string& part) {
         int count = 0;
@@ -490,9 +507,11 @@ TEST(Program, WritesFramesAndImagesAsTheyCome) {
         return count;
     };
     const std::string text = contentOf(frames);
-    EXPECT_EQ(countOf(text, ",frame,20"), 80);
     EXPECT_EQ(countOf(text, ",event,20"), 4);
-    EXPECT_EQ(countOf(text, "\r\nVantorFaultDiagnostic,2,"), 42);
+    // The second run is the one that the report holds.
+    const Json run = Json::parse(outcome.output)["runs"][0];
+    EXPECT_EQ(countOf(text, "\r\nVantorFaultDiagnostic,2,"), run["framesDelivered"].get<int>() + 2);
+    EXPECT_GE(run["framesDelivered"], 40);
     EXPECT_EQ(countOf(contentOf(folder / "images.csv"), "\r\nKirraImageExperiment,"), 6);
     EXPECT_EQ(std::distance(fs::directory_iterator(folder), fs::directory_iterator()), 2);
 

@@ -1,12 +1,14 @@
 #!/usr/bin/python3
 """Checks the files of limits: the sample, the page's examples and one with every key satisfy the schema and the
 program; what is known to be broken satisfies neither. Every key of the schema is described, and used by the
-file with every key.
+file with every key. The page's commands print what it shows.
 
-check_limits.py ZRLAB
+check_limits.py ZRLAB             checks all of it
+check_limits.py ZRLAB --update    first writes what the commands print into the page
 """
 
 import json
+import os
 import pathlib
 import re
 import subprocess
@@ -19,6 +21,7 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent
 SCHEMA = ROOT / "limits" / "limits.schema.json"
 SAMPLE = ROOT / "limits" / "sample.json"
 PAGE = ROOT / "docs" / "limits.md"
+TRANSCRIPT = ROOT / "tools" / "check_transcript.py"
 TESTS = ROOT / "tests" / "limits"
 
 
@@ -70,6 +73,15 @@ def main():
             problems.append(f"the schema {verb} {json.dumps(row['limits'])} ({row['problem']})")
         if (line := problem_of(row["limits"])) != row["problem"]:
             problems.append(f"{json.dumps(row['limits'])}: {line}")
+    # The page's examples are in the folder in which its commands run.
+    with tempfile.TemporaryDirectory() as folder:
+        for name, text in examples:
+            (pathlib.Path(folder) / name).write_text(text)
+        path = f"{pathlib.Path(zrlab).resolve().parent}:{os.environ['PATH']}"
+        done = subprocess.run([sys.executable, str(TRANSCRIPT), str(PAGE), *sys.argv[2:]], text=True,
+                              env={**os.environ, "HOME": folder, "PATH": path}, capture_output=True, check=False)
+        if done.returncode != 0:
+            problems.append((done.stdout + done.stderr).strip())
     described = dict(keys_of(schema))
     problems += [f"{SCHEMA.name}: does not describe \"{key}\"" for key, part in described.items()
                  if not part.get("description")]

@@ -233,9 +233,10 @@ void CommandLine::_addDeviceModule(CLI::App& command) {
 }
 
 void CommandLine::_addLimitsAndTables(CLI::App& run) {
-    run.add_option("--limits", session.limits,
-                   "Also judge by the limits of this file: bounds on what the module records and\n"
-                   "does not judge; part of the verdict where the file says so")
+    run.add_option(
+           "--limits", session.limits,
+           "Also judge by the limits of this file;\nbounds on what the module records and does "
+           "not judge,\npart of the verdict where the file says so")
         ->type_name("FILE")
         ->check(notEmpty());
     run.add_option("--frames", session.frames,

@@ -57,9 +57,10 @@ install(FILES "${manual}.gz" DESTINATION "${CMAKE_INSTALL_MANDIR}/man1")
 install(FILES "${bash_completion}" DESTINATION "${data}/bash-completion/completions")
 install(FILES "${zsh_completion}" DESTINATION "${data}/zsh/vendor-completions")
 
-# The gallery, the documents, the examples, the notices.
+# The gallery, the sample of limits, the documents, the examples, the notices.
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/profiles" DESTINATION "${data}/zrlab"
   FILES_MATCHING PATTERN "*.json" PATTERN "expected-outcomes.json" EXCLUDE)
+install(DIRECTORY "${PROJECT_SOURCE_DIR}/limits" DESTINATION "${data}/zrlab")
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/docs/" DESTINATION "${documents}"
   FILES_MATCHING PATTERN "*.md" PATTERN "images" EXCLUDE)
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/examples" DESTINATION "${documents}"

@@ -4,6 +4,8 @@
 #ifndef ZR_HOST_RECORD_PLUGIN_DATA_H
 #define ZR_HOST_RECORD_PLUGIN_DATA_H
 
+#include <cstddef>
+#include <iterator>
 #include <string_view>
 
 #include "platform/value.h"
@@ -54,6 +56,32 @@ inline constexpr TemperatureEntry kTemperatures[] = {
      SensorState::Active},
 };
 inline constexpr std::size_t kTemperatureCount = std::size(kTemperatures);
+
+// The entries of a frame's metadata that have a column of their own in a table of frames. Any further entry is
+// written beside them.
+inline constexpr std::string_view kFrameColumns[] = {
+    kSensorFrameNumber,
+    "MetaDataProjectorMode",
+    kLightSource,
+    "MetaDataProjectorIndex",
+    "MetaDataProjectorPowerLow",
+    "MetaDataProjectorPowerHigh",
+    "MetaDataProjectorPowerFlood",
+    "MetaDataProjectorProbeMode",
+    "MetaDataProjectorPowerProbeA",
+    "MetaDataProjectorPowerProbeB",
+    "MetaDataProjectorPulseWidth",
+    kRylCaptureStreamMetadata_FloodActiveTemperature,
+    "NTCTemperatureIdle",
+    "NTCTemperatureStandby",
+    "NTCTemperatureActive",
+    "DIETemperatureIdle",
+    "DIETemperatureStandby",
+    "DIETemperatureActive",
+    "HardwareEvents"};
+
+// How many samples of each sort an image has.
+inline constexpr std::size_t kImageSamples = 48;
 
 // The images in an experiment's auxiliary data, or null. Valid as long as the data.
 inline const platform::List* imagesOf(const platform::Dictionary& auxiliaryData) {

@@ -2,8 +2,6 @@
 #ifndef ZR_HOST_RECORD_RUN_LISTENER_H
 #define ZR_HOST_RECORD_RUN_LISTENER_H
 
-#include <span>
-
 #include "host/record/run_record.h"
 
 namespace host {
@@ -22,8 +20,8 @@ class RunListener {
     // A part begins: its name, summary and parameters are known.
     virtual void partStarted(const RunRecord& /*run*/, Part /*part*/) {}
     virtual void logged(const LogRecord& /*line*/) {}
-    // The next frames of the run. Called when a report asks for frames and writes as the session goes on.
-    virtual void framesDelivered(std::span<const FrameRecord> /*frames*/) {}
+    // The next frames and events of the run. Called when a listener follows them.
+    virtual void framesDelivered(const FrameBatch& /*batch*/) {}
     // A part has ended: its measurements or results, and its failures, are in the record.
     virtual void partEnded(const RunRecord& /*run*/, Part /*part*/) {}
     // The verdict is known.

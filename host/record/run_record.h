@@ -31,7 +31,7 @@ namespace host {
 // The outcome of a run, from best to worst.
 enum class Verdict {
     Passed,  // a diagnostic whose every limited result is within its limit; an experiment that ran
-    Failed,  // a result is outside its limit
+    Failed,  // a result is outside its limit: one of the module, or of the bench that is part of it
     Error,   // something did not complete, so there is no verdict
     // The program was asked to stop during the run. It says nothing about the unit; what the run had
     // found until then is in its record.
@@ -43,6 +43,7 @@ enum class Judgement {
     Information,  // it has no limit
     Within,
     Outside,
+    NotMeasured,  // only under a limit of the bench: the run does not have what the limit is on
 };
 
 struct BoundRecord {
@@ -63,6 +64,13 @@ struct ResultRecord {
     std::string unit;
     std::optional<LimitRecord> limit;
     Judgement judgement;
+};
+
+// What a limit of the bench found: one that the bench's user put on something that the module records and does
+// not judge. When it was not measured the value is NaN and the unit empty.
+struct BenchResult : ResultRecord {
+    bool partOfVerdict = false;
+    std::string note;  // why it was not measured; else empty
 };
 
 // A measurement of the experiment, under the experiment's name for it.
@@ -109,6 +117,23 @@ struct FrameRecord {
     std::array<std::optional<double>, kTemperatureCount> temperatures;
 };
 
+// An event that a stream reported while it delivered frames.
+struct EventRecord {
+    std::int32_t code;
+    std::int64_t info;
+    double presentation;  // these two as those of a frame
+    double delivered;
+    std::size_t framesBefore;  // in its batch
+};
+
+// What a stream has delivered since the batch before.
+struct FrameBatch {
+    std::vector<FrameRecord> frames;
+    // All metadata of each frame, and the events: only when a listener asks for them.
+    std::vector<platform::Dictionary> metadata;
+    std::vector<EventRecord> events;
+};
+
 // One run of a diagnostic, or of an experiment on its own.
 struct RunRecord {
     std::string uuid;          // names the run everywhere, see newUuid()
@@ -124,6 +149,7 @@ struct RunRecord {
     std::vector<MeasurementRecord> measurements;  // of the experiment, by name
     platform::Dictionary auxiliaryData;           // of the experiment
     std::vector<ResultRecord> results;            // of the analysis, in its order
+    std::vector<BenchResult> benchResults;        // of the bench's limits, in their order
     std::vector<FailureRecord> failures;          // empty when the verdict is about results
     std::vector<LogRecord> log;                   // lines of the run, in the order they came
     std::uint64_t framesDelivered = 0;
@@ -144,6 +170,7 @@ struct ResultStatistics {
     double minimum = 0;         // these three: NaN when no value was a number
     double median = 0;
     double maximum = 0;
+    std::uint64_t notMeasured = 0;  // runs beside `runs` that did not have it; see BenchResult
 };
 
 // A repetition that did not pass.
@@ -154,6 +181,7 @@ struct Repetition {
     std::string why;                      // in one line
     std::vector<ResultRecord> outside;    // its results outside their limits
     std::vector<FailureRecord> failures;  // its failed steps
+    std::vector<BenchResult> bench{};     // what of the bench's limits kept it from passing
 };
 
 // What is kept of every repetition, also of one that passed.
@@ -172,7 +200,8 @@ struct RepeatRecord {
     std::uint64_t interrupted = 0;  // the last one, when the program was asked to stop during it
     double seconds = 0;             // of all runs
     std::vector<ResultStatistics> results;
-    std::vector<Repetition> notPassed;  // the first kMostRepetitions of them
+    std::vector<ResultStatistics> benchResults;  // of the bench's limits
+    std::vector<Repetition> notPassed;           // the first kMostRepetitions of them
     // The first kMostOutcomes repetitions, in their order. With the bound on those that did not pass,
     // a series of any length takes a few megabytes at most.
     std::vector<RepetitionOutcome> outcomes;

@@ -126,16 +126,55 @@ std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view 
                              : "no limit";
 }
 
-std::string headline(const RunRecord& run) {
+bool isBenchFinding(const BenchResult& result) {
+    return result.partOfVerdict &&
+           (result.judgement == Judgement::Outside || result.judgement == Judgement::NotMeasured);
+}
+
+std::string benchLine(const BenchResult& result, bool verdict) {
+    const std::string range = limitLine(result.limit, result.unit);
+    std::string text = result.judgement == Judgement::NotMeasured
+                           ? fmt::format("not measured, {}; {}", range, result.note)
+                           : fmt::format("{}, {}", valueText(result.value, result.unit), range);
+    if (verdict && !result.partOfVerdict) {
+        text += "; not part of the verdict";
+    }
+    return text;
+}
+
+std::string benchHeadline(const RunRecord& run) {
+    const auto countOf = [&run](Judgement judgement) {
+        return std::count_if(run.benchResults.begin(), run.benchResults.end(),
+                             [judgement](const auto& one) { return one.judgement == judgement; });
+    };
+    const std::size_t all = run.benchResults.size();
+    const auto outside = countOf(Judgement::Outside);
+    const auto notMeasured = countOf(Judgement::NotMeasured);
+    if (all == 0) {
+        return "";
+    }
+    const std::string limits = plural(all, "bench limit", "bench limits");
+    std::string text = outside > 0 ? fmt::format("{} of {} not met", outside, limits) : "";
+    if (notMeasured > 0) {
+        text += text.empty() ? fmt::format("{} of {} not measured", notMeasured, limits)
+                             : fmt::format(", {} not measured", notMeasured);
+    }
+    return !text.empty() ? text : (all > 1 ? "all " : "") + limits + " met";
+}
+
+namespace {
+
+// What the module's own results come to.
+std::string moduleHeadline(const RunRecord& run) {
     if (run.verdict == Verdict::Interrupted) {
         const std::string progress = progressText(run);
         return progress.empty() ? "stopped before its end" : "stopped after " + progress;
     }
-    if (run.verdict == Verdict::Error) {
+    if (!run.failures.empty() || (run.verdict == Verdict::Error && run.benchResults.empty())) {
         return "did not complete";
     }
     if (!run.plan.isDiagnostic()) {
-        return "completed, not judged";
+        return run.benchResults.empty() ? "completed, not judged" : "completed";
     }
     const auto countOf = [&run](Judgement judgement) {
         return std::count_if(run.results.begin(), run.results.end(),
@@ -148,6 +187,13 @@ std::string headline(const RunRecord& run) {
     }
     return outside > 0 ? fmt::format("{} of {} limits not met", outside, limited)
                        : fmt::format("all {} limits met", limited);
+}
+
+}  // namespace
+
+std::string headline(const RunRecord& run) {
+    const std::string bench = benchHeadline(run);
+    return moduleHeadline(run) + (bench.empty() ? "" : "; " + bench);
 }
 
 std::string interruptionText(const SessionRecord& session) {
@@ -175,7 +221,19 @@ std::string whyText(const RunRecord& run) {
                                          limitLine(result.limit, result.unit)));
         }
     }
-    return run.verdict == Verdict::Interrupted ? headline(run) : "";
+    if (run.verdict == Verdict::Interrupted) {
+        return headline(run);
+    }
+    for (const Judgement judgement : {Judgement::Outside, Judgement::NotMeasured}) {
+        for (const BenchResult& result : run.benchResults) {
+            if (result.partOfVerdict && result.judgement == judgement) {
+                return plainLine(fmt::format("{} {}{}", result.name,
+                                             judgement == Judgement::Outside ? "is " : "",
+                                             benchLine(result, false)));
+            }
+        }
+    }
+    return "";
 }
 
 const PartPlan& partOf(const RunRecord& run, Part part) {

@@ -45,6 +45,17 @@ std::string valueText(double value, std::string_view unit);
 // "Max Reports: 0 … 0 events", "no limit".
 std::string limitLine(const std::optional<LimitRecord>& limit, std::string_view unit);
 
+// Whether a limit of the bench kept the run from passing: it is part of the verdict, and what it is on was
+// outside or not measured.
+bool isBenchFinding(const BenchResult& result);
+
+// What a limit of the bench found, in one line: "4 errors, desk 7: 0 … 0 errors"; "not measured, no frame has
+// it". With `verdict` one that is not part of the verdict says so.
+std::string benchLine(const BenchResult& result, bool verdict);
+
+// "all 3 bench limits met", "1 of 3 bench limits not met, 1 not measured"; empty when there are none.
+std::string benchHeadline(const RunRecord& run);
+
 // The outcome of the run in a few words: "2 of 64 limits not met", "stopped after 37 of 90 frames".
 std::string headline(const RunRecord& run);
 

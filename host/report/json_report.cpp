@@ -72,7 +72,8 @@ Json jsonOf(const std::optional<LimitRecord>& limit) {
 }
 
 std::string_view judgementText(Judgement judgement) {
-    static constexpr std::string_view kTexts[] = {"information", "within", "outside"};
+    static constexpr std::string_view kTexts[] = {"information", "within", "outside",
+                                                  "not measured"};
     return kTexts[static_cast<std::size_t>(judgement)];
 }
 
@@ -105,13 +106,27 @@ Json failuresOf(const std::vector<FailureRecord>& failures) {
     });
 }
 
+Json jsonOf(const ResultRecord& result) {
+    return {{"name", result.name},
+            {"value", jsonOf(result.value)},
+            {"unit", result.unit},
+            {"judgement", judgementText(result.judgement)},
+            {"limit", jsonOf(result.limit)}};
+}
+
 Json resultsOf(const std::vector<ResultRecord>& results) {
-    return arrayOf(results, [](const ResultRecord& result) {
-        return Json{{"name", result.name},
-                    {"value", jsonOf(result.value)},
-                    {"unit", result.unit},
-                    {"judgement", judgementText(result.judgement)},
-                    {"limit", jsonOf(result.limit)}};
+    return arrayOf(results, [](const ResultRecord& result) { return jsonOf(result); });
+}
+
+Json benchResultsOf(const std::vector<BenchResult>& results) {
+    return arrayOf(results, [](const BenchResult& result) {
+        Json object = jsonOf(static_cast<const ResultRecord&>(result));
+        object["partOfVerdict"] = result.partOfVerdict;
+        if (result.judgement == Judgement::NotMeasured) {
+            object["value"] = nullptr;
+            object["note"] = result.note;
+        }
+        return object;
     });
 }
 
@@ -158,6 +173,7 @@ Json jsonOf(const RunRecord& run) {
                                  : Json()}};
     object["failures"] = failuresOf(run.failures);
     object["results"] = resultsOf(run.results);
+    object["benchResults"] = benchResultsOf(run.benchResults);
     object["measurements"] = arrayOf(run.measurements, [](const MeasurementRecord& measurement) {
         return Json{{"name", measurement.name},
                     {"value", jsonOf(measurement.value)},
@@ -174,13 +190,9 @@ Json jsonOf(const RunRecord& run) {
     return object;
 }
 
-Json jsonOf(const RepeatRecord& repeat) {
-    Json object{{"name", repeat.name},      {"runs", repeat.runs},
-                {"passed", repeat.passed},  {"failed", repeat.failed},
-                {"errors", repeat.errors},  {"interrupted", repeat.interrupted},
-                {"seconds", repeat.seconds}};
-    object["results"] = arrayOf(repeat.results, [](const ResultStatistics& result) {
-        return Json{{"name", result.name},
+Json statisticsOf(const std::vector<ResultStatistics>& results) {
+    return arrayOf(results, [](const ResultStatistics& result) {
+        Json object{{"name", result.name},
                     {"unit", result.unit},
                     {"runs", result.runs},
                     {"outside", result.outside},
@@ -188,14 +200,28 @@ Json jsonOf(const RepeatRecord& repeat) {
                     {"median", jsonOf(result.median)},
                     {"maximum", jsonOf(result.maximum)},
                     {"limit", jsonOf(result.limit)}};
+        if (result.notMeasured > 0) {
+            object["notMeasured"] = result.notMeasured;
+        }
+        return object;
     });
+}
+
+Json jsonOf(const RepeatRecord& repeat) {
+    Json object{{"name", repeat.name},      {"runs", repeat.runs},
+                {"passed", repeat.passed},  {"failed", repeat.failed},
+                {"errors", repeat.errors},  {"interrupted", repeat.interrupted},
+                {"seconds", repeat.seconds}};
+    object["results"] = statisticsOf(repeat.results);
+    object["benchResults"] = statisticsOf(repeat.benchResults);
     object["notPassed"] = arrayOf(repeat.notPassed, [](const Repetition& one) {
         return Json{{"run", one.number},
                     {"verdict", verdictText(one.verdict)},
                     {"seconds", one.seconds},
                     {"why", one.why},
                     {"failures", failuresOf(one.failures)},
-                    {"outside", resultsOf(one.outside)}};
+                    {"outside", resultsOf(one.outside)},
+                    {"bench", benchResultsOf(one.bench)}};
     });
     object["outcomes"] = arrayOf(repeat.outcomes, [](const RepetitionOutcome& one) {
         return Json{{"verdict", verdictText(one.verdict)}, {"seconds", one.seconds}};

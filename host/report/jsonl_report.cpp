@@ -1,5 +1,6 @@
 #include "host/report/jsonl_report.h"
 
+#include <algorithm>
 #include <chrono>
 #include <functional>
 #include <iterator>
@@ -98,6 +99,14 @@ Json validatorsOf(const LimitRecord& limit) {
     add(limit.lower, "GREATER_THAN", "GREATER_THAN_OR_EQUAL");
     add(limit.upper, "LESS_THAN", "LESS_THAN_OR_EQUAL");
     return validators;
+}
+
+// The limit of the bench as a measurement of its own, marked as the bench's.
+Json benchMeasurementOf(const BenchResult& result) {
+    Json measurement = measurementOf(result.name, result.value, result.unit);
+    measurement["validators"] = validatorsOf(*result.limit);
+    measurement["metadata"] = {{"judgedBy", "bench"}, {"partOfVerdict", result.partOfVerdict}};
+    return measurement;
 }
 
 Json diagnosisOf(const RunRecord& run) {
@@ -248,7 +257,12 @@ void JsonlReport::runEnded(const RunRecord& run) {
         _writePart(run, *_part);
     }
     _stepFailed = _stepFailed || run.verdict == Verdict::Interrupted;
-    if (run.plan.isDiagnostic() && !_step.empty()) {
+    _writeBenchResults(run);
+    const bool isJudged =
+        run.plan.isDiagnostic() ||
+        std::any_of(run.benchResults.begin(), run.benchResults.end(),
+                    [](const BenchResult& result) { return result.partOfVerdict; });
+    if (isJudged && !_step.empty()) {
         _writeStep("diagnosis", diagnosisOf(run));
     }
     _closeStep();
@@ -314,6 +328,19 @@ void JsonlReport::_writeFailures(const RunRecord& run) {
     }
 }
 
+void JsonlReport::_writeBenchResults(const RunRecord& run) {
+    for (const BenchResult& result : run.benchResults) {
+        const std::string text = fmt::format("{}: {}", result.name, benchLine(result, true));
+        if (result.judgement != Judgement::NotMeasured) {
+            _writeStep("measurement", benchMeasurementOf(result));
+        } else if (result.partOfVerdict) {
+            _writeStep("error", errorOf("bench-limit-not-measured", text));
+        } else {
+            _writeStep("log", {{"severity", "INFO"}, {"message", text}});
+        }
+    }
+}
+
 void JsonlReport::_endFrames(const RunRecord& run) {
     if (run.framesDelivered > 0) {
         Json content{{"delivered", run.framesDelivered}};
@@ -330,12 +357,12 @@ void JsonlReport::_endFrames(const RunRecord& run) {
     }
 }
 
-void JsonlReport::framesDelivered(std::span<const FrameRecord> frames) {
+void JsonlReport::framesDelivered(const FrameBatch& batch) {
     const platform::MutexLock lock(_mutex);
     if (_part != Part::Experiment) {
         return;
     }
-    for (const FrameRecord& frame : frames) {
+    for (const FrameRecord& frame : batch.frames) {
         _writeFrame(frame);
         _flush();
         _lastFrame = frame;

@@ -6,13 +6,17 @@
 //   testRunStart   the planned runs with their parameters, the device as the unit under test
 //   measurement    in an experiment's step what it measured; in an analysis's step each judged result
 //                  with its limit as validators, which carry the limit's name
+//   measurement    at the end of a run, in its last step, each quantity that a limit of the bench is on, with
+//                  its limit as validators and metadata that names the bench; an error of the symptom
+//                  "bench-limit-not-measured" when the run does not have it (a log line when the limit is not
+//                  part of the verdict)
 //   measurementSeries…  in the experiment's step one series per quantity of the frames that the page draws,
 //                  side by side, some frames at a time
 //   extension      one for each element of a list in the experiment's auxiliary data ("images"); one with
 //                  the counts of frames delivered and lost ("frames")
 //   error          symptom "domain-code" ("part-step" when there is no error object), the chain of
 //                  causes as message; "interrupted" in the run when the program was asked to stop
-//   diagnosis      one per diagnostic, in its last step: "NAME-pass", "NAME-fail", "NAME-error",
+//   diagnosis      one per diagnostic, and per experiment that the bench judges, in its last step: "NAME-pass", "NAME-fail", "NAME-error",
 //                  "NAME-interrupted"
 //   log            in the step that is open; in the run between steps, and for a line that came when its
 //                  run had ended
@@ -25,7 +29,6 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
-#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -50,7 +53,7 @@ class JsonlReport final : public RunListener {
     void partStarted(const RunRecord& run, Part part) override;
     // A line that comes after the session's end is dropped: nothing may follow the run's end.
     void logged(const LogRecord& line) override;
-    void framesDelivered(std::span<const FrameRecord> frames) override;
+    void framesDelivered(const FrameBatch& batch) override;
     void partEnded(const RunRecord& run, Part part) override;
     void runEnded(const RunRecord& run) override;
     void sessionEnded(const SessionRecord& session) override;
@@ -71,6 +74,7 @@ class JsonlReport final : public RunListener {
     void _endFrames(const RunRecord& run) ZR_REQUIRES(_mutex);
     std::string _seriesId(std::size_t at) const ZR_REQUIRES(_mutex);
     void _writeFailures(const RunRecord& run) ZR_REQUIRES(_mutex);
+    void _writeBenchResults(const RunRecord& run) ZR_REQUIRES(_mutex);
     void _closeStep() ZR_REQUIRES(_mutex);
     // Hands the lines made so far to the sink.
     void _flush() ZR_REQUIRES(_mutex);

@@ -123,6 +123,7 @@ class Suite {
         } else {
             _singleRun();
         }
+        _bench();
         if (_run.verdict >= Verdict::Error) {
             _missingResults();
         }
@@ -155,11 +156,15 @@ class Suite {
     }
 
     pugi::xml_node _case(std::string_view name) {
+        _cases.insert(std::string(name));
+        return _case(name, _className);
+    }
+
+    pugi::xml_node _case(std::string_view name, const std::string& className) {
         ++_counts.tests;
         pugi::xml_node node = _node.append_child("testcase");
         setAttribute(node, "name", name);
-        setAttribute(node, "classname", _className);
-        _cases.insert(std::string(name));
+        setAttribute(node, "classname", className);
         return node;
     }
 
@@ -184,8 +189,7 @@ class Suite {
     }
 
     // A measured result: its findings in one line, and whether it failed.
-    void _result(std::string_view name, const std::string& finding, bool failed) {
-        pugi::xml_node node = _case(name);
+    void _result(pugi::xml_node node, const std::string& finding, bool failed) {
         if (failed) {
             ++_counts.failures;
             pugi::xml_node failure = node.append_child("failure");
@@ -199,10 +203,27 @@ class Suite {
 
     void _singleRun() {
         for (const ResultRecord& result : _run.results) {
-            _result(result.name,
+            _result(_case(result.name),
                     fmt::format("{}, {}", valueText(result.value, result.unit),
                                 limitLine(result.limit, result.unit)),
                     result.judgement == Judgement::Outside);
+        }
+    }
+
+    // The bench's limits have cases with a class name of their own. One that is not part of the verdict does
+    // not fail; it is skipped when it was not measured.
+    void _bench() {
+        for (const BenchResult& result : _run.benchResults) {
+            pugi::xml_node node = _case(result.name, _className + ".bench");
+            const std::string finding = benchLine(result, true);
+            if (result.judgement != Judgement::NotMeasured) {
+                _result(node, finding, isBenchFinding(result));
+            } else if (result.partOfVerdict) {
+                _error(node, "not measured", finding, finding);
+            } else {
+                ++_counts.skipped;
+                setAttribute(node.append_child("skipped"), "message", finding);
+            }
         }
     }
 
@@ -232,14 +253,15 @@ class Suite {
             _error(_case("repetitions"), "repetitions in error", message, message);
         }
         for (const ResultStatistics& result : repeat.results) {
-            _result(result.name,
-                    fmt::format("outside {} of {}: least {}, median {}, greatest {}, {}",
-                                result.outside, plural(result.runs, "time", "times"),
-                                numberText(result.minimum), numberText(result.median),
-                                valueText(result.maximum, result.unit),
-                                limitLine(result.limit, result.unit)),
-                    result.outside > 0);
+            _result(_case(result.name), _spread(result), result.outside > 0);
         }
+    }
+
+    static std::string _spread(const ResultStatistics& result) {
+        return fmt::format("outside {} of {}: least {}, median {}, greatest {}, {}", result.outside,
+                           plural(result.runs, "time", "times"), numberText(result.minimum),
+                           numberText(result.median), valueText(result.maximum, result.unit),
+                           limitLine(result.limit, result.unit));
     }
 
     pugi::xml_node _node;

@@ -39,10 +39,15 @@ const ReportForm* reportFormNamed(std::string_view name) {
     return findForm([name](const ReportForm& form) { return form.name == name; });
 }
 
-const ReportForm* reportFormOf(const std::string& file) {
+std::string endingOf(const std::string& file) {
     std::string ending = std::filesystem::path(file).extension().string();
     std::transform(ending.begin(), ending.end(), ending.begin(),
                    [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+    return ending;
+}
+
+const ReportForm* reportFormOf(const std::string& file) {
+    const std::string ending = endingOf(file);
     return findForm([&ending](const ReportForm& form) { return form.ending == ending; });
 }
 

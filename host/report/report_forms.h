@@ -17,6 +17,9 @@ std::span<const ReportForm> reportForms();
 // The form of that name, or null.
 const ReportForm* reportFormNamed(std::string_view name);
 
+// A file's ending with its dot, in lower case.
+std::string endingOf(const std::string& file);
+
 // The form that a file's ending asks for, upper case or lower; null when no form has it.
 const ReportForm* reportFormOf(const std::string& file);
 

@@ -79,12 +79,80 @@ std::string resultRows(const std::vector<ResultRecord>& results, const Writer& w
     return out;
 }
 
+// What the bench's limits found, apart from the module's results: those not met, or all when verbose. What was
+// not measured is only counted when the run did not come to its end.
+std::string benchRows(const RunRecord& run, const Writer& writer) {
+    if (run.benchResults.empty()) {
+        return "";
+    }
+    const bool isWhole = run.failures.empty() && run.verdict != Verdict::Interrupted;
+    std::vector<BenchResult> shown;
+    std::copy_if(run.benchResults.begin(), run.benchResults.end(), std::back_inserter(shown),
+                 [&](const BenchResult& result) {
+                     return writer.verbose() || result.judgement == Judgement::Outside ||
+                            (isWhole && result.judgement == Judgement::NotMeasured);
+                 });
+    const std::size_t width = nameWidth(shown);
+    std::string out = fmt::format("  {}\n", benchHeadline(run));
+    for (const BenchResult& result : shown) {
+        const bool isMet = result.judgement == Judgement::Within;
+        const std::string mark = result.judgement == Judgement::Outside ? "✗" : "?";
+        const std::string value = fmt::format("{:>14}", result.judgement == Judgement::NotMeasured
+                                                            ? "not measured"
+                                                            : valueText(result.value, result.unit));
+        std::string more = limitLine(result.limit, result.unit);
+        more += result.partOfVerdict ? "" : "; not part of the verdict";
+        more += result.note.empty() ? "" : "; " + result.note;
+        out += fmt::format("  {} {:<{}}  {}  {}\n", isMet ? " " : writer.bad(mark), result.name,
+                           width, isMet ? value : writer.bad(value), writer.faint(plainLine(more)));
+    }
+    return out;
+}
+
 std::string measurementRows(const std::vector<MeasurementRecord>& measurements) {
     const std::size_t width = nameWidth(measurements);
     std::string out;
     for (const MeasurementRecord& measurement : measurements) {
         out += fmt::format("    {:<{}}  {:>14}\n", measurement.name, width,
                            valueText(measurement.value, measurement.unit));
+    }
+    return out;
+}
+
+// The figures of results over the repetitions: of those that differed or were outside, or all when verbose.
+std::string statisticsRows(const std::vector<ResultStatistics>& results,
+                           const Writer& writer,
+                           std::string_view one,
+                           std::string_view many) {
+    std::vector<ResultStatistics> shown;
+    std::copy_if(results.begin(), results.end(), std::back_inserter(shown),
+                 [&writer](const ResultStatistics& result) {
+                     return writer.verbose() || result.outside > 0 || result.notMeasured > 0 ||
+                            result.minimum != result.maximum || !result.limit.has_value();
+                 });
+    std::string out;
+    if (!shown.empty()) {
+        const std::size_t width = nameWidth(shown);
+        out += writer.faintLine(fmt::format("    {:<{}}  {:>10}  {:>10}  {:>10}  {}", "", width,
+                                            "minimum", "median", "maximum", "outside"));
+        for (const ResultStatistics& result : shown) {
+            const bool isBad = result.outside > 0 || result.notMeasured > 0;
+            std::string outside = fmt::format("{} of {}", result.outside, result.runs);
+            if (result.notMeasured > 0) {
+                outside += fmt::format(", {} not measured", result.notMeasured);
+            }
+            out += fmt::format("  {} {:<{}}  {:>10}  {:>10}  {:>10}  {}  {}\n",
+                               isBad ? writer.bad("✗") : " ", result.name, width,
+                               numberText(result.minimum), numberText(result.median),
+                               numberText(result.maximum), isBad ? writer.bad(outside) : outside,
+                               writer.faint(limitLine(result.limit, result.unit)));
+        }
+    }
+    const std::size_t folded = results.size() - shown.size();
+    if (folded > 0) {
+        out += writer.faintLine(fmt::format(
+            "    {} {} and the same in every run, --verbose lists them", plural(folded, one, many),
+            one == "result" ? (folded == 1 ? "within its limit" : "within their limits") : "met"));
     }
     return out;
 }
@@ -171,6 +239,7 @@ std::string body(const RunRecord& run, const Writer& writer) {
         out += writer.faintLine(fmt::format("    {} within the limits, --verbose lists them",
                                             plural(others.size(), "result", "results")));
     }
+    out += benchRows(run, writer);
     if (!run.plan.isDiagnostic() || writer.verbose()) {
         if (run.plan.isDiagnostic() && !run.measurements.empty()) {
             out += writer.faintLine("  as measured by the experiment");
@@ -289,33 +358,8 @@ std::string textReport(const RepeatRecord& repeat, const TextStyle& style) {
             fmt::format("      …  {} did not pass",
                         plural(repeat.notPassedCount() - listed, "more run", "more runs")));
     }
-    std::vector<ResultStatistics> shown;
-    std::copy_if(repeat.results.begin(), repeat.results.end(), std::back_inserter(shown),
-                 [&style](const ResultStatistics& result) {
-                     return style.verbose || result.outside > 0 ||
-                            result.minimum != result.maximum || !result.limit.has_value();
-                 });
-    if (!shown.empty()) {
-        const std::size_t width = nameWidth(shown);
-        out += writer.faintLine(fmt::format("    {:<{}}  {:>10}  {:>10}  {:>10}  {}", "", width,
-                                            "minimum", "median", "maximum", "outside"));
-        for (const ResultStatistics& result : shown) {
-            const std::string outside = fmt::format("{} of {}", result.outside, result.runs);
-            out += fmt::format("  {} {:<{}}  {:>10}  {:>10}  {:>10}  {}  {}\n",
-                               result.outside > 0 ? writer.bad("✗") : " ", result.name, width,
-                               numberText(result.minimum), numberText(result.median),
-                               numberText(result.maximum),
-                               result.outside > 0 ? writer.bad(outside) : outside,
-                               writer.faint(limitLine(result.limit, result.unit)));
-        }
-    }
-    if (shown.size() < repeat.results.size()) {
-        out += writer.faintLine(
-            fmt::format("    {} within {} and the same in every run, --verbose lists them",
-                        plural(repeat.results.size() - shown.size(), "result", "results"),
-                        repeat.results.size() - shown.size() == 1 ? "its limit" : "their limits"));
-    }
-    return out;
+    return out + statisticsRows(repeat.results, writer, "result", "results") +
+           statisticsRows(repeat.benchResults, writer, "bench limit", "bench limits");
 }
 
 }  // namespace host

@@ -14,6 +14,8 @@ std::optional<BoundRecord> recordOf(const ZRBoundRef& bound) {
     return BoundRecord{bound->value()->doubleValue(), bound->open()};
 }
 
+}  // namespace
+
 bool isWithin(double value, const LimitRecord& limit) {
     if (std::isnan(value)) {
         return false;
@@ -25,8 +27,6 @@ bool isWithin(double value, const LimitRecord& limit) {
                             (value == limit.upper->value && !limit.upper->open);
     return aboveLower && belowUpper;
 }
-
-}  // namespace
 
 ResultRecord judge(const ZRMeasuredResult& result) {
     ResultRecord record{.name = result.name(),
@@ -47,10 +47,19 @@ Verdict verdictOf(const RunRecord& run) {
     if (!run.failures.empty()) {
         return Verdict::Error;
     }
+    const auto benchFound = [&run](Judgement judgement) {
+        return std::any_of(run.benchResults.begin(), run.benchResults.end(),
+                           [judgement](const BenchResult& one) {
+                               return one.partOfVerdict && one.judgement == judgement;
+                           });
+    };
     const bool outside = std::any_of(run.results.begin(), run.results.end(), [](const auto& one) {
         return one.judgement == Judgement::Outside;
     });
-    return outside ? Verdict::Failed : Verdict::Passed;
+    if (outside || benchFound(Judgement::Outside)) {
+        return Verdict::Failed;
+    }
+    return benchFound(Judgement::NotMeasured) ? Verdict::Error : Verdict::Passed;
 }
 
 }  // namespace host

@@ -12,7 +12,12 @@ namespace host {
 // one without bounds, and a bound of NaN admits nothing. Units are not compared.
 ResultRecord judge(const ZRMeasuredResult& result);
 
-// The verdict of a run from its failures and its results.
+// Whether the value is inside both bounds, as above.
+bool isWithin(double value, const LimitRecord& limit);
+
+// The verdict of a run from its failures, its results, and what the bench's limits found where that is part of
+// it. A result outside a limit is known to fail, whatever else could not be measured: Failed comes before the
+// Error of a limit of the bench that could not be judged.
 Verdict verdictOf(const RunRecord& run);
 
 // The worse of two.

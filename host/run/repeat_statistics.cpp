@@ -61,42 +61,48 @@ void RepeatStatistics::add(const RunRecord& run) {
         std::copy_if(
             run.results.begin(), run.results.end(), std::back_inserter(one.outside),
             [](const ResultRecord& result) { return result.judgement == Judgement::Outside; });
+        std::copy_if(run.benchResults.begin(), run.benchResults.end(),
+                     std::back_inserter(one.bench), isBenchFinding);
         _record.notPassed.push_back(std::move(one));
     }
     for (const ResultRecord& result : run.results) {
-        ResultStatistics one;
-        one.name = result.name;
-        one.unit = result.unit;
-        one.limit = result.limit;
-        one.outside = result.judgement == Judgement::Outside ? 1 : 0;
-        _count(one, result.value);
+        _results.add(result);
     }
     if (!run.plan.isDiagnostic()) {
         for (const MeasurementRecord& measurement : run.measurements) {
-            ResultStatistics one;
-            one.name = measurement.name;
-            one.unit = measurement.unit;
-            _count(one, measurement.value);
+            _results.add({measurement.name, measurement.value, measurement.unit, std::nullopt,
+                          Judgement::Information});
         }
     }
+    for (const BenchResult& result : run.benchResults) {
+        _benchResults.add(result);
+    }
 }
 
-void RepeatStatistics::_count(const ResultStatistics& result, double value) {
+void RepeatStatistics::Tallies::add(const ResultRecord& result) {
     const auto [known, isNew] = _tallyOf.try_emplace(result.name, _tallies.size());
     if (isNew) {
-        _tallies.push_back({result, {}});
-        _tallies.back().statistics.outside = 0;
+        Tally& tally = _tallies.emplace_back();
+        tally.statistics.name = result.name;
+        tally.statistics.limit = result.limit;
     }
     Tally& tally = _tallies[known->second];
+    if (tally.statistics.unit.empty()) {
+        tally.statistics.unit = result.unit;
+    }
+    if (result.judgement == Judgement::NotMeasured) {
+        ++tally.statistics.notMeasured;
+        return;
+    }
     ++tally.statistics.runs;
-    tally.statistics.outside += result.outside;
-    if (!std::isnan(value)) {
-        ++tally.values[value];
+    tally.statistics.outside += result.judgement == Judgement::Outside ? 1 : 0;
+    if (!std::isnan(result.value)) {
+        ++tally.values[result.value];
     }
 }
 
-RepeatRecord RepeatStatistics::record() const {
-    RepeatRecord record = _record;
+std::vector<ResultStatistics> RepeatStatistics::Tallies::statistics() const {
+    std::vector<ResultStatistics> all;
     for (const Tally& tally : _tallies) {
         ResultStatistics result = tally.statistics;
         if (tally.values.empty()) {
@@ -107,8 +113,15 @@ RepeatRecord RepeatStatistics::record() const {
             result.median = median(tally.values);
             result.maximum = tally.values.rbegin()->first;
         }
-        record.results.push_back(std::move(result));
+        all.push_back(std::move(result));
     }
+    return all;
+}
+
+RepeatRecord RepeatStatistics::record() const {
+    RepeatRecord record = _record;
+    record.results = _results.statistics();
+    record.benchResults = _benchResults.statistics();
     return record;
 }
 

@@ -14,7 +14,7 @@ namespace host {
 // Keeps each distinct value once with its number of occurrences, so that the median is exact and memory
 // grows with the number of distinct values, not of runs. An experiment without an analysis is counted
 // by its measurements, which have no limit. A NaN counts as a run outside its limit and does not
-// enter minimum, median and maximum.
+// enter minimum, median and maximum. What the bench's limits found is counted apart.
 class RepeatStatistics {
   public:
     explicit RepeatStatistics(std::string name) { _record.name = std::move(name); }
@@ -25,15 +25,24 @@ class RepeatStatistics {
     RepeatRecord record() const;
 
   private:
-    struct Tally {
-        ResultStatistics statistics;
-        std::map<double, std::uint64_t> values;
+    // The results of one sort, by name.
+    class Tallies {
+      public:
+        void add(const ResultRecord& result);
+        std::vector<ResultStatistics> statistics() const;
+
+      private:
+        struct Tally {
+            ResultStatistics statistics;
+            std::map<double, std::uint64_t> values;
+        };
+        std::vector<Tally> _tallies;
+        std::map<std::string, std::size_t> _tallyOf;
     };
-    void _count(const ResultStatistics& result, double value);
 
     RepeatRecord _record;
-    std::vector<Tally> _tallies;
-    std::map<std::string, std::size_t> _tallyOf;
+    Tallies _results;
+    Tallies _benchResults;
 };
 
 }  // namespace host

@@ -32,10 +32,12 @@ std::optional<double> numberOf(const platform::Dictionary& metadata, std::string
 
 RunRecorder::RunRecorder(std::function<void(const LogRecord&)> lineLogged,
                          bool keepFrames,
-                         FramesDelivered framesDelivered)
+                         FramesDelivered framesDelivered,
+                         bool withDetails)
     : _lineLogged(std::move(lineLogged))
     , _keepFrames(keepFrames)
-    , _framesDelivered(std::move(framesDelivered)) {
+    , _framesDelivered(std::move(framesDelivered))
+    , _withDetails(withDetails) {
     if (_framesDelivered) {
         _hold.emplace(_queue);
     }
@@ -52,7 +54,7 @@ platform::RunTag RunRecorder::begin() {
     const platform::MutexLock lock(_mutex);
     _began = std::chrono::steady_clock::now();
     _frames.clear();
-    _toHandOn.clear();
+    _toHandOn = {};
     _lostFrames = {};
     _current = ++_last;
     return _last;
@@ -140,30 +142,56 @@ void RunRecorder::frameDelivered(const observed::DeliveredFrame& frame) {
     }
     const platform::MutexLock lock(_mutex);
     _lostFrames.before(record.sensorNumber);
-    record.delivered = std::chrono::duration<double>(frame.delivered - _began).count();
+    record.delivered = _secondsSinceBegin(frame.delivered);
     if (_keepFrames) {
         _frames.push_back(record);
     }
     if (_framesDelivered) {
-        _toHandOn.reserve(kFramesAtOnce);
-        _toHandOn.push_back(record);
-        if (_toHandOn.size() >= kFramesAtOnce) {
-            const auto deadline = std::chrono::steady_clock::now() + kPatience;
-            while (_queued >= kMostQueued && std::chrono::steady_clock::now() < deadline) {
-                _handedOn.waitUntil(_mutex, deadline);
-            }
-            _handOn();
+        _toHandOn.frames.reserve(kFramesAtOnce);
+        _toHandOn.frames.push_back(record);
+        if (_withDetails) {
+            _toHandOn.metadata.reserve(kFramesAtOnce);
+            _toHandOn.metadata.push_back(frame.metadata);
         }
+        _handOnWhenMany();
     }
 }
 
+void RunRecorder::eventDelivered(const observed::DeliveredEvent& event) {
+    if (!_withDetails || !_isWanted(platform::currentRunTag())) {
+        return;
+    }
+    const platform::MutexLock lock(_mutex);
+    _toHandOn.events.push_back({.code = event.code,
+                                .info = event.info,
+                                .presentation = event.time.seconds(),
+                                .delivered = _secondsSinceBegin(event.delivered),
+                                .framesBefore = _toHandOn.frames.size()});
+    _handOnWhenMany();
+}
+
+double RunRecorder::_secondsSinceBegin(std::chrono::steady_clock::time_point moment) const {
+    return std::chrono::duration<double>(moment - _began).count();
+}
+
+void RunRecorder::_handOnWhenMany() {
+    if (_toHandOn.frames.size() + _toHandOn.events.size() < kFramesAtOnce) {
+        return;
+    }
+    const auto deadline = std::chrono::steady_clock::now() + kPatience;
+    while (_queued >= kMostQueued && std::chrono::steady_clock::now() < deadline) {
+        _handedOn.waitUntil(_mutex, deadline);
+    }
+    _handOn();
+}
+
 void RunRecorder::_handOn() {
-    if (_toHandOn.empty()) {
+    if (_toHandOn.frames.empty() && _toHandOn.events.empty()) {
         return;
     }
     ++_queued;
-    _queue.async([this, frames = std::exchange(_toHandOn, {})] {
-        _framesDelivered(frames);
+    _queue.async([this, batch = std::exchange(_toHandOn, {})] {
+        _framesDelivered(batch);
         const platform::MutexLock lock(_mutex);
         --_queued;
         _handedOn.notifyAll();

@@ -21,7 +21,6 @@
 #include <cstdint>
 #include <functional>
 #include <optional>
-#include <span>
 #include <string>
 #include <utility>
 #include <vector>
@@ -38,15 +37,16 @@ namespace host {
 
 class RunRecorder final : public platform::LogSink, public observed::Observer {
   public:
-    using FramesDelivered = std::function<void(std::span<const FrameRecord> frames)>;
+    using FramesDelivered = std::function<void(const FrameBatch& batch)>;
 
     // `lineLogged` is called for every line, on the thread that logs it. `keepFrames`: whether a
     // report will draw the frames. `framesDelivered`, when there is one, is called with every frame of a
-    // run, in their order, on one thread at a time. Throws std::system_error when that thread cannot be
-    // started.
+    // run, in their order, on one thread at a time; `withDetails`: also with their metadata and the stream's
+    // events. Throws std::system_error when that thread cannot be started.
     RunRecorder(std::function<void(const LogRecord&)> lineLogged,
                 bool keepFrames,
-                FramesDelivered framesDelivered = nullptr);
+                FramesDelivered framesDelivered = nullptr,
+                bool withDetails = false);
     ~RunRecorder() override;
     RunRecorder(const RunRecorder&) = delete;
     RunRecorder& operator=(const RunRecorder&) = delete;
@@ -68,6 +68,7 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
 
     void write(const platform::LogLine& line) override;
     void frameDelivered(const observed::DeliveredFrame& frame) override;
+    void eventDelivered(const observed::DeliveredEvent& event) override;
     void imageDelivered(std::uint64_t number) override;
     void misused(std::string_view what) override;
 
@@ -75,6 +76,7 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     const std::function<void(const LogRecord&)> _lineLogged;
     const bool _keepFrames;
     const FramesDelivered _framesDelivered;
+    const bool _withDetails;
     platform::WorkQueue _queue{"zrlab.frames", platform::WorkQueue::Priority::Background};
     std::optional<platform::WorkQueue::Hold> _hold;  // while frames are handed on
 
@@ -87,7 +89,12 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     // Whether work under this tag belongs to the run in progress, or to the next one.
     bool _isWanted(platform::RunTag tag) const { return tag == 0 || tag == _current.load(); }
 
-    // Queues the frames that are to be handed on, if any.
+    double _secondsSinceBegin(std::chrono::steady_clock::time_point moment) const
+        ZR_REQUIRES(_mutex);
+
+    // Queues what is to be handed on once there is enough of it.
+    void _handOnWhenMany() ZR_REQUIRES(_mutex);
+    // Queues what is to be handed on, if anything.
     void _handOn() ZR_REQUIRES(_mutex);
     void _awaitHandedOn() ZR_REQUIRES(_mutex);
 
@@ -100,7 +107,7 @@ class RunRecorder final : public platform::LogSink, public observed::Observer {
     std::vector<std::pair<platform::RunTag, LogRecord>> _lateLines ZR_GUARDED_BY(_mutex);
     LostFrames _lostFrames ZR_GUARDED_BY(_mutex);
     std::vector<FrameRecord> _frames ZR_GUARDED_BY(_mutex);
-    std::vector<FrameRecord> _toHandOn ZR_GUARDED_BY(_mutex);
+    FrameBatch _toHandOn ZR_GUARDED_BY(_mutex);
     std::size_t _queued ZR_GUARDED_BY(_mutex) =
         0;  // calls of _framesDelivered that have not returned
     std::vector<std::string> _misuses ZR_GUARDED_BY(_mutex);

@@ -35,6 +35,9 @@ class Sequence {
         _run.uuid = newUuid();
         _run.plan = plan;
         _run.number = number;
+        if (bench.judge != nullptr) {
+            bench.judge->begin();
+        }
     }
 
     // On the run's thread.
@@ -128,6 +131,9 @@ class Sequence {
         _isFinished = true;
         _bench.recorder.end(_run);
         _run.seconds = secondsSince(_start);
+        if (_bench.judge != nullptr) {
+            _run.benchResults = _bench.judge->judge(_run);
+        }
         _run.verdict = _isToStop() ? Verdict::Interrupted : verdictOf(_run);
         _report([](RunListener& listener, const RunRecord& run) { listener.runEnded(run); });
     }

@@ -11,6 +11,7 @@
 #include "frame/host_interface.h"
 #include "host/record/run_listener.h"
 #include "host/record/run_plan.h"
+#include "host/run/bench_judge.h"
 #include "host/run/run_recorder.h"
 
 namespace host {
@@ -25,6 +26,8 @@ struct Bench {
     const std::vector<std::shared_ptr<RunListener>>& listeners;
     // Asks the run to stop.
     std::stop_token stop = {};
+    // Judges each run by the bench's limits; null when there are none.
+    BenchJudge* judge = nullptr;
 };
 
 struct SequenceOutcome {

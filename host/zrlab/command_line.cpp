@@ -69,6 +69,8 @@ constexpr std::string_view kRunExamples = R"(Examples:
       Run on a faulty device of the gallery; report in a standard form.
   zrlab run VantorFaultDiagnostic --set frameCount=30 --set timeout=5 --speed max --until-fail
       Repeat, faster than real time, until a run does not pass.
+  zrlab run VantorFaultDiagnostic --set frameCount=90 --set timeout=10 --limits desk.json --frames frames.csv
+      Also judge by limits of your own; write every frame to a table.
   zrlab run VantorMeterixDiagnostic --device-module ./board.so --device board:rev-b
       Run on a device of a kind that a device module registers.
 
@@ -230,6 +232,23 @@ void CommandLine::_addDeviceModule(CLI::App& command) {
         ->allow_extra_args(false);
 }
 
+void CommandLine::_addLimitsAndTables(CLI::App& run) {
+    run.add_option(
+           "--limits", session.limits,
+           "Also judge by the limits of this file;\nbounds on what the module records and does "
+           "not judge,\npart of the verdict where the file says so")
+        ->type_name("FILE")
+        ->check(notEmpty());
+    run.add_option("--frames", session.frames,
+                   "Write every frame and event to this file as they come: .csv or .jsonl")
+        ->type_name("FILE")
+        ->check(notEmpty());
+    run.add_option("--images", session.images,
+                   "Write the samples of every image to this file: .csv")
+        ->type_name("FILE")
+        ->check(notEmpty());
+}
+
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
@@ -273,6 +292,7 @@ void CommandLine::_addRun() {
         ->check(notEmpty())
         ->take_all()
         ->allow_extra_args(false);
+    _addLimitsAndTables(run);
     run.add_option("--repeat", session.repeat, "Run each name this many times and show the spread")
         ->type_name("N")
         ->check(wholeNumber(1, 1'000'000'000));

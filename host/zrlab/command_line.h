@@ -40,6 +40,7 @@ class CommandLine {
 
   private:
     void _addRun();
+    void _addLimitsAndTables(CLI::App& run);
     void _addPlugin(CLI::App& command);
     void _addDeviceModule(CLI::App& command);
     std::string _explain(const CLI::ParseError& error, int count, const char* const* arguments);

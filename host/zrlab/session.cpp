@@ -1,10 +1,10 @@
 #include "host/zrlab/session.h"
 
+#include <algorithm>
 #include <chrono>
 #include <cstdint>
 #include <memory>
 #include <optional>
-#include <span>
 #include <stop_token>
 #include <string>
 #include <string_view>
@@ -14,6 +14,8 @@
 #include "frame/host_interface.h"
 #include "host/record/problem.h"
 #include "host/report/text_report.h"
+#include "host/run/bench_judge.h"
+#include "host/run/bench_limits.h"
 #include "host/run/judge.h"
 #include "host/run/planner.h"
 #include "host/run/repeat_statistics.h"
@@ -70,6 +72,10 @@ class Session {
         _record.version = options.version;
         _record.commandLine = options.commandLine;
         _record.planned = plansOf(options);
+        if (!options.limits.empty()) {
+            _judge = std::make_shared<BenchJudge>(
+                readBenchLimits(options.limits, runnableNames(ZRLab::defaultLab())));
+        }
         _reports = std::make_shared<SessionReports>(options);
         devices::Device device = openDevice(options.device);
         _record.deviceName = std::move(device.name);
@@ -86,15 +92,20 @@ class Session {
             }
         };
         RunRecorder::FramesDelivered framesDelivered;
-        if (_reports->followFrames()) {
-            framesDelivered = [reports = _reports](std::span<const FrameRecord> frames) {
+        const bool judgesFrames = _judge != nullptr && _judge->followsFrames();
+        if (_reports->followFrames() || judgesFrames) {
+            framesDelivered = [reports = _reports, judge = _judge](const FrameBatch& batch) {
                 for (const auto& report : reports->listeners()) {
-                    report->framesDelivered(frames);
+                    report->framesDelivered(batch);
+                }
+                if (judge != nullptr) {
+                    judge->add(batch);
                 }
             };
         }
-        _recorder = std::make_shared<RunRecorder>(lineLogged, _reports->keepFrames(),
-                                                  std::move(framesDelivered));
+        _recorder =
+            std::make_shared<RunRecorder>(lineLogged, _reports->keepFrames(),
+                                          std::move(framesDelivered), _reports->needsDetails());
         platform::setLogSink(_recorder, log.minimum);
         platform::installServices(observed::observe(std::move(device.services), _recorder));
     }
@@ -103,6 +114,7 @@ class Session {
         for (const std::string& warning : valueWarnings(_record.planned)) {
             Terminal::shared().complain(warning);
         }
+        _warnOfUnusedLimits();
         const auto start = std::chrono::steady_clock::now();
         _stop = interrupt::deferFirst();
         _tell([this](RunListener& report) { report.sessionStarted(_record); });
@@ -133,6 +145,17 @@ class Session {
     void _tell(const Event& event) {
         for (const auto& report : _reports->listeners()) {
             event(*report);
+        }
+    }
+
+    // A station may have one file of limits for all that it runs; a file that is for none of it is a slip.
+    void _warnOfUnusedLimits() const {
+        const auto& planned = _record.planned;
+        if (_judge != nullptr &&
+            std::none_of(planned.begin(), planned.end(),
+                         [&](const auto& plan) { return _judge->hasLimitsFor(plan.name); })) {
+            Terminal::shared().complain("warning: " + _options.limits +
+                                        " has no limits for what is run");
         }
     }
 
@@ -182,7 +205,8 @@ class Session {
         }
         const Progress progress(plan, *_recorder, std::move(prefix));
         SequenceOutcome outcome =
-            runOnce({ZRLab::defaultLab(), *_recorder, _reports->listeners(), _stop}, plan, number);
+            runOnce({ZRLab::defaultLab(), *_recorder, _reports->listeners(), _stop, _judge.get()},
+                    plan, number);
         _isGivenUp = outcome.isGivenUp;
         return std::move(outcome.run);
     }
@@ -215,6 +239,7 @@ class Session {
     const SessionOptions& _options;
     SessionRecord _record;
     std::shared_ptr<SessionReports> _reports;
+    std::shared_ptr<BenchJudge> _judge;  // null when there are no limits of the bench
     std::shared_ptr<RunRecorder> _recorder;
     std::stop_token _stop;
     bool _isGivenUp = false;  // the last run

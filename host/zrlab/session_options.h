@@ -18,6 +18,9 @@ struct SessionOptions {
     std::string format = "text";  // name of a report form for standard output
     std::string output;           // the file that gets the format; empty or "-" for standard output
     std::vector<std::string> reports;  // further files, their form by their ending
+    std::string limits;                // the file of the bench's limits; empty when there is none
+    std::string frames;                // the file of the frames' table; empty when there is none
+    std::string images;                // the file of the images' table; empty when there is none
     std::uint64_t repeat = 0;          // how often; 0 when not asked for
     bool untilFail = false;            // stop at the first run that does not pass
     bool verbose = false;

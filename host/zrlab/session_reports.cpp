@@ -8,6 +8,8 @@
 #include <fmt/format.h>
 
 #include "host/record/problem.h"
+#include "host/report/frame_table.h"
+#include "host/report/image_table.h"
 #include "host/report/report_forms.h"
 #include "host/zrlab/terminal.h"
 
@@ -34,7 +36,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
                                           options.format +
                                           "; a further report is asked for with --report");
         }
-        _addFile(options.output, format);
+        _addFile(options.output, format, options.verbose);
     }
     for (const std::string& path : options.reports) {
         const ReportForm* form = reportFormOf(path);
@@ -42,23 +44,54 @@ SessionReports::SessionReports(const SessionOptions& options) {
             throw Problem(kExitUsage, "--report " + path + ": its ending is not one of " +
                                           fmt::format("{}", fmt::join(reportEndings(), ", ")));
         }
-        _addFile(path, *form);
+        _addFile(path, *form, options.verbose);
     }
-    _refuseClashes(deviceArgument(options.device));
+    _addTables(options);
+    _refuseClashes({deviceArgument(options.device), options.limits});
     for (const File& file : _files) {
         requireWritable(file.path);
     }
     for (File& file : _files) {
-        file.content = openOutputFile(file.path, file.form->streams);
-        _listeners.push_back(file.form->open(
-            [content = file.content](std::string_view text) { content->append(text); },
-            {.colour = false, .verbose = options.verbose, .heading = true}));
+        file.content = openOutputFile(file.path, file.streams);
+        _listeners.push_back(
+            file.open([content = file.content](std::string_view text) { content->append(text); }));
     }
 }
 
-void SessionReports::_addFile(const std::string& path, const ReportForm& form) {
-    _files.push_back({path, &form, nullptr});
+void SessionReports::_addFile(const std::string& path, const ReportForm& form, bool verbose) {
+    const TextStyle style{.colour = false, .verbose = verbose, .heading = true};
+    _files.push_back({path, form.streams, [&form, style](ReportSink sink) {
+                          return form.open(std::move(sink), style);
+                      }});
     _noteFrames(form);
+}
+
+void SessionReports::_addTables(const SessionOptions& options) {
+    struct Table {
+        std::string_view ending;
+        std::shared_ptr<RunListener> (*open)(ReportSink sink);
+    };
+    const auto add = [this](std::string_view option, const std::string& path,
+                            const std::vector<Table>& tables) {
+        const std::string ending = endingOf(path);
+        std::vector<std::string_view> endings;
+        for (const Table& table : tables) {
+            if (table.ending == ending) {
+                _files.push_back({path, true, table.open});
+                return;
+            }
+            endings.push_back(table.ending);
+        }
+        throw Problem(kExitUsage, fmt::format("{} {}: its ending is not {}", option, path,
+                                              fmt::join(endings, " or ")));
+    };
+    if (!options.frames.empty()) {
+        add("--frames", options.frames, {{".csv", openFramesCsv}, {".jsonl", openFramesJsonl}});
+        _followFrames = _needsDetails = true;
+    }
+    if (!options.images.empty()) {
+        add("--images", options.images, {{".csv", openImagesCsv}});
+    }
 }
 
 void SessionReports::_noteFrames(const ReportForm& form) {
@@ -66,8 +99,8 @@ void SessionReports::_noteFrames(const ReportForm& form) {
     _keepFrames = _keepFrames || (form.showsFrames && !form.streams);
 }
 
-// Two reports in one file, or a report over the file that describes the device.
-void SessionReports::_refuseClashes(const std::string& device) const {
+// Two reports in one file, or a report over a file that the session reads.
+void SessionReports::_refuseClashes(const std::vector<std::string>& inputs) const {
     std::set<std::filesystem::path> seen;
     const auto add = [&seen](const std::string& file) {
         std::error_code none;
@@ -77,13 +110,16 @@ void SessionReports::_refuseClashes(const std::string& device) const {
         return special || seen.insert(path).second;
     };
     std::error_code none;
-    if (std::filesystem::exists(device, none)) {
-        add(device);
+    for (const std::string& input : inputs) {
+        if (std::filesystem::exists(input, none)) {
+            add(input);
+        }
     }
     for (const File& file : _files) {
         if (!add(file.path)) {
-            throw Problem(kExitUsage,
-                          file.path + ": already used for the device or another report");
+            throw Problem(
+                kExitUsage,
+                file.path + ": already used for the device, the limits or another report");
         }
     }
 }

@@ -3,6 +3,7 @@
 #define ZR_HOST_ZRLAB_SESSION_REPORTS_H
 
 #include <atomic>
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -16,7 +17,7 @@
 namespace host {
 
 // One report goes to standard output, or to the file that --output names; a further one to each file that
-// --report names.
+// --report names, and a table of numbers to those of --frames and --images.
 //
 // Owner    The session, and the log's sink: a time-out that outlives its run may log when the session is
 //          gone.
@@ -33,8 +34,10 @@ class SessionReports {
     // The reports, in the order in which they were asked for.
     const std::vector<std::shared_ptr<RunListener>>& listeners() const { return _listeners; }
 
-    // Whether one of them shows frames as they come, and whether one needs the frames of a whole run.
+    // Whether one of them shows frames as they come, whether one needs all of their metadata and the events,
+    // and whether one needs the frames of a whole run.
     bool followFrames() const { return _followFrames; }
+    bool needsDetails() const { return _needsDetails; }
     bool keepFrames() const { return _keepFrames; }
 
     // Whether standard output takes no more: its reader has gone.
@@ -48,17 +51,21 @@ class SessionReports {
   private:
     struct File {
         std::string path;
-        const ReportForm* form;
-        std::shared_ptr<OutputFile> content;
+        bool streams;  // as a form of report does
+        std::function<std::shared_ptr<RunListener>(ReportSink sink)> open;
+        std::shared_ptr<OutputFile> content = nullptr;
     };
 
     void _noteFrames(const ReportForm& form);
-    void _addFile(const std::string& path, const ReportForm& form);
-    void _refuseClashes(const std::string& device) const;
+    void _addFile(const std::string& path, const ReportForm& form, bool verbose);
+    void _addTables(const SessionOptions& options);
+    // `inputs` are files that the session reads.
+    void _refuseClashes(const std::vector<std::string>& inputs) const;
 
     std::vector<File> _files;
     std::vector<std::shared_ptr<RunListener>> _listeners;
     bool _followFrames = false;
+    bool _needsDetails = false;
     bool _keepFrames = false;
     // Set by the thread that makes a line, read by the session's.
     std::atomic<bool> _outputFailed{false};

@@ -154,10 +154,11 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "zrlab: --report a.pdf: its ending is not one of .html, .json, .jsonl, .txt, .xml\n"},
         {{"run", "VantorMeterixDiagnostic", "--report", "r.json", "--report", "./r.json"},
          64,
-         "zrlab: ./r.json: already used for the device or another report\n"},
+         "zrlab: ./r.json: already used for the device, the limits or another report\n"},
         {{"run", "VantorMeterixDiagnostic", "--device", kBoardModule, "--output", kBoardModule},
          64,
-         "zrlab: " + kBoardModule + ": already used for the device or another report\n"},
+         "zrlab: " + kBoardModule +
+             ": already used for the device, the limits or another report\n"},
         {{"run", "VantorMeterixDiagnostic", "--speed", "-1"},
          64,
          "zrlab: --speed -1: neither \"max\" nor a factor from 0.001 to 100\n"},
@@ -186,6 +187,18 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
         {board({"--device", "board:rev-b", "--speed", "2"}), 64,
          "zrlab: --speed 2: devices of the kind \"board\" do not take a speed\n"},
         {board({"--device", "board:rev-z"}), 2, "zrlab: board rev-z: not connected\n"},
+        {{"run", "VantorMeterixDiagnostic", "--frames", "f.txt"},
+         64,
+         "zrlab: --frames f.txt: its ending is not .csv or .jsonl\n"},
+        {{"run", "VantorMeterixDiagnostic", "--images", "i.jsonl"},
+         64,
+         "zrlab: --images i.jsonl: its ending is not .csv\n"},
+        {{"run", "VantorMeterixDiagnostic", "--frames", "/no/such/f.csv"},
+         64,
+         "zrlab: cannot write /no/such/f.csv: No such file or directory\n"},
+        {{"run", "VantorMeterixDiagnostic", "--limits", "/no/such"},
+         64,
+         "zrlab: --limits /no/such: cannot be read: No such file or directory\n"},
         {{"help", "runn"}, 64, "zrlab: help: unknown command \"runn\"; did you mean run?\n"},
     };
     for (const Row& row : rows) {
@@ -337,7 +350,7 @@ std::vector<std::string> endlessRun(const fs::path& folder) {
     for (const char* ending : {"html", "json", "jsonl", "xml", "txt"}) {
         arguments = with(arguments, {"--report", (folder / "report.").string() + ending});
     }
-    return arguments;
+    return with(arguments, {"--frames", (folder / "frames.csv").string()});
 }
 
 std::string contentOf(const fs::path& file) {
@@ -367,7 +380,8 @@ TEST(Program, AnInterruptLosesNothing) {
                         HasSubstr("INTERRUPTED"));
         }
         EXPECT_THAT(contentOf(folder / "report.jsonl"), HasSubstr("\"testRunEnd\""));
-        EXPECT_EQ(std::distance(fs::directory_iterator(folder), fs::directory_iterator()), 5);
+        EXPECT_THAT(contentOf(folder / "frames.csv"), HasSubstr("\r\nVantorFaultDiagnostic,1,"));
+        EXPECT_EQ(std::distance(fs::directory_iterator(folder), fs::directory_iterator()), 6);
     }
 }
 
@@ -408,6 +422,104 @@ TEST(Program, ALateLineStaysWithItsRun) {
     EXPECT_EQ(runs[0]["log"].back()["message"], "Timeout has been reached.");
     EXPECT_EQ(runs[0]["verdict"], "PASS");
     EXPECT_THAT(runs[1]["log"].dump(), Not(HasSubstr("Timeout has been")));
+}
+
+// What only a limit of the bench shows on the devices of the gallery.
+TEST(Program, JudgesByTheLimitsOfTheBench) {
+    const fs::path file = newFolder() / "mine.json";
+    std::ofstream(file) << R"({"partOfVerdict": true, "limits": {
+        "VantorFaultDiagnostic": {
+          "measurements": {"LPDP": {"atMost": 0}, "UART": {"atMost": 0}, "Projector": {"atMost": 0}},
+          "frames": {"lost": {"atMost": 0}, "DIETemperatureActive": {"below": 60},
+                     "floodActiveTemperature": {"below": 60}}},
+        "KirraImageExperiment": {
+          "images": {"temperature": {"below": 60}, "amplitude": {"above": 10000}}}}})";
+    struct Row {
+        const char* device;
+        bool images;
+        int status;
+        const char* text;
+    };
+    const Row rows[] = {
+        {"healthy", false, 0,
+         "PASS  VantorFaultDiagnostic  all 64 limits met; all 6 bench limits met"},
+        {"unjudged-errors", false, 1, "  ✗ UART            11 errors  mine: ≤ 0 errors\n"},
+        {"frames-dropped", false, 1, "  ✗ frames lost        5 frames  mine: ≤ 0 frames\n"},
+        {"module-hot", false, 1, "  ✗ DIE active, greatest   "},
+        {"flood-temperature-absent", false, 2, "  ? Flood active, greatest    not measured  "},
+        {"module-overheats", false, 2, "2 of 6 bench limits not met, 3 not measured"},
+        {"healthy", true, 0, "PASS  KirraImageExperiment  completed; all 2 bench limits met"},
+        {"sensor-hot", true, 1, "  ✗ image temperature, greatest         86.1 °C  mine: < 60 °C\n"},
+        {"sensor-no-echo", true, 1, "  ✗ image amplitude, least  "},
+    };
+    for (const Row& row : rows) {
+        const test::Outcome outcome =
+            row.images
+                ? zrlab({"run", "KirraImageExperiment", "--set", "images=5", "--set", "timeout=60",
+                         "--speed", "max", "--device", row.device, "--limits", file.string()})
+                : zrlab({"run", "VantorFaultDiagnostic", "--set", "frameCount=30", "--set",
+                         "timeout=60", "--speed", "max", "--device", row.device, "--limits",
+                         file.string()});
+        EXPECT_EQ(outcome.status, row.status) << row.device << outcome.output;
+        EXPECT_THAT(outcome.output, HasSubstr(row.text)) << row.device;
+    }
+    EXPECT_THAT(zrlab({"run", "VantorMeterixDiagnostic", "--limits", file.string()}).errors,
+                HasSubstr("mine.json has no limits for what is run"));
+    // Jitter shows in real time, however fast the machine.
+    std::ofstream(file) << R"({"partOfVerdict": true, "limits": {"VantorFaultDiagnostic": {
+        "frames": {"arrivalInterval": {"below": 36}}}}})";
+    const test::Outcome jitter =
+        zrlab({"run", "VantorFaultDiagnostic", "--set", "frameCount=20", "--set", "timeout=60",
+               "--device", "frame-jitter", "--limits", file.string()});
+    EXPECT_EQ(jitter.status, 1) << jitter.output;
+}
+
+TEST(Program, WritesFramesAndImagesAsTheyCome) {
+    const fs::path folder = newFolder();
+    const std::string frames = (folder / "frames.csv").string();
+    const test::Outcome outcome = zrlab({"run",
+                                         "VantorFaultDiagnostic",
+                                         "KirraImageExperiment",
+                                         "--set",
+                                         "frameCount=40",
+                                         "--set",
+                                         "images=3",
+                                         "--set",
+                                         "timeout=60",
+                                         "--speed",
+                                         "max",
+                                         "--device",
+                                         "stream-events",
+                                         "--repeat",
+                                         "2",
+                                         "--format",
+                                         "json",
+                                         "--frames",
+                                         frames,
+                                         "--images",
+                                         (folder / "images.csv").string()});
+    EXPECT_EQ(outcome.status, 0) << outcome.errors;
+    const auto countOf = [](const std::string& text, const std::string& part) {
+        int count = 0;
+        for (std::size_t at = 0; (at = text.find(part, at)) != std::string::npos; ++at) {
+            ++count;
+        }
+        return count;
+    };
+    const std::string text = contentOf(frames);
+    EXPECT_EQ(countOf(text, ",event,20"), 4);
+    // The second run is the one that the report holds.
+    const Json run = Json::parse(outcome.output)["runs"][0];
+    EXPECT_EQ(countOf(text, "\r\nVantorFaultDiagnostic,2,"), run["framesDelivered"].get<int>() + 2);
+    EXPECT_GE(run["framesDelivered"], 40);
+    EXPECT_EQ(countOf(contentOf(folder / "images.csv"), "\r\nKirraImageExperiment,"), 6);
+    EXPECT_EQ(std::distance(fs::directory_iterator(folder), fs::directory_iterator()), 2);
+
+    // A disk without room: one line, exit status 2.
+    fs::create_symlink("/dev/full", folder / "full.csv");
+    const test::Outcome full = zrlab(with(kFaultRun, {"--frames", (folder / "full.csv").string()}));
+    EXPECT_EQ(full.status, 2);
+    EXPECT_THAT(full.errors, HasSubstr("full.csv: No space left on device\n"));
 }
 
 }  // namespace

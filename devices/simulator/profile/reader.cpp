@@ -1,18 +1,15 @@
 #include "devices/simulator/profile/reader.h"
 
 #include <algorithm>
-#include <cctype>
-#include <cerrno>
 #include <cstddef>
-#include <cstring>
 #include <filesystem>
-#include <fstream>
 #include <utility>
 
 #include "devices/simulator/profile/gallery_text.h"
 #include "devices/simulator/profile/parts.h"
 #include "input/json_reader.h"
 #include "input/nearest.h"
+#include "input/text_file.h"
 
 namespace simulator {
 
@@ -23,12 +20,7 @@ using input::parseJson;
 
 namespace {
 
-constexpr std::size_t kLongestFile = std::size_t{1} << 20U;
 constexpr std::size_t kLongestChain = 16;
-
-bool isControl(char character) {
-    return std::iscntrl(static_cast<unsigned char>(character)) != 0;
-}
 
 // A document that describes a device, or a part of it.
 struct Source {
@@ -52,22 +44,7 @@ Source builtIn(const std::string& name) {
 }
 
 Source file(const std::filesystem::path& path) {
-    std::error_code ignored;
-    if (std::filesystem::is_directory(path, ignored)) {
-        throw DocumentProblem(path.string() + ": a folder, not a profile");
-    }
-    errno = 0;
-    std::ifstream stream(path, std::ios::binary);
-    std::string text(kLongestFile + 1, '\0');
-    stream.read(text.data(), static_cast<std::streamsize>(text.size()));
-    if (!stream.is_open() || stream.bad()) {
-        throw DocumentProblem(path.string() + ": cannot be read: " + std::strerror(errno));
-    }
-    text.resize(static_cast<std::size_t>(stream.gcount()));
-    if (text.size() > kLongestFile) {
-        throw DocumentProblem(path.string() + ": longer than 1 MiB");
-    }
-    return {true, path.string(), path.parent_path(), std::move(text)};
+    return {true, path.string(), path.parent_path(), input::readTextFile(path, "a profile")};
 }
 
 Source findSource(const std::string& nameOrFile, const std::filesystem::path& folder) {
@@ -152,8 +129,7 @@ std::optional<DeviceProfile> loadProfile(const std::string& nameOrFile,
     }
     for (std::string& problem : found) {
         problem.insert(0, at.empty() ? "" : at + ": ");
-        std::replace_if(problem.begin(), problem.end(), isControl, '?');
-        problems.push_back(std::move(problem));
+        problems.push_back(input::oneLine(std::move(problem)));
     }
     device.name = nameOrFile;
     return found.empty() ? std::optional(std::move(device)) : std::nullopt;

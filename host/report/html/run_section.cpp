@@ -147,6 +147,8 @@ std::string judgementHtml(Judgement judgement) {
             return "<span class=\"pass\"><span aria-hidden=\"true\">✓</span> within</span>";
         case Judgement::Outside:
             return "<span class=\"fail\"><span aria-hidden=\"true\">✗</span> outside</span>";
+        case Judgement::NotMeasured:
+            return "<span class=\"fail\"><span aria-hidden=\"true\">?</span> not measured</span>";
         case Judgement::Information:
             break;
     }
@@ -184,6 +186,26 @@ std::string errorHtml(const FailureRecord& failure, const RunRecord& run) {
                        htmlText(placeText(failure, run)), causes);
 }
 
+// The limits of the bench that kept the run from passing.
+std::string benchFailuresHtml(const RunRecord& run) {
+    Table table("Limits of the bench not met",
+                {{"Quantity"}, {"Measured", "judged"}, {"Limit"}, {"Range"}, {"Deviation"}});
+    for (const BenchResult& result : run.benchResults) {
+        if (!isBenchFinding(result)) {
+            continue;
+        }
+        const bool isMeasured = result.judgement != Judgement::NotMeasured;
+        table.row(
+            {htmlText(result.name),
+             fmt::format("<strong class=\"fail\">{}</strong> {}",
+                         isMeasured ? numberText(result.value) : "not measured",
+                         htmlText(result.unit)),
+             limitName(result.limit), rangeHtml(result.limit, result.unit),
+             htmlText(isMeasured ? deviationText(result.value, *result.limit) : result.note)});
+    }
+    return table.html();
+}
+
 std::string failuresHtml(const RunRecord& run) {
     std::string errors;
     for (const FailureRecord& failure : run.failures) {
@@ -200,7 +222,33 @@ std::string failuresHtml(const RunRecord& run) {
                        htmlText(deviationText(result.value, *result.limit))});
         }
     }
-    return errors + table.html();
+    return errors + table.html() + benchFailuresHtml(run);
+}
+
+// Every limit of the bench, apart from the module's own.
+std::string benchHtml(const RunRecord& run) {
+    if (run.benchResults.empty()) {
+        return "";
+    }
+    Table table("Limits of the bench, which the module does not judge", {{"Quantity"},
+                                                                         {"Value", "number"},
+                                                                         {"Unit"},
+                                                                         {"Limit"},
+                                                                         {"Range"},
+                                                                         {"Judgement", "judged"},
+                                                                         {"Part of the verdict"}});
+    for (const BenchResult& result : run.benchResults) {
+        const bool isMeasured = result.judgement != Judgement::NotMeasured;
+        table.row(
+            {htmlText(result.name) + (isMeasured ? ""
+                                                 : fmt::format(" <span class=\"faint\">{}</span>",
+                                                               htmlText(result.note))),
+             isMeasured ? numberText(result.value) : "–", htmlText(result.unit),
+             limitName(result.limit), rangeHtml(result.limit), judgementHtml(result.judgement),
+             result.partOfVerdict ? "yes" : "no"},
+            result.judgement == Judgement::Within ? "" : "outside");
+    }
+    return fmt::format("<p>{}.</p>\n", htmlText(benchHeadline(run))) + table.html();
 }
 
 std::string resultsHtml(const RunRecord& run) {
@@ -236,6 +284,10 @@ std::string findingsHtml(const Repetition& one) {
                         "class=\"faint\">{}</span>",
                         htmlText(result.name), htmlText(valueText(result.value, result.unit)),
                         htmlText(limitLine(result.limit, result.unit))));
+    }
+    for (const BenchResult& result : one.bench) {
+        findings.push_back(fmt::format("{} <span class=\"faint\">{}</span>", htmlText(result.name),
+                                       htmlText(benchLine(result, false))));
     }
     if (findings.empty()) {
         return htmlText(one.why);
@@ -298,31 +350,40 @@ std::string outcomesHtml(const RepeatRecord& repeat) {
     return html;
 }
 
-std::string statisticsHtml(const RepeatRecord& repeat) {
+std::string statisticsHtml(const std::vector<ResultStatistics>& results, bool ofBench) {
     const std::vector<Column> columns = {
         {"Result"}, {"Least", "number"}, {"Median", "number"}, {"Greatest", "number"}, {"Unit"},
         {"Limit"},  {"Range"},           {"Outside", "judged"}};
-    Table table("Results that differed from run to run, or were outside their limits", columns);
-    Table alike("Results within their limits and alike in every run", columns);
+    const std::string_view what = ofBench ? "Limits of the bench" : "Results";
+    Table table(fmt::format("{} that differed from run to run, or were {}", what,
+                            ofBench ? "not met" : "outside their limits"),
+                columns);
+    Table alike(fmt::format("{} {} and alike in every run", what,
+                            ofBench ? "that were met" : "within their limits"),
+                columns);
     std::uint64_t alikeCount = 0;
-    for (const ResultStatistics& result : repeat.results) {
-        const bool isAlike = result.outside == 0 && result.minimum == result.maximum;
+    for (const ResultStatistics& result : results) {
+        const bool isBad = result.outside > 0 || result.notMeasured > 0;
+        const bool isAlike = !isBad && result.minimum == result.maximum;
         alikeCount += isAlike ? 1 : 0;
-        const std::string outside = fmt::format("{} of {}", result.outside, result.runs);
+        std::string outside = fmt::format("{} of {}", result.outside, result.runs);
+        if (result.notMeasured > 0) {
+            outside += fmt::format(", {} not measured", result.notMeasured);
+        }
         (isAlike ? alike : table)
             .row({htmlText(result.name), numberText(result.minimum), numberText(result.median),
                   numberText(result.maximum), htmlText(result.unit), limitName(result.limit),
                   rangeHtml(result.limit),
-                  result.outside > 0
-                      ? fmt::format("<span class=\"fail\"><span aria-hidden=\"true\">✗</span> "
-                                    "{}</span>",
-                                    outside)
-                      : outside},
-                 result.outside > 0 ? "outside" : "");
+                  isBad ? fmt::format("<span class=\"fail\"><span aria-hidden=\"true\">✗</span> "
+                                      "{}</span>",
+                                      outside)
+                        : outside},
+                 isBad ? "outside" : "");
     }
-    return table.html() +
-           folded(plural(alikeCount, "result alike in every run", "results alike in every run"),
-                  alike.html());
+    const std::string_view one = ofBench ? "bench limit" : "result";
+    return table.html() + folded(fmt::format("{} alike in every run",
+                                             plural(alikeCount, one, fmt::format("{}s", one))),
+                                 alike.html());
 }
 
 std::string repetitionsHtml(const RepeatRecord* repeat,
@@ -335,8 +396,8 @@ std::string repetitionsHtml(const RepeatRecord* repeat,
                "<p>{}: {}. The other sections show run {}, {}.</p>\n",
                plural(repeat->runs, "run", "runs"), countsText(*repeat), run.number,
                run.verdict == Verdict::Passed ? "the last" : "the first that did not pass") +
-           outcomesHtml(*repeat) + notPassedHtml(*repeat) + statisticsHtml(*repeat) +
-           figuresHtml(repetitionFigure(*repeat, id));
+           outcomesHtml(*repeat) + notPassedHtml(*repeat) + statisticsHtml(repeat->results, false) +
+           statisticsHtml(repeat->benchResults, true) + figuresHtml(repetitionFigure(*repeat, id));
 }
 
 std::string measurementsHtml(const RunRecord& run) {
@@ -439,6 +500,7 @@ std::string runHtml(const RunRecord& run, const RepeatRecord* repeat, const Sect
                     verdictHtml(run.verdict), htmlText(headline(run)), run.seconds);
     Sections sections(place.id);
     sections.add("What failed", failuresHtml(run));
+    sections.add("Limits of the bench", benchHtml(run));
     sections.add("Repetitions", repetitionsHtml(repeat, run, place.id));
     sections.add("Frames", framesHtml(run) + figuresHtml(frameFigures(run, place.id)));
     sections.add("Images", figuresHtml(imageFigures(run, place.id)));

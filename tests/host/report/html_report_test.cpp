@@ -51,6 +51,14 @@ TEST(HtmlReport, TellsTheVerdictFirstThenWhatFailed) {
                   "stopped after 37 of 90 frames|As measured by the experiment|Channel 59");
 }
 
+TEST(HtmlReport, ShowsTheLimitsOfTheBenchApart) {
+    expectInOrder(host::htmlReport(test::benchSession()),
+                  "FAIL|What failed|Limits of the bench not met|frame interval, greatest|133.5|"
+                  "93.5 above|Flood active, greatest|not measured|no frame has it|"
+                  "Limits of the bench, which the module does not judge|LPDP|within|yes|"
+                  "NTC active, greatest|71|outside|no|Results and limits");
+}
+
 TEST(HtmlReport, DrawsWhatThereIsAndNothingElse) {
     const std::string page = host::htmlReport(test::streamedSession(90));
     expectInOrder(

@@ -37,7 +37,8 @@ TEST(JsonReport, HoldsWhatEachRepetitionFound) {
                                               {"value", 3.0},
                                               {"unit", "events"},
                                               {"judgement", "outside"},
-                                              {"limit", limit}}})}}));
+                                              {"limit", limit}}})},
+                    {"bench", Json::array()}}));
     EXPECT_EQ(at(session, "/repeats/0/notPassed/1/failures/0"), Json::parse(R"({
         "part": "experiment", "step": "run", "message": "Failed to start streaming.",
         "error": {"domain": "PlugInErrorDomain", "code": 204,
@@ -61,6 +62,14 @@ TEST(JsonReport, HoldsFramesLateLinesAndWhatWasNotStarted) {
     const Json log = at(test::judgedSession(), "/runs/0/log");
     EXPECT_FALSE(log[0].contains("late"));
     EXPECT_EQ(log[1]["late"], true);
+}
+
+TEST(JsonReport, HoldsWhatTheLimitsOfTheBenchFound) {
+    EXPECT_EQ(at(test::benchSession(), "/runs/0/benchResults/2"), Json::parse(R"({
+        "name": "Flood active, greatest", "value": null, "unit": "", "judgement": "not measured",
+        "limit": {"name": "Desk", "lower": null, "upper": {"value": 40.0, "open": true}},
+        "partOfVerdict": true, "note": "no frame has it"})"));
+    EXPECT_EQ(at(test::benchSession(), "/runs/0/benchResults/3/partOfVerdict"), false);
 }
 
 }  // namespace

@@ -248,4 +248,28 @@ TEST(JsonlReport, WritesSampleOutputs) {
     }
 }
 
+// In the last step, before its diagnosis.
+TEST(JsonlReport, MarksWhatTheLimitsOfTheBenchFound) {
+    std::vector<Json> artifacts = artifactsOf(test::benchSession());
+    const std::string a = "1-FaultDiagnostic-1-analysis";
+    const std::vector<Json> last(artifacts.end() - 6, artifacts.end() - 2);
+    expectArtifacts(
+        last,
+        {step(a,
+              R"("measurement": {"name": "frame interval, greatest", "value": 133.5, "unit": "ms",
+             "hardwareInfoId": "device",
+             "validators": [{"name": "Desk", "type": "LESS_THAN", "value": 40.0}],
+             "metadata": {"judgedBy": "bench", "partOfVerdict": true}})"),
+         step(a, R"("error": {"symptom": "bench-limit-not-measured", "message":
+             "Flood active, greatest: not measured, Desk: < 40; no frame has it",
+             "softwareInfoIds": ["zrlab"]})"),
+         step(a, R"("measurement": {"name": "NTC active, greatest", "value": 71.0,
+             "hardwareInfoId": "device",
+             "validators": [{"name": "Desk", "type": "LESS_THAN", "value": 40.0}],
+             "metadata": {"judgedBy": "bench", "partOfVerdict": false}})"),
+         step(a, R"("diagnosis": {"verdict": "FaultDiagnostic-fail", "type": "FAIL", "message":
+             "all 61 limits met; 2 of 4 bench limits not met, 1 not measured",
+             "hardwareInfoId": "device"})")});
+}
+
 }  // namespace

@@ -86,6 +86,20 @@ TEST_F(JunitReport, HasAnErrorForEachFailedStep) {
                  "property written too early");
 }
 
+TEST_F(JunitReport, TheLimitsOfTheBenchHaveCasesOfTheirOwn) {
+    const pugi::xml_node suite = suiteOf(test::benchSession());
+    EXPECT_THAT(counts(suite), ElementsAre(65, 1, 1, 0));
+    const std::tuple<const char*, const char*> kCases[] = {{"LPDP", "system-out"},
+                                                           {"frame interval, greatest", "failure"},
+                                                           {"Flood active, greatest", "error"},
+                                                           {"NTC active, greatest", "system-out"}};
+    for (const auto& [name, kind] : kCases) {
+        const pugi::xml_node node = suite.find_child_by_attribute("testcase", "name", name);
+        EXPECT_STREQ(node.attribute("classname").value(), "healthy.FaultDiagnostic.bench");
+        EXPECT_STREQ(node.first_child().name(), kind) << name;
+    }
+}
+
 TEST_F(JunitReport, AnExperimentThatRanIsOnePassedCase) {
     const pugi::xml_node suite = suiteOf(test::imagesSession(2));
     EXPECT_THAT(counts(suite), ElementsAre(1, 0, 0, 0));

@@ -224,6 +224,28 @@ SessionRecord interruptedSession() {
     return session;
 }
 
+SessionRecord benchSession() {
+    RunRecord run = diagnosticOf("FaultDiagnostic", Verdict::Failed);
+    addResults(run, false);
+    const auto add = [&run](const std::string& name, double value, const std::string& unit,
+                            Judgement judgement, bool partOfVerdict) {
+        host::BenchResult result;
+        result.name = name;
+        result.value = value;
+        result.unit = unit;
+        result.limit = LimitRecord{"Desk", std::nullopt, BoundRecord{40, true}};
+        result.judgement = judgement;
+        result.partOfVerdict = partOfVerdict;
+        result.note = judgement == Judgement::NotMeasured ? "no frame has it" : "";
+        run.benchResults.push_back(std::move(result));
+    };
+    add("LPDP", 4, "errors", Judgement::Within, true);
+    add("frame interval, greatest", 133.5, "ms", Judgement::Outside, true);
+    add("Flood active, greatest", std::nan(""), "", Judgement::NotMeasured, true);
+    add("NTC active, greatest", 71, "", Judgement::Outside, false);
+    return sessionOf(std::move(run));
+}
+
 SessionRecord mixedSession() {
     SessionRecord session = streamedSession(90);
     for (SessionRecord other : {judgedSession(kHostile), brokenSession(), imagesSession(25)}) {
@@ -254,9 +276,11 @@ void play(const SessionRecord& session, host::RunListener& listener) {
         }
         // Some at a time, as they come.
         for (std::size_t at = 0; at < run.frames.size(); at += 32) {
-            listener.framesDelivered(
-                std::span(run.frames)
-                    .subspan(at, std::min<std::size_t>(32, run.frames.size() - at)));
+            const auto frames = std::span(run.frames)
+                                    .subspan(at, std::min<std::size_t>(32, run.frames.size() - at));
+            listener.framesDelivered({.frames = {frames.begin(), frames.end()},
+                                      .metadata = std::vector<platform::Dictionary>(frames.size()),
+                                      .events = {}});
         }
         tell(host::Part::Experiment, false);
         // What was given up does not end its part.
@@ -280,7 +304,7 @@ std::vector<std::pair<std::string, SessionRecord>> sampleSessions() {
             {"images", imagesSession(25)},         {"long", streamedSession(20000)},
             {"long-images", imagesSession(3000)},  {"repeated", repeatedSession()},
             {"interrupted", interruptedSession()}, {"mixed", mixedSession()},
-            {"empty-images", imagesSession(0)}};
+            {"empty-images", imagesSession(0)},    {"bench", benchSession()}};
 }
 
 void writeSample(const std::string& file, const std::string& content) {

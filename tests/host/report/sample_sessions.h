@@ -38,6 +38,10 @@ host::SessionRecord repeatedSession();
 // A diagnostic twice and an experiment: the first run passed, the second was given up after 37 frames.
 host::SessionRecord interruptedSession();
 
+// A diagnostic that passed its own limits and failed those of the bench: one met, one not met, one not measured,
+// and one not met that is not part of the verdict.
+host::SessionRecord benchSession();
+
 // All of the above as one session of several runs.
 host::SessionRecord mixedSession();
 

@@ -50,6 +50,25 @@ TEST(TextReport, ARepeatedNameBeginsWithItsFigures) {
                       HasSubstr("\n\nrun 7:\nFAIL")));
 }
 
+TEST(TextReport, ShowsTheLimitsOfTheBenchApart) {
+    EXPECT_THAT(
+        textOf(test::benchSession()),
+        AllOf(
+            StartsWith(
+                "FAIL  FaultDiagnostic  all 61 limits met; 2 of 4 bench limits not met, 1 not "
+                "measured  3.25 s\n"),
+            HasSubstr("\n  2 of 4 bench limits not met, 1 not measured\n"
+                      "  ✗ frame interval, greatest        133.5 ms  Desk: < 40 ms\n"
+                      "  ? Flood active, greatest      not measured  Desk: < 40; no frame has it\n"
+                      "  ✗ NTC active, greatest                  71  Desk: < 40; not part of the "
+                      "verdict\n"),
+            Not(HasSubstr("LPDP"))));
+    // What a run that did not complete could not measure is counted, not listed.
+    host::SessionRecord broken = test::benchSession();
+    broken.runs[0].failures = test::brokenSession().runs[0].failures;
+    EXPECT_THAT(textOf(broken), Not(HasSubstr("no frame has it")));
+}
+
 TEST(TextReport, BeginsWithAHeadingWhenItIsKept) {
     const host::SessionRecord session = test::imagesSession(1);
     EXPECT_THAT(textOf(session), StartsWith("PASS  ImageExperiment"));

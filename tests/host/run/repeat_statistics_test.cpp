@@ -74,4 +74,30 @@ TEST(RepeatStatistics, AnExperimentAloneIsCountedByItsMeasurements) {
     EXPECT_EQ(statistics.record().results[0].outside, 0U);
 }
 
+TEST(RepeatStatistics, TheLimitsOfTheBenchAreCountedApart) {
+    host::RepeatStatistics statistics("D");
+    const std::pair<double, Judgement> found[] = {
+        {1, Judgement::Within}, {7, Judgement::Outside}, {std::nan(""), Judgement::NotMeasured}};
+    for (const auto& [value, judgement] : found) {
+        RunRecord one = run(judgement == Judgement::Within ? Verdict::Passed : Verdict::Failed, 0,
+                            Judgement::Within);
+        host::BenchResult& result = one.benchResults.emplace_back();
+        result.name = "noise";  // as one of the module's results
+        result.value = value;
+        result.judgement = judgement;
+        result.partOfVerdict = true;
+        statistics.add(one);
+    }
+    const host::RepeatRecord record = statistics.record();
+    ASSERT_EQ(record.benchResults.size(), 1U);
+    const host::ResultStatistics& noise = record.benchResults[0];
+    EXPECT_EQ(noise.runs, 2U);
+    EXPECT_EQ(noise.outside, 1U);
+    EXPECT_EQ(noise.notMeasured, 1U);
+    EXPECT_EQ(noise.maximum, 7);
+    EXPECT_EQ(record.results[0].runs, 3U);
+    ASSERT_EQ(record.notPassed.size(), 2U);
+    EXPECT_EQ(record.notPassed[0].bench.size(), 1U);
+}
+
 }  // namespace

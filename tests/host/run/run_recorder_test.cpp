@@ -2,7 +2,7 @@
 
 #include <latch>
 #include <numeric>
-#include <span>
+#include <string>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -57,9 +57,9 @@ TEST(RunRecorder, HandsOnEveryFrameInItsOrderWithoutWaitingForItsReader) {
         std::latch goesOn(1);
         std::vector<std::uint64_t> numbers;
         host::RunRecorder recorder([](const host::LogRecord&) {}, false,
-                                   [&](std::span<const host::FrameRecord> frames) {
+                                   [&](const host::FrameBatch& batch) {
                                        goesOn.wait();
-                                       for (const host::FrameRecord& frame : frames) {
+                                       for (const host::FrameRecord& frame : batch.frames) {
                                            numbers.push_back(frame.number);
                                        }
                                    });
@@ -85,6 +85,39 @@ TEST(RunRecorder, HandsOnEveryFrameInItsOrderWithoutWaitingForItsReader) {
         recorder.end(run);
         EXPECT_EQ(numbers.back(), kFrames + 1);
     }
+}
+
+// With details, the events and the metadata come with the frames that they stand among.
+TEST(RunRecorder, HandsOnEventsAndMetadataWhenAsked) {
+    std::vector<std::string> came;
+    host::RunRecorder recorder(
+        [](const host::LogRecord&) {}, false,
+        [&](const host::FrameBatch& batch) {
+            std::size_t event = 0;
+            for (std::size_t at = 0; at <= batch.frames.size(); ++at) {
+                for (; event < batch.events.size() && batch.events[event].framesBefore == at;
+                     ++event) {
+                    came.push_back("event " + std::to_string(batch.events[event].code));
+                }
+                if (at < batch.frames.size()) {
+                    came.push_back("frame " + batch.metadata[at].number("FrameNumber").text());
+                }
+            }
+        },
+        true);
+    std::vector<std::string> expected;
+    recorder.begin();
+    for (int number = 1; number <= 100; ++number) {
+        if (number % 7 == 0) {
+            recorder.eventDelivered({.code = number, .time = {}, .info = 0, .delivered = {}});
+            expected.push_back("event " + std::to_string(number));
+        }
+        recorder.frameDelivered(frameNumbered(static_cast<std::uint64_t>(number), number));
+        expected.push_back("frame " + std::to_string(number));
+    }
+    host::RunRecord run;
+    recorder.end(run);
+    EXPECT_EQ(came, expected);
 }
 
 }  // namespace

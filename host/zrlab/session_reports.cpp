@@ -9,11 +9,12 @@
 
 #include "host/record/problem.h"
 #include "host/report/report_forms.h"
+#include "host/zrlab/file_template.h"
 #include "host/zrlab/terminal.h"
 
 namespace host {
 
-SessionReports::SessionReports(const SessionOptions& options) {
+SessionReports::SessionReports(const SessionOptions& options, const SessionRecord& session) {
     const ReportForm& format = *reportFormNamed(options.format);
     if (options.output.empty() || options.output == "-") {
         const TextStyle style{.colour = Terminal::outputTakesColour(options.colour),
@@ -27,16 +28,18 @@ SessionReports::SessionReports(const SessionOptions& options) {
             style));
         _noteFrames(format);
     } else {
-        const ReportForm* meant = reportFormOf(options.output);
+        const std::string path = fileNameOf("--output", options.output, session);
+        const ReportForm* meant = reportFormOf(path);
         if (meant != nullptr && meant != &format) {
-            throw Problem(kExitUsage, "--output " + options.output + ": its ending says " +
+            throw Problem(kExitUsage, "--output " + path + ": its ending says " +
                                           std::string(meant->name) + ", the format is " +
                                           options.format +
                                           "; a further report is asked for with --report");
         }
-        _addFile(options.output, format);
+        _addFile(path, format);
     }
-    for (const std::string& path : options.reports) {
+    for (const std::string& pattern : options.reports) {
+        const std::string path = fileNameOf("--report", pattern, session);
         const ReportForm* form = reportFormOf(path);
         if (form == nullptr) {
             throw Problem(kExitUsage, "--report " + path + ": its ending is not one of " +

@@ -23,9 +23,10 @@ namespace host {
 // Threads  The session's; what the listeners are called on, run_listener.h says.
 class SessionReports {
   public:
-    // Checks that every report can be written. Throws a Problem: kExitUsage about a file's ending, a file
+    // Checks that every report can be written. `session` is what the names of files are made from: its
+    // identity, planned names and start. Throws a Problem: kExitUsage about a file's name or ending, a file
     // that is used twice or for the device, or one that cannot be written.
-    explicit SessionReports(const SessionOptions& options);
+    SessionReports(const SessionOptions& options, const SessionRecord& session);
 
     SessionReports(const SessionReports&) = delete;
     SessionReports& operator=(const SessionReports&) = delete;

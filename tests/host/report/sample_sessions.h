@@ -38,6 +38,9 @@ host::SessionRecord repeatedSession();
 // A diagnostic twice and an experiment: the first run passed, the second was given up after 37 frames.
 host::SessionRecord interruptedSession();
 
+// A session whose unit and place are named, by hostile texts among others; one run.
+host::SessionRecord identifiedSession();
+
 // All of the above as one session of several runs.
 host::SessionRecord mixedSession();
 

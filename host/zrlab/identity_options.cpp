@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <cstddef>
 
-#include <limits.h>
 #include <unistd.h>
 
+#include <climits>
 #include <fmt/format.h>
 
 #include "host/record/clean_text.h"

@@ -24,6 +24,7 @@ namespace host {
 namespace {
 
 constexpr std::string_view kPrefix = "ZRLAB_";
+constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";  // some editors begin files with it
 constexpr const char* kCommandLine = "command line";
 
 std::string nameOf(const CLI::Option& option) {
@@ -204,7 +205,11 @@ std::vector<Setting> readSettingsFile(const std::string& path, const CLI::App& r
     std::vector<Setting> settings;
     std::string line;
     for (std::size_t number = 1; std::getline(file, line); ++number) {
-        const std::string_view text = trimmed(line);
+        std::string_view text = line;
+        if (number == 1 && text.starts_with(kByteOrderMark)) {
+            text.remove_prefix(kByteOrderMark.size());
+        }
+        text = trimmed(text);
         if (text.empty() || text.front() == '#') {
             continue;
         }

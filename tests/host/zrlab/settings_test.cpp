@@ -126,8 +126,8 @@ TEST_F(SettingsTest, ReadsFlagsCommentsAndBlanks) {
                                                  {"off", false}, {"no", false}, {"0", false}};
     for (const auto& [value, isSet] : rows) {
         untilFail = !isSet;
-        write("USER",
-              "# comment\r\n\r\n\t until-fail=" + std::string(value) + " \r\nunit = a # = b");
+        write("USER", "\xEF\xBB\xBF# comment\r\n\r\n\t until-fail=" + std::string(value) +
+                          " \r\nunit = a # = b");
         read({});
         EXPECT_EQ(untilFail, isSet) << value;
         EXPECT_EQ(unit, "a # = b");

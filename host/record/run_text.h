@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "host/record/run_record.h"
 
@@ -86,6 +88,11 @@ std::string_view levelText(platform::LogLevel level);
 
 // The line's level, and whether it came late: "error", "error, late".
 std::string levelText(const LogRecord& line);
+
+// What was given about the unit and the place: names and texts, "unit" "SN-7", in the order of Identity;
+// metadata as it is named. Empty when nobody named more than a station: a station alone, which every session
+// has, says nothing about this one.
+std::vector<std::pair<std::string, std::string>> identityTexts(const Identity& identity);
 
 // "90 frames delivered, 3 lost"; without the second when the sensor's numbers are not known.
 // Empty when the run delivered no frames.

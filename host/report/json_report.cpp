@@ -161,7 +161,8 @@ Json jsonOf(const LogRecord& line) {
 }
 
 Json jsonOf(const RunRecord& run) {
-    Json object{{"name", run.plan.name},
+    Json object{{"uuid", run.uuid},
+                {"name", run.plan.name},
                 {"summary", run.plan.summary},
                 {"verdict", verdictText(run.verdict)},
                 {"run", run.number},
@@ -239,6 +240,20 @@ Json deviceOf(const SessionRecord& session) {
             {"facts", std::move(facts)}};
 }
 
+Json identityOf(const Identity& identity) {
+    const auto orNull = [](const std::string& text) { return text.empty() ? Json() : Json(text); };
+    Json metadata = Json::object();
+    for (const auto& [name, text] : identity.metadata) {
+        metadata[name] = text;
+    }
+    return {{"unit", orNull(identity.unit)},
+            {"part", orNull(identity.part)},
+            {"lot", orNull(identity.lot)},
+            {"station", orNull(identity.station)},
+            {"operator", orNull(identity.operatorName)},
+            {"metadata", std::move(metadata)}};
+}
+
 // Text that is not UTF-8 (it may come from a device) must not stop the report.
 std::string textOf(const Json& json, int indent) {
     return json.dump(indent, ' ', false, Json::error_handler_t::replace);
@@ -270,6 +285,7 @@ std::string jsonReport(const SessionRecord& session) {
     Json document{{"program", "zrlab"},
                   {"version", session.version},
                   {"commandLine", session.commandLine},
+                  {"identity", identityOf(session.identity)},
                   {"device", deviceOf(session)},
                   {"started", session.started.timestamp()},
                   {"seconds", session.seconds},

@@ -58,6 +58,37 @@ Json platformsOf(const SessionRecord& session) {
     return platforms;
 }
 
+// The unit, where the standard has a place for it: the numbers of the hardware.
+Json hardwareOf(const SessionRecord& session) {
+    Json hardware{{"hardwareInfoId", kHardwareId}, {"name", session.deviceName}};
+    if (!session.identity.unit.empty()) {
+        hardware["serialNumber"] = session.identity.unit;
+    }
+    if (!session.identity.part.empty()) {
+        hardware["partNumber"] = session.identity.part;
+    }
+    return hardware;
+}
+
+// What belongs to the session and not to the device.
+Json metadataOf(const Identity& identity) {
+    Json metadata = Json::object();
+    const auto add = [&metadata](const std::string& name, const std::string& text) {
+        if (!text.empty()) {
+            metadata[name] = text;
+        }
+    };
+    add("unit", identity.unit);
+    add("part", identity.part);
+    add("lot", identity.lot);
+    add("station", identity.station);
+    add("operator", identity.operatorName);
+    for (const auto& [name, text] : identity.metadata) {
+        metadata["meta." + name] = text;
+    }
+    return metadata;
+}
+
 Json deviceOf(const SessionRecord& session) {
     Json metadata{{"summary", session.deviceSummary}};
     for (const auto& [name, text] : session.deviceFacts) {
@@ -65,15 +96,15 @@ Json deviceOf(const SessionRecord& session) {
             metadata[name] = text;
         }
     }
-    return {{"dutInfoId", session.deviceName},
+    const std::string& unit = session.identity.unit;
+    return {{"dutInfoId", unit.empty() ? session.deviceName : unit},
             {"name", session.deviceName},
             {"platformInfos", platformsOf(session)},
             {"softwareInfos", Json::array({{{"softwareInfoId", kSoftwareId},
                                             {"name", "zrlab"},
                                             {"version", session.version},
                                             {"softwareType", "APPLICATION"}}})},
-            {"hardwareInfos",
-             Json::array({{{"hardwareInfoId", kHardwareId}, {"name", session.deviceName}}})},
+            {"hardwareInfos", Json::array({hardwareOf(session)})},
             {"metadata", std::move(metadata)}};
 }
 
@@ -176,7 +207,8 @@ void JsonlReport::sessionStarted(const SessionRecord& session) {
                                {"version", session.version},
                                {"commandLine", session.commandLine},
                                {"parameters", parametersOf(session)},
-                               {"dutInfo", deviceOf(session)}});
+                               {"dutInfo", deviceOf(session)},
+                               {"metadata", metadataOf(session.identity)}});
 }
 
 void JsonlReport::runStarted(const RunRecord& run) {
@@ -197,6 +229,10 @@ void JsonlReport::partStarted(const RunRecord& run, Part part) {
         _lastFrame.reset();
     }
     _writeStep("testStepStart", {{"name", partOf(run, part).name}});
+    if (part == Part::Experiment) {
+        _writeStep("extension",
+                   {{"name", "run"}, {"content", {{"uuid", run.uuid}, {"number", run.number}}}});
+    }
 }
 
 void JsonlReport::logged(const LogRecord& line) {

@@ -92,6 +92,8 @@ class Suite {
         setSeconds(_node, _repeat != nullptr ? _repeat->seconds : _run.seconds);
         _properties = _node.append_child("properties");
         _property("verdict", verdictText(_run.verdict));
+        _property("uuid", _run.uuid);
+        _identity();
         _property("version", _session.version);
         _property("commandLine", _session.commandLine);
         _property("device", _session.deviceName);
@@ -147,6 +149,23 @@ class Suite {
         pugi::xml_node property = _properties.append_child("property");
         setAttribute(property, "name", name);
         setAttribute(property, "value", value);
+    }
+
+    void _identity() {
+        const Identity& identity = _session.identity;
+        const auto add = [this](const std::string& name, const std::string& text) {
+            if (!text.empty()) {
+                _property(name, text);
+            }
+        };
+        add("unit", identity.unit);
+        add("part", identity.part);
+        add("lot", identity.lot);
+        add("station", identity.station);
+        add("operator", identity.operatorName);
+        for (const auto& [name, text] : identity.metadata) {
+            add("meta." + name, text);
+        }
     }
 
     void _parameters(Part part) {

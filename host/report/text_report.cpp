@@ -262,6 +262,15 @@ std::string body(const RunRecord& run, const Writer& writer) {
     return out;
 }
 
+// The unit and the place in one line; empty when nobody named them.
+std::string identityLine(const SessionRecord& session) {
+    std::string line;
+    for (const auto& [name, text] : identityTexts(session.identity)) {
+        line += fmt::format("{}{} {}", line.empty() ? "" : ", ", plainLine(name), plainLine(text));
+    }
+    return line;
+}
+
 std::string headingOf(const SessionRecord& session) {
     std::string out = fmt::format("zrlab {}, {}\n{}\ndevice {}: {}\n", session.version,
                                   session.started.text(), plainLine(session.commandLine),
@@ -269,7 +278,10 @@ std::string headingOf(const SessionRecord& session) {
     for (const auto& [name, text] : session.deviceFacts) {
         out += fmt::format("  {}: {}\n", plainLine(name), plainLine(text));
     }
-    return out;
+    const std::string identity = identityLine(session);
+    // A report that is kept says where it was made.
+    return out + (identity.empty() ? "station " + plainLine(session.identity.station) : identity) +
+           "\n";
 }
 
 class TextReport final : public RunListener {
@@ -279,6 +291,8 @@ class TextReport final : public RunListener {
     void sessionStarted(const SessionRecord& session) override {
         if (_style.heading) {
             _sink(headingOf(session) + "\n");
+        } else if (const std::string line = identityLine(session); !line.empty()) {
+            _sink(Writer(_style).faintLine(line) + "\n");
         }
     }
 

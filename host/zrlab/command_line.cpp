@@ -11,9 +11,12 @@
 
 #include <fmt/format.h>
 
+#include "host/record/mask_passwords.h"
 #include "host/record/problem.h"
 #include "host/report/report_forms.h"
 #include "host/zrlab/default_plugin.h"
+#include "host/zrlab/file_template.h"
+#include "host/zrlab/identity_options.h"
 #include "input/nearest.h"
 
 namespace host {
@@ -71,6 +74,8 @@ constexpr std::string_view kRunExamples = R"(Examples:
       Repeat, faster than real time, until a run does not pass.
   zrlab run VantorFaultDiagnostic --set frameCount=90 --set timeout=10 --limits desk.json --frames frames.csv
       Also judge by limits of your own; write every frame to a table.
+  zrlab run VantorMeterixDiagnostic --unit SN-7 --report '{unit}-{started}.html'
+      Say which unit it is, and name the report after it.
   zrlab run VantorMeterixDiagnostic --device-module ./board.so --device board:rev-b
       Run on a device of a kind that a device module registers.
 
@@ -97,6 +102,18 @@ std::string formLines() {
                         form.streams ? "written as the session goes on" : "written at its end");
     }
     return lines;
+}
+
+// What may stand in a file's name, and where else options can come from.
+std::string settingsLines() {
+    std::vector<std::string> placeholders;
+    for (const std::string& name : placeholderNames()) {
+        placeholders.push_back("{" + name + "}");
+    }
+    return "In the name of a report's file:\n  " + joined(placeholders, " ") +
+           "\n  {{ and }} stand for braces\n\n"
+           "Options can also come from variables such as ZRLAB_UNIT and ZRLAB_UNTIL_FAIL, and\n"
+           "from the settings files that \"zrlab settings\" lists.\n";
 }
 
 // Which of `names` was meant by a word, or where the commands or options behind `path` are listed.
@@ -196,6 +213,14 @@ CommandLine::CommandLine()
         "Examples:\n  zrlab device show counter-stuck > mine.json\n"
         "  zrlab device check ./mine.json");
 
+    CLI::App* settings = _app.add_subcommand(
+        "settings", "Show the options of run that the environment and files give, and where");
+    settings->footer(
+        "A line of a file is OPTION = VALUE, or a comment that begins with #. The command line\n"
+        "comes first, then the environment, the station's file, the user's and the system's.\n\n"
+        "Examples:\n  ZRLAB_STATION=bench-3 zrlab settings\n"
+        "  ZRLAB_STATION_FILE=./station.conf zrlab settings");
+
     CLI::App* help = _app.add_subcommand("help", "Show the help of a command");
     help->add_option("COMMAND", helpTopic, "The command to explain")->type_name("");
 
@@ -251,6 +276,7 @@ void CommandLine::_addLimitsAndTables(CLI::App& run) {
 
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
+    _run = &run;
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
         ->required()
         ->type_name("");
@@ -276,6 +302,7 @@ void CommandLine::_addRun() {
         ->type_name("FACTOR|max")
         ->check(notEmpty())
         ->default_str("1");
+    addIdentityOptions(run, session.identity, _metadata);
     const std::vector<std::string> formats = reportFormNames();
     run.add_option("--format", session.format, "Form of the report")
         ->check(oneOf(formats))
@@ -315,7 +342,7 @@ void CommandLine::_addRun() {
         ->type_name("debug|default|error|off")
         ->capture_default_str();
     _addPlugin(run);
-    run.footer(formLines() + "\n" + std::string(kRunExamples));
+    run.footer(formLines() + "\n" + settingsLines() + "\n" + std::string(kRunExamples));
 }
 
 std::string CommandLine::_explain(const CLI::ParseError& error,
@@ -354,7 +381,8 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
 
 std::optional<std::string> CommandLine::read(int count, const char* const* arguments) {
     for (int at = 0; at < count; ++at) {
-        session.commandLine += (at > 0 ? " " : "") + std::string(at > 0 ? arguments[at] : "zrlab");
+        // One by one: where a password ends cannot be found in the line.
+        session.commandLine += at > 0 ? " " + maskPasswords(arguments[at]) : "zrlab";
     }
     session.version = ZR_VERSION;
     try {
@@ -364,9 +392,28 @@ std::optional<std::string> CommandLine::read(int count, const char* const* argum
         _app.exit(success, answer, answer);
         return answer.str();
     } catch (const CLI::ParseError& error) {
-        throw Problem(kExitUsage, _explain(error, count, arguments));
+        throw Problem(kExitUsage, maskPasswords(_explain(error, count, arguments)));
     }
+    _takeSettings();
     return std::nullopt;
+}
+
+// Every command that has options of `run`: those that load a module take the modules from the settings too.
+void CommandLine::_takeSettings() {
+    CLI::App& given = *_app.get_subcommands().front();
+    CLI::App& command = given.get_name() == "settings" ? *_run : given;
+    const auto options = std::as_const(command).get_options();
+    if (std::any_of(options.begin(), options.end(), [this](const CLI::Option* option) {
+            return isSettable(*option) && _run->get_option_no_throw(option->get_name()) != nullptr;
+        })) {
+        _settings = std::make_unique<Settings>(*_run, processEnvironment());
+        _settings->fill(command);
+        completeIdentity(session.identity, _metadata);
+    }
+}
+
+std::string CommandLine::settingsText() const {
+    return _settings->text(*_run);
 }
 
 std::string CommandLine::command() const {

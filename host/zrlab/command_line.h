@@ -3,6 +3,7 @@
 #ifndef ZR_HOST_ZRLAB_COMMAND_LINE_H
 #define ZR_HOST_ZRLAB_COMMAND_LINE_H
 
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
@@ -10,6 +11,7 @@
 #include <CLI/CLI.hpp>
 
 #include "host/zrlab/session_options.h"
+#include "host/zrlab/settings.h"
 
 namespace host {
 
@@ -19,14 +21,18 @@ class CommandLine {
     CommandLine(const CommandLine&) = delete;
     CommandLine& operator=(const CommandLine&) = delete;
 
-    // Reads the arguments. Returns nothing when a command is to be carried out, else the text that was
-    // asked for: help, the version. Throws a Problem (kExitUsage) when the line is wrong.
+    // Reads the arguments, then the settings that the command takes. Returns nothing when a command is to be carried out, else the text that was
+    // asked for: help, the version. Throws a Problem (kExitUsage) when the line or a
+    // setting is wrong.
     std::optional<std::string> read(int count, const char* const* arguments);
 
     // The command that was given.
     std::string command() const;
 
     const CLI::App& app() const { return _app; }
+
+    // What "settings" prints.
+    std::string settingsText() const;
 
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe and device
@@ -43,9 +49,13 @@ class CommandLine {
     void _addLimitsAndTables(CLI::App& run);
     void _addPlugin(CLI::App& command);
     void _addDeviceModule(CLI::App& command);
+    void _takeSettings();
     std::string _explain(const CLI::ParseError& error, int count, const char* const* arguments);
 
     CLI::App _app;
+    CLI::App* _run = nullptr;             // of _app
+    std::vector<std::string> _metadata;   // as the options gave it
+    std::unique_ptr<Settings> _settings;  // of a command that takes some
 };
 
 // The commands directly below `app`.

@@ -133,6 +133,9 @@ int run(int count, const char* const* arguments) {
         print(answer.text);
         return answer.status;
     }
+    if (command == "settings") {
+        return print(commandLine.settingsText());
+    }
     if (command == "help") {
         return help(commandLine.helpTopic);
     }

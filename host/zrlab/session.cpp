@@ -71,12 +71,13 @@ class Session {
     explicit Session(const SessionOptions& options) : _options(options) {
         _record.version = options.version;
         _record.commandLine = options.commandLine;
+        _record.identity = options.identity;
         _record.planned = plansOf(options);
         if (!options.limits.empty()) {
             _judge = std::make_shared<BenchJudge>(
                 readBenchLimits(options.limits, runnableNames(ZRLab::defaultLab())));
         }
-        _reports = std::make_shared<SessionReports>(options);
+        _reports = std::make_shared<SessionReports>(options, _record);
         devices::Device device = openDevice(options.device);
         _record.deviceName = std::move(device.name);
         _record.deviceSummary = std::move(device.summary);

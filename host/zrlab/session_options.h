@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "host/record/identity.h"
 #include "host/zrlab/device_choice.h"
 #include "host/zrlab/terminal.h"
 
@@ -16,18 +17,22 @@ struct SessionOptions {
     std::vector<std::string> settings;  // PARAM=VALUE
     DeviceChoice device;
     std::string format = "text";  // name of a report form for standard output
-    std::string output;           // the file that gets the format; empty or "-" for standard output
-    std::vector<std::string> reports;  // further files, their form by their ending
-    std::string limits;                // the file of the bench's limits; empty when there is none
-    std::string frames;                // the file of the frames' table; empty when there is none
-    std::string images;                // the file of the images' table; empty when there is none
-    std::uint64_t repeat = 0;          // how often; 0 when not asked for
-    bool untilFail = false;            // stop at the first run that does not pass
+    // The file that gets the format, and further files, their form by their ending; both with placeholders,
+    // see file_template.h. Without an output, or with "-", the format goes to standard output.
+    std::string output;
+    std::vector<std::string> reports;
+    std::string limits;  // the file of the bench's limits; empty when there is none
+    // The files of the frames' and of the images' table, with placeholders; empty when there is none.
+    std::string frames;
+    std::string images;
+    std::uint64_t repeat = 0;  // how often; 0 when not asked for
+    bool untilFail = false;    // stop at the first run that does not pass
     bool verbose = false;
     Colour colour = Colour::Automatic;
     std::string logLevel = "default";  // debug, default, error or off
+    Identity identity;                 // of the unit, and of the place
     std::string version;               // of the program
-    std::string commandLine;           // as given, for the record
+    std::string commandLine;           // as given, passwords masked, for the record
 };
 
 }  // namespace host

@@ -11,11 +11,12 @@
 #include "host/report/frame_table.h"
 #include "host/report/image_table.h"
 #include "host/report/report_forms.h"
+#include "host/zrlab/file_template.h"
 #include "host/zrlab/terminal.h"
 
 namespace host {
 
-SessionReports::SessionReports(const SessionOptions& options) {
+SessionReports::SessionReports(const SessionOptions& options, const SessionRecord& session) {
     const ReportForm& format = *reportFormNamed(options.format);
     if (options.output.empty() || options.output == "-") {
         const TextStyle style{.colour = Terminal::outputTakesColour(options.colour),
@@ -29,16 +30,18 @@ SessionReports::SessionReports(const SessionOptions& options) {
             style));
         _noteFrames(format);
     } else {
-        const ReportForm* meant = reportFormOf(options.output);
+        const std::string path = fileNameOf("--output", options.output, session);
+        const ReportForm* meant = reportFormOf(path);
         if (meant != nullptr && meant != &format) {
-            throw Problem(kExitUsage, "--output " + options.output + ": its ending says " +
+            throw Problem(kExitUsage, "--output " + path + ": its ending says " +
                                           std::string(meant->name) + ", the format is " +
                                           options.format +
                                           "; a further report is asked for with --report");
         }
-        _addFile(options.output, format, options.verbose);
+        _addFile(path, format, options.verbose);
     }
-    for (const std::string& path : options.reports) {
+    for (const std::string& pattern : options.reports) {
+        const std::string path = fileNameOf("--report", pattern, session);
         const ReportForm* form = reportFormOf(path);
         if (form == nullptr) {
             throw Problem(kExitUsage, "--report " + path + ": its ending is not one of " +
@@ -46,7 +49,7 @@ SessionReports::SessionReports(const SessionOptions& options) {
         }
         _addFile(path, *form, options.verbose);
     }
-    _addTables(options);
+    _addTables(options, session);
     _refuseClashes({deviceArgument(options.device), options.limits});
     for (const File& file : _files) {
         requireWritable(file.path);
@@ -66,13 +69,14 @@ void SessionReports::_addFile(const std::string& path, const ReportForm& form, b
     _noteFrames(form);
 }
 
-void SessionReports::_addTables(const SessionOptions& options) {
+void SessionReports::_addTables(const SessionOptions& options, const SessionRecord& session) {
     struct Table {
         std::string_view ending;
         std::shared_ptr<RunListener> (*open)(ReportSink sink);
     };
-    const auto add = [this](std::string_view option, const std::string& path,
-                            const std::vector<Table>& tables) {
+    const auto add = [&](std::string_view option, const std::string& pattern,
+                         const std::vector<Table>& tables) {
+        const std::string path = fileNameOf(option, pattern, session);
         const std::string ending = endingOf(path);
         std::vector<std::string_view> endings;
         for (const Table& table : tables) {

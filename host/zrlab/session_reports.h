@@ -24,9 +24,10 @@ namespace host {
 // Threads  The session's; what the listeners are called on, run_listener.h says.
 class SessionReports {
   public:
-    // Checks that every report can be written. Throws a Problem: kExitUsage about a file's ending, a file
+    // Checks that every report can be written. `session` is what the names of files are made from: its
+    // identity, planned names and start. Throws a Problem: kExitUsage about a file's name or ending, a file
     // that is used twice or for the device, or one that cannot be written.
-    explicit SessionReports(const SessionOptions& options);
+    SessionReports(const SessionOptions& options, const SessionRecord& session);
 
     SessionReports(const SessionReports&) = delete;
     SessionReports& operator=(const SessionReports&) = delete;
@@ -58,7 +59,7 @@ class SessionReports {
 
     void _noteFrames(const ReportForm& form);
     void _addFile(const std::string& path, const ReportForm& form, bool verbose);
-    void _addTables(const SessionOptions& options);
+    void _addTables(const SessionOptions& options, const SessionRecord& session);
     // `inputs` are files that the session reads.
     void _refuseClashes(const std::vector<std::string>& inputs) const;
 

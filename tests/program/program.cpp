@@ -1,7 +1,10 @@
 #include "tests/program/program.h"
 
+#include <algorithm>
 #include <csignal>
+#include <map>
 #include <stdexcept>
+#include <string_view>
 
 #include <fcntl.h>
 #include <poll.h>
@@ -10,22 +13,56 @@
 
 namespace test {
 
-Program::Program(const std::vector<std::string>& arguments) {
+namespace {
+
+std::vector<std::string> environmentWith(const std::vector<std::string>& variables) {
+    std::map<std::string, std::string> entries;  // by name
+    const auto add = [&entries](const std::string& variable) {
+        entries[variable.substr(0, variable.find('='))] = variable;
+    };
+    for (char** at = environ; *at != nullptr; ++at) {
+        if (!std::string_view(*at).starts_with("ZRLAB_")) {
+            add(*at);
+        }
+    }
+    for (const char* none : {"ZRLAB_STATION_FILE=", "ZRLAB_USER_FILE=", "ZRLAB_SYSTEM_FILE="}) {
+        add(none);
+    }
+    std::for_each(variables.begin(), variables.end(), add);
+    std::vector<std::string> environment;
+    for (const auto& [name, variable] : entries) {
+        environment.push_back(variable);
+    }
+    return environment;
+}
+
+// For exec(): pointers into the texts, and a null at the end.
+std::vector<char*> pointersTo(const std::vector<std::string>& texts) {
+    std::vector<char*> pointers;
+    for (const std::string& text : texts) {
+        pointers.push_back(const_cast<char*>(text.c_str()));
+    }
+    pointers.push_back(nullptr);
+    return pointers;
+}
+
+}  // namespace
+
+Program::Program(const std::vector<std::string>& arguments,
+                 const std::vector<std::string>& variables) {
     int output[2];
     int errors[2];
     if (pipe2(output, O_CLOEXEC) != 0 || pipe2(errors, O_CLOEXEC) != 0) {
         throw std::runtime_error("no pipe");
     }
-    std::vector<char*> argv;
-    for (const std::string& argument : arguments) {
-        argv.push_back(const_cast<char*>(argument.c_str()));
-    }
-    argv.push_back(nullptr);
+    const std::vector<char*> argv = pointersTo(arguments);
+    const std::vector<std::string> environment = environmentWith(variables);
+    const std::vector<char*> envp = pointersTo(environment);
     _process = fork();
     if (_process == 0) {
         dup2(output[1], STDOUT_FILENO);
         dup2(errors[1], STDERR_FILENO);
-        execv(argv[0], argv.data());
+        execve(argv[0], argv.data(), envp.data());
         _exit(127);
     }
     close(output[1]);

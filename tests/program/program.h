@@ -18,7 +18,10 @@ struct Outcome {
 // A program that runs, its standard output and standard error going to pipes.
 class Program {
   public:
-    explicit Program(const std::vector<std::string>& arguments);
+    // Its environment is this process's without settings of the program (ZRLAB_…), which would change what
+    // it does on a machine where somebody has some, and with `variables`: "NAME=VALUE".
+    explicit Program(const std::vector<std::string>& arguments,
+                     const std::vector<std::string>& variables = {});
     ~Program();
     Program(const Program&) = delete;
     Program& operator=(const Program&) = delete;
@@ -38,8 +41,9 @@ class Program {
     Outcome _outcome;
 };
 
-inline Outcome runProgram(const std::vector<std::string>& arguments) {
-    return Program(arguments).finish();
+inline Outcome runProgram(const std::vector<std::string>& arguments,
+                          const std::vector<std::string>& variables = {}) {
+    return Program(arguments, variables).finish();
 }
 
 }  // namespace test

@@ -70,6 +70,19 @@ std::string factHtml(std::string_view name, std::string_view value, std::string_
                        more.empty() ? "" : fmt::format(" <span>{}</span>", htmlText(more)));
 }
 
+// The unit first, then the rest of what was given about it and the place.
+std::string identityHtml(const SessionRecord& session) {
+    std::string facts;
+    for (const auto& [name, text] : identityTexts(session.identity)) {
+        std::string label = htmlText(name);
+        if (label.front() >= 'a' && label.front() <= 'z') {
+            label.front() = static_cast<char>(label.front() - 'a' + 'A');
+        }
+        facts += factHtml(label, text);
+    }
+    return facts;
+}
+
 std::string headHtml(const SessionRecord& session) {
     return fmt::format(R"(<header class="masthead {0}">
 <div class="sheet">
@@ -82,7 +95,8 @@ std::string headHtml(const SessionRecord& session) {
 )",
                        verdictName(session.verdict), htmlText(subjectOf(session)),
                        verdictHtml(session.verdict), htmlText(outcomeOf(session)),
-                       factHtml("Device", session.deviceName, session.deviceSummary) +
+                       identityHtml(session) +
+                           factHtml("Device", session.deviceName, session.deviceSummary) +
                            factHtml("Started", session.started.text()) +
                            factHtml("Took", fmt::format("{:.2f} s", session.seconds)) +
                            factHtml("Bench", "zrlab " + session.version));
@@ -112,6 +126,10 @@ std::string footHtml(const SessionRecord& session) {
     for (const auto& [name, text] : session.deviceFacts) {
         facts += factHtml("Device: " + htmlText(name), text);
     }
+    facts += factHtml("Station", session.identity.station);
+    for (std::size_t at = 0; at < session.runs.size(); ++at) {
+        facts += factHtml("Run: " + htmlText(titleOf(session, at)), session.runs[at].uuid);
+    }
     return fmt::format(R"(<footer class="sheet">
 <h2>How this was made</h2>
 <dl>
@@ -135,14 +153,15 @@ std::string htmlReport(const SessionRecord& session) {
 <meta name="viewport" content="width=device-width, initial-scale=1">
 <meta name="color-scheme" content="light dark">
 <meta http-equiv="Content-Security-Policy" content="default-src 'none'; style-src 'unsafe-inline'">
-<title>{} · {} · zrlab</title>
+<title>{} · {} · {}zrlab</title>
 <style>
 {}</style>
 </head>
 <body>
 <a class="skip" href="#results">Skip to the results</a>
 )",
-        verdictText(session.verdict), htmlText(subjectOf(session)), kReportStyle);
+        verdictText(session.verdict), htmlText(subjectOf(session)),
+        session.identity.unit.empty() ? "" : htmlText(session.identity.unit) + " · ", kReportStyle);
     const bool manyRuns = namesIn(session) > 1 || !session.repeats.empty();
     page += headHtml(session) + contentsHtml(session) + "<main class=\"sheet\" id=\"results\">\n";
     for (std::size_t at = 0; at < session.runs.size(); ++at) {

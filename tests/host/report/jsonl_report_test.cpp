@@ -47,6 +47,10 @@ std::string step(const std::string& id, const std::string& content) {
     return R"({"testStepArtifact": {"testStepId": ")" + id + "\", " + content + "}}";
 }
 
+// Of a first run; those of the samples have no UUID unless a test gives them one.
+constexpr const char* kRunExtension =
+    R"("extension": {"name": "run", "content": {"uuid": "", "number": 1}})";
+
 TEST(JsonlReport, WritesAJudgedDiagnostic) {
     const std::string e = "0-Diagnostic-1-experiment";
     const std::string a = "1-Diagnostic-1-analysis";
@@ -64,8 +68,9 @@ TEST(JsonlReport, WritesAJudgedDiagnostic) {
                "softwareInfos": [{"softwareInfoId": "zrlab", "name": "zrlab", "version": "1.0.0",
                                   "softwareType": "APPLICATION"}],
                "hardwareInfos": [{"hardwareInfoId": "device", "name": "healthy"}],
-               "metadata": {"summary": "A device without faults"}}}}})",
-         step(e, R"("testStepStart": {"name": "Experiment"})"),
+               "metadata": {"summary": "A device without faults"}},
+             "metadata": {"station": "desk"}}}})",
+         step(e, R"("testStepStart": {"name": "Experiment"})"), step(e, kRunExtension),
          step(e, R"("log": {"severity": "INFO", "message": "Diagnostic"})"),
          R"({"testRunArtifact": {"log": {"severity": "ERROR", "message": "late: time-out"}}})",
          step(e, R"("measurement": {"name": "Diagnostic", "value": 3.0, "unit": "events",
@@ -102,7 +107,7 @@ TEST(JsonlReport, WritesErrorsWhereTheyBelong) {
     const std::string e = "0-Broken-1-experiment";
     expectArtifacts(
         artifacts,
-        {step(e, R"("testStepStart": {"name": "Experiment"})"),
+        {step(e, R"("testStepStart": {"name": "Experiment"})"), step(e, kRunExtension),
          step(e, R"x("error": {"symptom": "PlugInErrorDomain-204", "softwareInfoIds": ["zrlab"],
              "message": "experiment Experiment, run: Failed to start streaming. (PlugInErrorDomain 204))x"
                  "; caused by: Start was refused (Capture 7); caused by: Stream is busy (Service "
@@ -120,8 +125,8 @@ TEST(JsonlReport, WritesErrorsWhereTheyBelong) {
 
 TEST(JsonlReport, WritesEachImageAndNoDiagnosisOfAnExperiment) {
     const std::vector<Json> artifacts = artifactsOf(test::imagesSession(10));
-    ASSERT_EQ(artifacts.size(), 15U);
-    const Json& image = artifacts[10]["testStepArtifact"]["extension"];
+    ASSERT_EQ(artifacts.size(), 16U);
+    const Json& image = artifacts[11]["testStepArtifact"]["extension"];
     EXPECT_EQ(image["name"], "images");
     EXPECT_EQ(image["content"]["frameID"], 107);
     EXPECT_EQ(image["content"]["dScanI"].size(), 48U);
@@ -179,8 +184,8 @@ TEST(JsonlReport, CarriesHostileNames) {
     const std::string readBack =
         "a<b>&\"c'\x01\n\xEF\xBF\xBD"
         "end";
-    EXPECT_EQ(artifacts[3]["testStepArtifact"]["log"]["message"], readBack);
-    EXPECT_EQ(artifacts[5]["testStepArtifact"]["measurement"]["name"], readBack);
+    EXPECT_EQ(artifacts[4]["testStepArtifact"]["log"]["message"], readBack);
+    EXPECT_EQ(artifacts[6]["testStepArtifact"]["measurement"]["name"], readBack);
 }
 
 // Lines from many threads, before, inside, between and after the steps of two runs.

@@ -35,6 +35,7 @@ SessionRecord sessionOf(RunRecord run) {
     SessionRecord session;
     session.version = "1.0.0";
     session.commandLine = "zrlab run " + run.plan.name + " --set frameCount=90";
+    session.identity.station = "desk";
     session.deviceName = "healthy";
     session.deviceSummary = "A device without faults";
     session.started = timeOf(0);
@@ -298,13 +299,27 @@ void play(const SessionRecord& session, host::RunListener& listener) {
     listener.sessionEnded(session);
 }
 
+SessionRecord identifiedSession() {
+    SessionRecord session = judgedSession();
+    session.identity = {
+        .unit = "SN-7",
+        .part = "P-1",
+        .lot = "L<2>",
+        .station = "bench-3",
+        .operatorName = "Ann",
+        .metadata = {{"fixture", "7"}, {"unit", "of measure"}, {kHostile, kHostile}}};
+    session.runs.front().uuid = "6f0c1c1e-58a9-4c53-9e0e-3f3f4c0a7d11";
+    return session;
+}
+
 std::vector<std::pair<std::string, SessionRecord>> sampleSessions() {
     return {{"pass", streamedSession(90)},         {"fail", judgedSession()},
             {"hostile", judgedSession(kHostile)},  {"error", brokenSession()},
             {"images", imagesSession(25)},         {"long", streamedSession(20000)},
             {"long-images", imagesSession(3000)},  {"repeated", repeatedSession()},
             {"interrupted", interruptedSession()}, {"mixed", mixedSession()},
-            {"empty-images", imagesSession(0)},    {"bench", benchSession()}};
+            {"empty-images", imagesSession(0)},    {"bench", benchSession()},
+            {"identified", identifiedSession()}};
 }
 
 void writeSample(const std::string& file, const std::string& content) {

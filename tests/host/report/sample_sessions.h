@@ -42,6 +42,9 @@ host::SessionRecord interruptedSession();
 // and one not met that is not part of the verdict.
 host::SessionRecord benchSession();
 
+// A session whose unit and place are named, by hostile texts among others; one run.
+host::SessionRecord identifiedSession();
+
 // All of the above as one session of several runs.
 host::SessionRecord mixedSession();
 

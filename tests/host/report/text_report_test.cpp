@@ -77,6 +77,7 @@ TEST(TextReport, BeginsWithAHeadingWhenItIsKept) {
                            "zrlab run ImageExperiment --set frameCount=90\n"
                            "device healthy: A device without faults\n"
                            "  platform: simulated device\n"
+                           "station desk\n"
                            "\nPASS  ImageExperiment"));
 }
 

@@ -17,7 +17,7 @@ COUNTER = "Number Xel INT_FAULT_CC"
 
 
 def environment(device):
-    return dict(os.environ, PATH=f"{PROGRAM.parent}:{os.environ['PATH']}", DEVICE=device, ZRLAB_DEVICE=device)
+    return dict(os.environ, PATH=f"{PROGRAM.parent}:{os.environ['PATH']}", ZRLAB_DEVICE=device)
 
 
 class Jobs(unittest.TestCase):

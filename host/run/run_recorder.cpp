@@ -190,8 +190,8 @@ void RunRecorder::_handOn() {
         return;
     }
     ++_queued;
-    _queue.async([this, batch = std::exchange(_toHandOn, {})] {
-        _framesDelivered(batch);
+    _queue.async([this, batch = std::make_shared<const FrameBatch>(std::exchange(_toHandOn, {}))] {
+        _framesDelivered(*batch);
         const platform::MutexLock lock(_mutex);
         --_queued;
         _handedOn.notifyAll();

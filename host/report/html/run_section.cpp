@@ -148,7 +148,7 @@ std::string judgementHtml(Judgement judgement) {
         case Judgement::Outside:
             return "<span class=\"fail\"><span aria-hidden=\"true\">✗</span> outside</span>";
         case Judgement::NotMeasured:
-            return "<span class=\"fail\"><span aria-hidden=\"true\">?</span> not measured</span>";
+            return R"(<span class="fail"><span aria-hidden="true">?</span> not measured</span>)";
         case Judgement::Information:
             break;
     }

@@ -20,7 +20,7 @@ COMPLETED = [
     ("zrlab completion z", "zrlab completion zsh "),
     ("zrlab describe VantorFaultA", "zrlab describe VantorFaultAnalysis "),
     ("zrlab run VantorF", "zrlab run VantorFault"),
-    ("zrlab run X --un", "zrlab run X --until-fail "),
+    ("zrlab run X --unt", "zrlab run X --until-fail "),
     ("zrlab run --format ju", "zrlab run --format junit "),
     ("zrlab run --format=ju", "zrlab run --format=junit "),
     ("zrlab run VantorFaultDiagnostic --set ti", "zrlab run VantorFaultDiagnostic --set timeout="),

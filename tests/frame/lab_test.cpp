@@ -1,5 +1,6 @@
 #include <memory>
 #include <string>
+#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -29,8 +30,16 @@ TEST(Lab, KeepsTheFirstOfANameAndRemembersTheRefusal) {
     lab.addDiagnosticWithName("first", "a diagnostic may share the name", "first", "none");
 
     EXPECT_EQ(lab.makeExperiment("first")->experimentDescription().summary(), "one");
-    ASSERT_EQ(lab.refusals().size(), 1U);
-    EXPECT_EQ(lab.refusals().front().kind + " " + lab.refusals().front().name, "experiment first");
+    lab.addDiagnosticWithName("first", "again", "none", "none");
+    lab.addAnalysisWithName("twice", [] { return nullptr; });
+    lab.addAnalysisWithName("twice", [] { return nullptr; });
+    std::vector<std::string> refused;
+    for (const auto& refusal : lab.refusals()) {
+        refused.push_back(refusal.kind + " " + refusal.name);
+    }
+    EXPECT_EQ(refused,
+              (std::vector<std::string>{"experiment first", "diagnostic first", "analysis twice"}));
+    EXPECT_EQ(lab.diagnosticNamed("first")->summary, "a diagnostic may share the name");
     EXPECT_EQ(lab.diagnosticNamed("first")->experimentName, "first");
 
     EXPECT_EQ(lab.makeExperiment("firs"), nullptr);

@@ -1,5 +1,8 @@
 #include "frame/shared_helpers.h"
 
+#include <string_view>
+#include <vector>
+
 #include <gmock/gmock.h>
 
 #include "frame/host_interface.h"
@@ -33,15 +36,19 @@ TEST(DictionaryRepresentation, FollowsTheWholeChain) {
 
 TEST(AlphaNumeric, LettersMarksAndNumbersOfAllScripts) {
     for (const char* yes :
-         {"", "abcXYZ019", "Größe", "données", "漢字", "٣", "e\u0301", "Ⅷ", "½", "𝒳"}) {
+         {"", "abcXYZ019", "Größe", "données", "漢字", "٣", "e\u0301", "Ⅷ", "½", "𝒳", "\u0800",
+          "\U00010000"}) {  // the first of three bytes, and of four
         EXPECT_TRUE(isAlphaNumeric(yes)) << yes;
     }
     for (const char* no : {"a b", "a-b", "a_b", "a.", "\n", "€", "—", "😀", "a\u00a0b"}) {
         EXPECT_FALSE(isAlphaNumeric(no)) << no;
     }
-    // A lone continuation, a cut character, an overlong "A", a byte that UTF-8 never uses.
-    for (const char* no : {"\x80", "a\xC3", "\xE6\xBC", "\xC1\x81", "\xFF", "\xE6\x41\x41"}) {
-        EXPECT_FALSE(isAlphaNumeric(no));
+    // A lone continuation, cut characters, an overlong "A", a byte that UTF-8 never uses. Nothing behind the
+    // text is read.
+    for (const std::string_view no :
+         {"\x80", "a\xC3", "\xE6\xBC", "\xC1\x81", "\xFF", "\xE6\x41\x41"}) {
+        const std::vector<char> bytes(no.begin(), no.end());
+        EXPECT_FALSE(isAlphaNumeric({bytes.data(), bytes.size()}));
     }
 }
 

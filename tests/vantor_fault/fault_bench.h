@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include <pthread.h>
 #include <sys/resource.h>
 #include <unistd.h>
 
@@ -37,9 +38,13 @@ inline constexpr double kLate = 20;
 class LogRecorder final : public platform::LogSink {
   public:
     void write(const platform::LogLine& line) override {
+        EXPECT_EQ(line.subsystem, "net.zerith-bench.diagnostics");
+        EXPECT_EQ(line.category, "zerith");
+        Thread thread{getpriority(PRIO_PROCESS, static_cast<id_t>(gettid())),
+                      std::string(15, '\0')};
+        pthread_getname_np(pthread_self(), thread.name.data(), thread.name.size() + 1);
         const platform::MutexLock lock(_mutex);
-        const int nice = getpriority(PRIO_PROCESS, static_cast<id_t>(gettid()));
-        _lines.push_back({line.level, std::string(line.message), nice});
+        _lines.push_back({line.level, std::string(line.message), std::move(thread)});
         while (!_held.empty() && line.message.starts_with(_held)) {
             _changed.wait(_mutex);
         }
@@ -67,28 +72,35 @@ class LogRecorder final : public platform::LogSink {
     bool waitFor(platform::LogLevel level, std::string_view beginning) {
         return eventually([&] { return count(level, beginning) > 0; });
     }
-    std::vector<std::string> messages() {
+    // The lines of that level.
+    std::vector<std::string> messages(platform::LogLevel level) {
         const platform::MutexLock lock(_mutex);
         std::vector<std::string> messages;
         for (const Line& line : _lines) {
-            messages.push_back(line.message);
+            if (line.level == level) {
+                messages.push_back(line.message);
+            }
         }
         return messages;
     }
 
-    // The niceness of the thread that logged the first line with this beginning.
-    int niceOf(std::string_view beginning) {
+    // The thread that logged the first line with this beginning.
+    struct Thread {
+        int nice;
+        std::string name;
+    };
+    Thread threadOf(std::string_view beginning) {
         const platform::MutexLock lock(_mutex);
         return std::find_if(_lines.begin(), _lines.end(),
                             [&](const Line& line) { return line.message.starts_with(beginning); })
-            ->nice;
+            ->thread;
     }
 
   private:
     struct Line {
         platform::LogLevel level;
         std::string message;
-        int nice;
+        Thread thread;
     };
 
     platform::Mutex _mutex;

@@ -86,6 +86,8 @@ TEST(Number, KeepsItsKindAndConvertsTotally) {
         EXPECT_EQ(row.number.asDouble(), row.real);
         EXPECT_EQ(row.number.isTrue(), row.real != 0);
         EXPECT_EQ(row.number.text(), row.text);
+        EXPECT_EQ(row.number.isSigned(), row.kind == Kind::Int8 || row.kind == Kind::Int16 ||
+                                             row.kind == Kind::Int32 || row.kind == Kind::Int64);
         EXPECT_EQ(row.number, Number(row.number));
     }
 }
@@ -147,7 +149,13 @@ TEST(Value, EqualityLooksIntoListsAndDictionaries) {
     EXPECT_EQ(make(2), make(2));
     EXPECT_NE(make(2), make(2U));
     EXPECT_NE(make(2), make("2"));
+    EXPECT_NE(make("2"), make(2));
     EXPECT_NE(make(2), Value());
+    EXPECT_NE(Dictionary({{"a", 1}}), Dictionary({{"b", 1}}));
+    EXPECT_NE(Dictionary({{"a", 1}}), Dictionary({{"a", 1}, {"b", 1}}));
+    EXPECT_NE(Dictionary({{"a", 1}, {"b", 1}}), Dictionary({{"a", 1}}));
+    EXPECT_TRUE(List().empty());
+    EXPECT_FALSE(List({Value()}).empty());
     EXPECT_EQ(Value("text"), Value(std::string("text")));
 }
 
@@ -196,6 +204,37 @@ TEST(StringMap, HoldsWhatATreeHolds) {
             ASSERT_EQ(*map.find(name), value);
         }
     }
+}
+
+TEST(StringMap, GoesOnWhereTheOneThatItTookWas) {
+    platform::StringMap<std::string> map;
+    platform::StringMap<std::string> other;
+    other.set("first", "1");
+    map = std::move(other);
+    map.set("second", "2");
+    EXPECT_EQ(*map.find("first"), "1");
+    EXPECT_EQ(*map.find("second"), "2");
+    EXPECT_EQ(map.size(), 2U);
+}
+
+TEST(StringMap, TellsKeysOfOneHashApart) {
+    std::map<std::uint32_t, std::string> seen;
+    std::string key;
+    std::string twin;
+    for (int number = 0; twin.empty(); ++number) {  // some 80,000, by the birthday of 32 bits
+        const std::string name = std::to_string(number);
+        const auto [place, isNew] = seen.emplace(platform::StringKey(name).hash(), name);
+        if (!isNew) {
+            key = place->second;
+            twin = name;
+        }
+    }
+    platform::StringMap<std::string> map;
+    map.set(key, "a");
+    EXPECT_FALSE(map.contains(twin));
+    map.set(twin, "b");
+    EXPECT_EQ(*map.find(key), "a");
+    EXPECT_EQ(*map.find(twin), "b");
 }
 
 // A map that grows moves what its keys and values are read from.

@@ -1,0 +1,111 @@
+// Database: what a store needs of a database engine. An engine is a module that is loaded when an address asks
+// for it; it is built against this header only.
+#ifndef ZR_HOST_STORE_DATABASE_H
+#define ZR_HOST_STORE_DATABASE_H
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+namespace host {
+
+// Why a store does not do what it was asked. The text is one line that names the store, without a password.
+class StoreProblem : public std::runtime_error {
+  public:
+    enum class Cause {
+        Away,      // it cannot be reached, or the connection broke
+        Silent,    // it did not answer in time
+        Locked,    // somebody else held it too long
+        Full,      // no space
+        ReadOnly,  // it cannot be written
+        Newer,     // its schema is of a newer program
+        Refused,   // it does not take this data, or this statement
+    };
+
+    StoreProblem(Cause cause, const std::string& text) : std::runtime_error(text), _cause(cause) {}
+
+    Cause cause() const { return _cause; }
+
+  private:
+    Cause _cause;
+};
+
+using Bytes = std::vector<std::byte>;
+
+// A value in a row, or a parameter of a statement: NULL, integer, floating point, text (UTF-8) or bytes.
+using Cell = std::variant<std::monostate, std::int64_t, double, std::string, Bytes>;
+using Row = std::vector<Cell>;
+using Rows = std::vector<Row>;
+
+// A statement in the SQL that both engines share, with parameters $1, $2, ...
+//
+// What they do not share, and SQL for any store must avoid: functions of date, time, JSON, random numbers and
+// mathematics; group_concat and string_agg; stddev, variance and percentiles (use sums); round() with two
+// arguments; a comparison as a number (count(*) FILTER (WHERE ...) works on both); min() and max() of several
+// columns; LIKE, which only PostgreSQL tells case apart in; the place of NULLs in ORDER BY, unless it says
+// NULLS FIRST or NULLS LAST. An average or a quotient needs CAST(... AS DOUBLE PRECISION).
+struct Statement {
+    std::string_view sql;
+    Row parameters = {};
+};
+
+// A connection to a database, which is made by its first use and made again when it broke.
+//
+// One thread at a time. Every operation throws a StoreProblem when it fails, and takes no longer than the
+// patience; what was begun and not committed is then undone.
+class Database {
+  public:
+    using Milliseconds = std::chrono::milliseconds;
+
+    virtual ~Database() = default;
+
+    // The store as messages name it, without a password.
+    virtual const std::string& name() const = 0;
+
+    // For how long an operation waits for the database before it fails as Away, Silent or Locked: for a
+    // connection, for another's lock, and for an answer. At first two seconds.
+    virtual void setPatience(Milliseconds patience) = 0;
+
+    // `text` with the engine's own words for {id}, {bytes} and {clustered}, which may hold several statements,
+    // without parameters.
+    virtual void runScript(std::string_view text) = 0;
+
+    // Runs the statements one after the other and returns the rows of each. On a server they take one round
+    // trip together. Statements are prepared once; those of a store are few, and literals.
+    virtual std::vector<Rows> run(std::span<const Statement> statements) = 0;
+
+    // A transaction that writes. begin() waits for what another process writes where the engine has one writer
+    // at a time. commit() returns when the data would survive a loss of power. rollback() does not throw.
+    virtual void begin() = 0;
+    virtual void commit() = 0;
+    virtual void rollback() noexcept = 0;
+
+    // Lets one process at a time look at the schema and change it, until the transaction ends. Called first in
+    // a transaction.
+    virtual void lockSchema() = 0;
+};
+
+// Whether a database is made when there is none.
+enum class Access { Existing, Make };
+
+// What an engine's module exports under the name kEngineSymbol. Everything behind the version may be looked at
+// only when the version is kEngineVersion.
+struct Engine {
+    int version;
+    // The database at the address. Does not connect. Throws a std::exception, whose text is one line, when
+    // the address is wrong.
+    std::unique_ptr<Database> (*open)(const std::string& address, Access access);
+};
+inline constexpr int kEngineVersion = 1;
+inline constexpr char kEngineSymbol[] = "zrStoreEngine";
+
+}  // namespace host
+
+#endif

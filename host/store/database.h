@@ -11,6 +11,7 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <variant>
 #include <vector>
 
@@ -26,7 +27,8 @@ class StoreProblem : public std::runtime_error {
         Full,      // no space
         ReadOnly,  // it cannot be written
         Newer,     // its schema is of a newer program
-        Refused,   // it does not take this data, or this statement
+        Unusable,  // it is damaged, or not a store
+        Refused,   // it does not take this data, and will not
     };
 
     StoreProblem(Cause cause, const std::string& text) : std::runtime_error(text), _cause(cause) {}
@@ -39,7 +41,8 @@ class StoreProblem : public std::runtime_error {
 
 using Bytes = std::vector<std::byte>;
 
-// A value in a row, or a parameter of a statement: NULL, integer, floating point, text (UTF-8) or bytes.
+// A value in a row, or a parameter of a statement: NULL, integer, floating point, text (UTF-8 without a zero
+// character) or bytes. A NaN as a parameter is NULL.
 using Cell = std::variant<std::monostate, std::int64_t, double, std::string, Bytes>;
 using Row = std::vector<Cell>;
 using Rows = std::vector<Row>;
@@ -56,44 +59,59 @@ struct Statement {
     Row parameters = {};
 };
 
-// A connection to a database, which is made by its first use and made again when it broke.
+// A connection to a database.
 //
-// One thread at a time. Every operation throws a StoreProblem when it fails, and takes no longer than the
-// patience; what was begun and not committed is then undone.
+// One thread at a time. Every operation throws a StoreProblem when it fails, and waits no longer than the
+// patience. A connection that broke is closed; connect() makes another.
 class Database {
   public:
-    using Milliseconds = std::chrono::milliseconds;
-
     virtual ~Database() = default;
 
     // The store as messages name it, without a password.
     virtual const std::string& name() const = 0;
 
-    // For how long an operation waits for the database before it fails as Away, Silent or Locked: for a
-    // connection, for another's lock, and for an answer. At first two seconds.
-    virtual void setPatience(Milliseconds patience) = 0;
+    // For how long an operation waits for a connection, for another's lock and for an answer. At first two
+    // seconds.
+    virtual void setPatience(std::chrono::milliseconds patience) = 0;
 
-    // `text` with the engine's own words for {id}, {bytes} and {clustered}, which may hold several statements,
-    // without parameters.
+    // Connects unless there is a connection. Returns whether it made one: whatever is known of the database is
+    // then to be read again. Everything below needs a connection.
+    virtual bool connect() = 0;
+
+    // Whether a table of that name is in the store.
+    virtual bool hasTable(std::string_view table) = 0;
+
+    // Runs several statements without parameters: `text` with the engine's own words for {id}, {bytes} and
+    // {clustered}.
     virtual void runScript(std::string_view text) = 0;
 
     // Runs the statements one after the other and returns the rows of each. On a server they take one round
-    // trip together. Statements are prepared once; those of a store are few, and literals.
+    // trip together. A statement is prepared once and kept, so texts with values in them are not for it.
     virtual std::vector<Rows> run(std::span<const Statement> statements) = 0;
 
-    // A transaction that writes. begin() waits for what another process writes where the engine has one writer
-    // at a time. commit() returns when the data would survive a loss of power. rollback() does not throw.
+    // A transaction that writes. commit() returns when the data would survive a loss of power.
     virtual void begin() = 0;
     virtual void commit() = 0;
-    virtual void rollback() noexcept = 0;
+    virtual void rollback() noexcept = 0;  // nothing when there is no transaction
 
-    // Lets one process at a time look at the schema and change it, until the transaction ends. Called first in
-    // a transaction.
+    // Called first in a transaction: until its end no other process looks at the schema or changes it.
     virtual void lockSchema() = 0;
 };
 
 // Whether a database is made when there is none.
 enum class Access { Existing, Make };
+
+// `text` with every word on the left replaced by the one beside it.
+inline std::string withWords(std::string_view text,
+                             std::span<const std::pair<std::string_view, std::string_view>> words) {
+    std::string result(text);
+    for (const auto& [word, replacement] : words) {
+        for (std::size_t at = 0; (at = result.find(word, at)) != std::string::npos;) {
+            result.replace(at, word.size(), replacement);
+        }
+    }
+    return result;
+}
 
 // What an engine's module exports under the name kEngineSymbol. Everything behind the version may be looked at
 // only when the version is kEngineVersion.

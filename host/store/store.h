@@ -2,12 +2,14 @@
 #ifndef ZR_HOST_STORE_STORE_H
 #define ZR_HOST_STORE_STORE_H
 
+#include <chrono>
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <optional>
-#include <span>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "host/record/run_record.h"
 #include "host/store/database.h"
@@ -43,9 +45,10 @@ class Store {
     // As messages show it, without a password.
     const std::string& name() const { return _database->name(); }
 
-    void setPatience(Database::Milliseconds patience) { _database->setPatience(patience); }
+    // For how long an operation waits for a store that does not answer; see Database.
+    void setPatience(std::chrono::milliseconds patience) { _database->setPatience(patience); }
 
-    // These throw a StoreProblem. A run's time is the moment when it is written, not more.
+    // Everything below throws a StoreProblem.
 
     // Connects and makes the schema ready, if that is not done yet.
     void connect();
@@ -62,14 +65,17 @@ class Store {
     Rows query(std::string_view sql, Row parameters = {});
 
   private:
-    using Ids = std::map<Row, std::int64_t>;
+    // Rows that runs share, by the statement that finds one and its parameters; and what makes those that are
+    // not known yet.
+    using Ids = std::map<std::pair<std::string_view, Row>, std::int64_t>;
+    using MissingRows = std::map<Ids::key_type, Statement>;
+
+    Ids _find(const MissingRows& missing);
 
     std::unique_ptr<Database> _database;
-    bool _isReady = false;
+    bool _isReady = false;  // the connection's schema is this program's
+    Ids _ids;               // those that are committed
 };
-
-// The address without a password: what may be shown and logged.
-std::string shownAddress(const std::string& where);
 
 }  // namespace host
 

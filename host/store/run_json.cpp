@@ -42,15 +42,16 @@ double doubleOf(const Json& json) {
     throw std::runtime_error("not a number: " + dump(json));
 }
 
-template <class T>
-Json jsonOf(const std::optional<T>& value) {
-    return value.has_value() ? jsonOf(*value) : Json();
-}
 Json jsonOf(std::uint64_t value) {
     return value;
 }
 Json jsonOf(std::int64_t value) {
     return value;
+}
+
+template <class T>
+Json jsonOf(const std::optional<T>& value) {
+    return value.has_value() ? jsonOf(*value) : Json();
 }
 
 template <class T>

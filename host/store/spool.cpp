@@ -194,7 +194,7 @@ std::filesystem::path defaultSpoolFolder(const std::string& where) {
                               : fs::path(home != nullptr ? home : "/") / ".local/state";
     const std::string shown = shownAddress(where);
     const std::string store =
-        shown.find("://") != std::string::npos ? shown : fs::absolute(shown).lexically_normal();
+        shown.find("://") != std::string::npos ? shown : fs::absolute(shown).lexically_normal().string();
     // A name that people recognise, and a number that tells apart what it makes alike.
     std::uint64_t hash = 14695981039346656037U;  // FNV-1a
     std::string name;

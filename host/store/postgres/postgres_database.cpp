@@ -419,7 +419,10 @@ class PostgresDatabase final : public Database {
     }
 
     void _sendPrepared(const std::string& name, const Row& parameters) {
-        _texts.assign(parameters.begin(), parameters.end());
+        _texts.clear();
+        for (const Cell& cell : parameters) {
+            _texts.emplace_back(cell);
+        }
         _values.clear();
         _sizes.clear();
         _formats.clear();

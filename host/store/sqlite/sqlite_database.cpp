@@ -264,7 +264,8 @@ class SqliteDatabase final : public Database {
     Rows _run(const Statement& wanted) {
         const std::unique_ptr<sqlite3_stmt, Reset> statement(_prepared(wanted.sql));
         for (std::size_t at = 0; at < wanted.parameters.size(); ++at) {
-            const std::string parameter = "$" + std::to_string(at + 1);
+            std::string parameter("$");
+            parameter += std::to_string(at + 1);
             _check(bind(statement.get(),
                         sqlite3_bind_parameter_index(statement.get(), parameter.c_str()),
                         wanted.parameters[at]));

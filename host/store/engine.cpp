@@ -1,7 +1,5 @@
 #include "host/store/engine.h"
 
-#include <algorithm>
-#include <cstddef>
 #include <filesystem>
 #include <string_view>
 #include <system_error>
@@ -10,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "host/record/mask_passwords.h"
 #include "host/record/problem.h"
 #include "platform/module.h"
 
@@ -37,8 +36,13 @@ const Engine& loadEngine(std::string_view name, const std::string& address) {
     const std::string file = moduleFile(name).string();
     const auto fail = [&](const std::string& reason) {
         throw Problem(kExitError,
-                      fmt::format("store {}: {}: {}", shownAddress(address), file, reason));
+                      fmt::format("store {}: {}: {}", maskPasswords(address), file, reason));
     };
+    if (std::error_code none; !std::filesystem::exists(file, none)) {
+        throw Problem(kExitUsage,
+                      fmt::format("store {}: no engine for it is installed: there is no {}",
+                                  maskPasswords(address), file));
+    }
     const void* module = nullptr;
     try {
         module = platform::loadModule(file);
@@ -67,29 +71,15 @@ std::unique_ptr<Database> openDatabase(const std::string& address, Access access
         throw Problem(
             kExitUsage,
             fmt::format("store {}: unknown kind; it is a file or postgresql://HOST/DATABASE",
-                        shownAddress(address)));
+                        maskPasswords(address)));
     }
     const Engine& engine = loadEngine(isServer(address) ? "postgres" : "sqlite", address);
     try {
         return engine.open(address, access);
     } catch (const std::exception& exception) {
         throw Problem(kExitUsage,
-                      fmt::format("store {}: {}", shownAddress(address), exception.what()));
+                      fmt::format("store {}: {}", maskPasswords(address), exception.what()));
     }
-}
-
-std::string shownAddress(const std::string& address) {
-    const std::size_t scheme = address.find("://");
-    if (scheme == std::string::npos) {
-        return address;
-    }
-    const std::size_t host = scheme + 3;
-    const std::size_t path = std::min(address.find_first_of("/?", host), address.size());
-    // A password may hold an @ that is not encoded.
-    const std::size_t user = address.rfind('@', path);
-    const std::size_t from = user != std::string::npos && user >= host ? user + 1 : host;
-    const std::size_t end = std::min(address.find('?', from), address.size());
-    return address.substr(0, host) + address.substr(from, end - from);
 }
 
 }  // namespace host

@@ -9,13 +9,11 @@
 
 namespace host {
 
-// The database at the address, by the module zr_store_sqlite.so or zr_store_postgres.so: beside the program, as
-// a build leaves it, or where an installation has it. Does not connect. Throws a Problem as Store does.
+// The database at the address, by the module zr_store_sqlite.so, for an address of a server by
+// zr_store_postgres.so: beside the program, as a build leaves it, or where an installation has it. Does not
+// connect. Throws a Problem as Store does.
 // Any thread, one at a time.
 std::unique_ptr<Database> openDatabase(const std::string& address, Access access);
-
-// The address without user, password and settings: what may be shown, logged and made a name of.
-std::string shownAddress(const std::string& address);
 
 }  // namespace host
 

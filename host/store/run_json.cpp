@@ -287,13 +287,25 @@ ResultRecord resultOf(const Json& json) {
                         .value = doubleOf(json.at("value")),
                         .unit = json.at("unit").get<std::string>(),
                         .limit = std::nullopt,
-                        .judgement = static_cast<Judgement>(json.at("judgement").get<int>())};
+                        .judgement = judgementOf(json.at("judgement").get<std::int64_t>())};
     if (json.contains("limit")) {
         const Json& limit = json["limit"];
         result.limit = LimitRecord{limit.at("name").get<std::string>(), boundOf(limit.at("lower")),
                                    boundOf(limit.at("upper"))};
     }
     return result;
+}
+
+Json jsonOf(const BenchResult& result) {
+    Json object = jsonOf(static_cast<const ResultRecord&>(result));
+    object["partOfVerdict"] = result.partOfVerdict;
+    object["note"] = result.note;
+    return object;
+}
+
+BenchResult benchResultOf(const Json& json) {
+    return {resultOf(json), json.at("partOfVerdict").get<bool>(),
+            json.at("note").get<std::string>()};
 }
 
 Json jsonOf(const platform::ErrorRef& error) {
@@ -402,6 +414,7 @@ Json runJson(const RunRecord& run, Attachments attachments) {
          jsonOf(platform::Value(attachments.images ? run.auxiliaryData
                                                    : withoutImages(run.auxiliaryData)))},
         {"results", arrayOf(run.results, each)},
+        {"benchResults", arrayOf(run.benchResults, each)},
         {"failures", arrayOf(run.failures, each)},
         {"log", arrayOf(run.log, each)},
         {"framesDelivered", run.framesDelivered},
@@ -434,6 +447,7 @@ RunRecord runOf(const Json& json) {
         run.auxiliaryData = *dictionary;
     }
     run.results = recordsOf<ResultRecord>(json.at("results"), resultOf);
+    run.benchResults = recordsOf<BenchResult>(json.at("benchResults"), benchResultOf);
     run.failures = recordsOf<FailureRecord>(json.at("failures"), failureOf);
     run.log = recordsOf<LogRecord>(json.at("log"), lineOf);
     run.framesDelivered = json.at("framesDelivered").get<std::uint64_t>();
@@ -525,6 +539,13 @@ Verdict verdictOf(std::string_view name) {
     return fromText(
         std::array{Verdict::Passed, Verdict::Failed, Verdict::Error, Verdict::Interrupted}, name,
         verdictName);
+}
+
+Judgement judgementOf(std::int64_t number) {
+    if (number < 0 || number > static_cast<std::int64_t>(Judgement::NotMeasured)) {
+        throw std::runtime_error("unknown judgement: " + std::to_string(number));
+    }
+    return static_cast<Judgement>(number);
 }
 
 Part partOf(std::string_view text) {

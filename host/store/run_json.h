@@ -52,6 +52,7 @@ void setOnlyRun(SessionRecord& session, RunRecord run);
 
 // The words of the records, in both directions. Reading throws a std::runtime_error for an unknown one.
 Verdict verdictOf(std::string_view name);
+Judgement judgementOf(std::int64_t number);
 Part partOf(std::string_view text);
 platform::LogLevel levelOf(std::string_view text);
 // One of kStep...

@@ -2,20 +2,24 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdint>
 #include <cstdlib>
-#include <fstream>
-#include <iterator>
+#include <stdexcept>
 #include <string_view>
 #include <system_error>
+#include <variant>
 
 #include <fcntl.h>
 #include <sys/file.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <fmt/format.h>
+#include <nlohmann/json.hpp>
 
 #include "host/record/clean_text.h"
-#include "host/store/engine.h"
+#include "host/record/mask_passwords.h"
+#include "host/record/uuid.h"
 #include "host/store/run_json.h"
 
 namespace host {
@@ -42,7 +46,9 @@ class Descriptor {
 
     int operator*() const { return _number; }
     explicit operator bool() const { return _number >= 0; }
-    bool lock() const { return flock(_number, LOCK_EX | LOCK_NB) == 0; }
+    // Of this file among those who lock it.
+    bool lock() const { return flock(_number, LOCK_EX) == 0; }
+    bool tryLock() const { return flock(_number, LOCK_EX | LOCK_NB) == 0; }
 
   private:
     const int _number;
@@ -87,69 +93,102 @@ std::vector<fs::path> filesWith(std::string_view ending, const fs::path& folder)
     return files;
 }
 
-// Makes entries of files whose writer died; whether they are whole shows when they are read.
+// Makes entries of files whose writer died; whether they are whole shows when they are read. A writer holds the
+// lock from before the first byte on.
 void adoptParts(const fs::path& folder) {
     for (const fs::path& part : filesWith(kPart, folder)) {
         const Descriptor file(part, O_RDONLY);
-        if (file && file.lock()) {  // no writer has it
+        struct stat status {};
+        if (file && file.tryLock() && fstat(*file, &status) == 0 && status.st_size > 0) {
             fs::path entry = part;
-            entry.replace_extension().replace_extension();
             std::error_code gone;
-            fs::rename(part, entry, gone);
+            fs::rename(part, entry.replace_extension(), gone);
         }
     }
 }
 
-std::string contentOf(const fs::path& path) {
-    std::ifstream file(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), {}};
+std::string contentOf(const Descriptor& file, const fs::path& path) {
+    std::string content;
+    char block[65536];
+    for (ssize_t count = 1; count != 0;) {
+        count = read(*file, block, sizeof block);
+        if (count < 0 && errno != EINTR) {
+            failWith(errno, path);
+        }
+        content.append(block, static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
+    }
+    return content;
 }
 
-// Under a name that no delivery looks at. Returns what to say of it.
-std::string setAside(const fs::path& entry, const char* ending, const std::string& why) {
+// The run in an entry, or why it is none.
+std::variant<SessionRecord, std::string> runIn(const std::string& content) {
+    try {
+        SessionRecord session = runFromJson(content);
+        if (!isUuid(session.runs.front().uuid)) {
+            return "its run has no well-formed uuid";
+        }
+        return session;
+    } catch (const nlohmann::json::exception& exception) {
+        return exception.what();
+    } catch (const std::runtime_error& exception) {
+        return exception.what();
+    }
+}
+
+// Gives the entry a name that no delivery looks at.
+void setAside(const fs::path& entry,
+              const char* ending,
+              const std::string& why,
+              Spool::Delivery& result) {
     fs::path aside = entry;
     aside += ending;
-    std::error_code gone;
-    fs::rename(entry, aside, gone);
-    return fmt::format("{}: {}", aside.string(), plainLine(why));
+    if (rename(entry.c_str(), aside.c_str()) == 0) {
+        result.setAside.push_back(fmt::format("{}: {}", aside.string(), plainLine(why)));
+    } else if (errno != ENOENT) {  // else another process did it
+        failWith(errno, aside);
+    }
+    --result.waiting;
 }
 
 }  // namespace
 
 void Spool::add(const SessionRecord& session, const RunRecord& run, Attachments attachments) const {
+    if (!isUuid(run.uuid)) {
+        throw std::runtime_error(fmt::format("run \"{}\": not a uuid", plainLine(run.uuid)));
+    }
     const std::string text = runToJson(session, run, attachments);
     fs::create_directories(_folder);
-    const fs::path entry = _folder / (run.uuid + std::string(kEntry));
-    // A delivery may take the file for one whose writer died, before it is locked. Then it is written again.
-    for (int attempt = 0;; ++attempt) {
-        const fs::path part = fmt::format("{}.{}-{}{}", entry.string(), getpid(), attempt, kPart);
-        const Descriptor file(part, O_WRONLY | O_CREAT | O_EXCL);
-        if (!file) {
-            failWith(errno, part);
-        }
-        if (!file.lock() && attempt < 100) {
-            continue;
-        }
-        try {
-            writeWhole(file, text, part);
-        } catch (...) {
-            unlink(part.c_str());
-            throw;
-        }
-        if (rename(part.c_str(), entry.c_str()) == 0) {
-            break;
-        }
-        if (errno != ENOENT || attempt >= 100) {
-            failWith(errno, entry);
-        }
+    fs::path entry = _folder / run.uuid;
+    entry += kEntry;
+    fs::path part = entry;
+    part += kPart;
+    const Descriptor file(part, O_WRONLY | O_CREAT | O_EXCL);
+    if (!file || !file.lock()) {
+        failWith(errno, part);
+    }
+    try {
+        writeWhole(file, text, part);
+        fs::rename(part, entry);
+    } catch (...) {
+        unlink(part.c_str());
+        throw;
     }
     syncFolder(_folder);
 }
 
 Spool::Delivery Spool::deliver(Store& store, std::chrono::milliseconds atMost) const {
+    Delivery result;
+    try {
+        _deliver(store, atMost, result);
+    } catch (const std::exception& exception) {
+        result.problem = plainLine(exception.what());
+    }
+    return result;
+}
+
+void Spool::_deliver(Store& store, std::chrono::milliseconds atMost, Delivery& result) const {
     using Clock = std::chrono::steady_clock;
     const auto start = Clock::now();
-    Delivery result;
     adoptParts(_folder);
     const std::vector<fs::path> entries = filesWith(kEntry, _folder);
     result.waiting = entries.size();
@@ -157,33 +196,38 @@ Spool::Delivery Spool::deliver(Store& store, std::chrono::milliseconds atMost) c
         if (Clock::now() - start > atMost) {
             break;
         }
-        const Descriptor exists(entry, O_RDONLY);
-        if (!exists) {
-            if (errno != ENOENT) {  // another process delivered it
-                result.setAside.push_back(fmt::format("{}: cannot be read", entry.string()));
-                continue;
+        const Descriptor file(entry, O_RDONLY);
+        if (!file) {
+            if (errno != ENOENT) {
+                failWith(errno, entry);
             }
-            --result.waiting;
+            --result.waiting;  // another process delivered it
             continue;
         }
+        const auto read = runIn(contentOf(file, entry));
+        if (const auto* why = std::get_if<std::string>(&read)) {
+            setAside(entry, ".damaged", *why, result);
+            continue;
+        }
+        const auto& session = std::get<SessionRecord>(read);
         try {
-            const SessionRecord session = runFromJson(contentOf(entry));
-            store.write(session, session.runs.front(), {.frames = true, .images = true});
-            std::error_code gone;
-            fs::remove(entry, gone);
-            ++result.delivered;
+            result.delivered +=
+                store.write(session, session.runs.front(), {.frames = true, .images = true}) ? 1
+                                                                                             : 0;
         } catch (const StoreProblem& problem) {
             if (problem.cause() != StoreProblem::Cause::Refused) {
-                result.problem = problem;
-                break;
+                throw;
             }
-            result.setAside.push_back(setAside(entry, ".refused", problem.what()));
-        } catch (const std::exception& exception) {
-            result.setAside.push_back(setAside(entry, ".damaged", exception.what()));
+            setAside(entry, ".refused", problem.what(), result);
+            continue;
         }
+        fs::remove(entry);
         --result.waiting;
     }
-    return result;
+}
+
+std::size_t Spool::waiting() const {
+    return filesWith(kEntry, _folder).size();
 }
 
 std::filesystem::path defaultSpoolFolder(const std::string& where) {
@@ -192,9 +236,10 @@ std::filesystem::path defaultSpoolFolder(const std::string& where) {
     const fs::path base = state != nullptr && *state != '\0'
                               ? fs::path(state)
                               : fs::path(home != nullptr ? home : "/") / ".local/state";
-    const std::string shown = shownAddress(where);
-    const std::string store =
-        shown.find("://") != std::string::npos ? shown : fs::absolute(shown).lexically_normal().string();
+    const std::string shown = maskPasswords(where);
+    const std::string store = shown.find("://") != std::string::npos
+                                  ? shown
+                                  : fs::absolute(shown).lexically_normal().string();
     // A name that people recognise, and a number that tells apart what it makes alike.
     std::uint64_t hash = 14695981039346656037U;  // FNV-1a
     std::string name;

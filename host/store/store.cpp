@@ -47,8 +47,8 @@ constexpr std::string_view kAddStep =
     "INSERT INTO steps (run_id, part, name, summary, seconds, parameters) VALUES ($1, $2, $3, $4, "
     "$5, $6)";
 constexpr std::string_view kAddResult =
-    "INSERT INTO results (run_id, of_analysis, place, quantity_id, value, limit_id, judgement) "
-    "VALUES ($1, $2, $3, $4, $5, $6, $7)";
+    "INSERT INTO results (run_id, by_bench, of_analysis, place, quantity_id, value, limit_id, "
+    "judgement, decides, note) VALUES ($1, $2, $3, $4, $5, $6, $7, $8, $9, $10)";
 constexpr std::string_view kAddFailure =
     "INSERT INTO failures (run_id, place, depth, part, step, domain, code, description, message) "
     "VALUES ($1, $2, $3, $4, $5, $6, $7, $8, $9)";
@@ -69,11 +69,11 @@ constexpr std::string_view kLoadRun =
 constexpr std::string_view kLoadSteps =
     "SELECT part, name, summary, seconds, parameters FROM steps WHERE run_id = $1";
 constexpr std::string_view kLoadResults =
-    "SELECT of_analysis, quantities.name, value, unit, judgement, limits.name, lower, lower_open, "
-    "upper, upper_open "
+    "SELECT by_bench, of_analysis, quantities.name, value, unit, judgement, limits.name, lower, "
+    "lower_open, upper, upper_open, decides, note "
     "FROM results JOIN quantities ON quantities.id = quantity_id LEFT JOIN limits ON limits.id = "
     "limit_id "
-    "WHERE run_id = $1 ORDER BY of_analysis, place";
+    "WHERE run_id = $1 ORDER BY by_bench, of_analysis, place";
 constexpr std::string_view kLoadFailures =
     "SELECT depth, part, step, domain, code, description, message FROM failures WHERE run_id = $1 "
     "ORDER BY place, depth DESC";
@@ -175,16 +175,22 @@ void readSteps(const Rows& rows, RunRecord& run) {
 
 void readResults(const Rows& rows, RunRecord& run) {
     for (const Row& row : rows) {
-        if (integerOf(row[0]) == 0) {
-            run.measurements.push_back({textOf(row[1]), numberOf(row[2]), textOf(row[3])});
+        const bool isBench = integerOf(row[0]) != 0;
+        if (!isBench && integerOf(row[1]) == 0) {
+            run.measurements.push_back({textOf(row[2]), numberOf(row[3]), textOf(row[4])});
             continue;
         }
-        ResultRecord& result = run.results.emplace_back();
-        result = {textOf(row[1]), numberOf(row[2]), textOf(row[3]), std::nullopt,
-                  static_cast<Judgement>(integerOf(row[4]))};
-        if (!isNull(row[5])) {
+        ResultRecord result{textOf(row[2]), numberOf(row[3]), textOf(row[4]), std::nullopt,
+                            judgementOf(integerOf(row[5]))};
+        if (!isNull(row[6])) {
             result.limit =
-                LimitRecord{textOf(row[5]), boundOf(row[6], row[7]), boundOf(row[8], row[9])};
+                LimitRecord{textOf(row[6]), boundOf(row[7], row[8]), boundOf(row[9], row[10])};
+        }
+        if (isBench) {
+            run.benchResults.push_back(
+                {std::move(result), integerOf(row[11]) != 0, textOf(row[12])});
+        } else {
+            run.results.push_back(std::move(result));
         }
     }
 }
@@ -286,13 +292,54 @@ Statement runStatement(const SessionRecord& session, const RunRecord& run, const
              valueToJson(withoutImages(run.auxiliaryData))}};
 }
 
+Statement resultStatement(bool byBench,
+                          bool ofAnalysis,
+                          std::int64_t place,
+                          const ResultRecord& result,
+                          const IdOf& idOf) {
+    Row row(1);
+    row.push_back(std::int64_t{byBench});
+    row.push_back(std::int64_t{ofAnalysis});
+    row.push_back(place);
+    row.push_back(idOf(kQuantity, {cellOf(result.name), cellOf(result.unit)}));
+    row.push_back(result.value);
+    row.push_back({});
+    if (result.limit.has_value()) {
+        row.back() = idOf(kLimit, limitRow(*result.limit));
+    }
+    row.push_back(static_cast<std::int64_t>(result.judgement));
+    row.push_back(std::int64_t{1});
+    row.push_back(std::string());
+    return {kAddResult, std::move(row)};
+}
+
+void addResults(const RunRecord& run, const IdOf& idOf, std::vector<Statement>& all) {
+    std::int64_t place = 0;
+    for (const MeasurementRecord& one : run.measurements) {
+        const ResultRecord result{one.name, one.value, one.unit, std::nullopt,
+                                  Judgement::Information};
+        all.push_back(resultStatement(false, false, place++, result, idOf));
+    }
+    place = 0;
+    for (const ResultRecord& one : run.results) {
+        all.push_back(resultStatement(false, true, place++, one, idOf));
+    }
+    place = 0;
+    for (const BenchResult& one : run.benchResults) {
+        Statement statement = resultStatement(true, false, place++, one, idOf);
+        statement.parameters[8] = std::int64_t{one.partOfVerdict};
+        statement.parameters[9] = cellOf(one.note);
+        all.push_back(std::move(statement));
+    }
+}
+
 // Everything that belongs to the run. The first parameter of each stays open: the run's id.
 std::vector<Statement> partStatements(const RunRecord& run,
                                       Attachments attachments,
                                       const IdOf& idOf) {
     std::vector<Statement> all;
-    all.reserve(run.measurements.size() + run.results.size() + run.failures.size() +
-                run.log.size() + 4);
+    all.reserve(run.measurements.size() + run.results.size() + run.benchResults.size() +
+                run.failures.size() + run.log.size() + 4);
     const auto addStep = [&](Part part, const PartPlan& plan,
                              const std::optional<double>& seconds) {
         all.push_back({kAddStep,
@@ -307,29 +354,8 @@ std::vector<Statement> partStatements(const RunRecord& run,
     if (run.plan.analysis.has_value()) {
         addStep(Part::Analysis, *run.plan.analysis, run.analysisSeconds);
     }
+    addResults(run, idOf, all);
     std::int64_t place = 0;
-    for (const MeasurementRecord& one : run.measurements) {
-        all.push_back({kAddResult,
-                       {{},
-                        std::int64_t{0},
-                        place++,
-                        idOf(kQuantity, {cellOf(one.name), cellOf(one.unit)}),
-                        one.value,
-                        {},
-                        static_cast<std::int64_t>(Judgement::Information)}});
-    }
-    place = 0;
-    for (const ResultRecord& one : run.results) {
-        all.push_back({kAddResult,
-                       {{},
-                        std::int64_t{1},
-                        place++,
-                        idOf(kQuantity, {cellOf(one.name), cellOf(one.unit)}),
-                        one.value,
-                        one.limit.has_value() ? idOf(kLimit, limitRow(*one.limit)) : Cell(),
-                        static_cast<std::int64_t>(one.judgement)}});
-    }
-    place = 0;
     for (const FailureRecord& failure : run.failures) {
         std::int64_t depth = 0;
         const platform::Error* error = failure.error.get();

@@ -5,6 +5,9 @@
 
 #include <fmt/format.h>
 
+#include "host/record/clean_text.h"
+#include "host/record/run_text.h"
+
 namespace host {
 
 namespace {
@@ -25,49 +28,55 @@ StoreListener::StoreListener(const StoreOptions& options, Complain complain)
 
 void StoreListener::runEnded(const RunRecord& run) {
     const auto start = Clock::now();
-    bool isDown = _patience <= std::chrono::milliseconds(0);
-    try {
-        if (!isDown) {
-            _store.setPatience(_patience);
-            try {
-                _store.write(*_session, run, _attachments);
-            } catch (const StoreProblem& problem) {
-                isDown = true;
-                _complainOnce(
-                    _toldOfStore,
-                    fmt::format("store {}; the run is kept in {} until the store takes it",
-                                problem.what(), _spool.folder().string()));
-            }
+    if (_patience > std::chrono::milliseconds(0)) {
+        _store.setPatience(_patience);
+        if (_write(run)) {
+            _deliver();
+            return;
         }
-        if (isDown) {
-            _spool.add(*_session, run, _attachments);
-        } else {
-            isDown = !_deliver();
-        }
-    } catch (const std::exception& exception) {
-        _complainOnce(_toldOfSpool, fmt::format("a run is not in the store {}: {}", _store.name(),
-                                                exception.what()));
     }
-    if (isDown) {
+    _keep(run);
+    _patience -= std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start);
+}
+
+bool StoreListener::_write(const RunRecord& run) {
+    try {
+        _store.write(*_session, run, _attachments);
+        return true;
+    } catch (const std::exception& exception) {
+        _complainOnce(fmt::format("store {}; runs wait in {} until it takes them",
+                                  plainLine(exception.what()), _spool.folder().string()));
+        return false;
+    }
+}
+
+// One that cannot be kept is lost: said of each.
+void StoreListener::_keep(const RunRecord& run) {
+    try {
+        _spool.add(*_session, run, _attachments);
+    } catch (const std::exception& exception) {
+        _complain(fmt::format("store {}: run {} is not stored and cannot wait: {}", _store.name(),
+                              plainLine(run.uuid), plainLine(exception.what())));
+    }
+}
+
+void StoreListener::_deliver() {
+    const auto start = Clock::now();
+    const Spool::Delivery delivery = _spool.deliver(_store, kDeliveryTime);
+    for (const std::string& line : delivery.setAside) {
+        _complain(
+            fmt::format("store {}: a run that waited was set aside: {}", _store.name(), line));
+    }
+    if (delivery.problem.has_value()) {
+        _complainOnce(fmt::format("store {}; {} in {}", *delivery.problem,
+                                  plural(delivery.waiting, "run waits", "runs wait"),
+                                  _spool.folder().string()));
         _patience -= std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start);
     }
 }
 
-bool StoreListener::_deliver() {
-    const Spool::Delivery delivery = _spool.deliver(_store, kDeliveryTime);
-    for (const std::string& line : delivery.setAside) {
-        _complain("store " + _store.name() + ": a run that waited for it was set aside: " + line);
-    }
-    if (delivery.problem.has_value()) {
-        _complainOnce(_toldOfStore,
-                      fmt::format("store {}; {} runs wait in {}", delivery.problem->what(),
-                                  delivery.waiting, _spool.folder().string()));
-    }
-    return !delivery.problem.has_value();
-}
-
-void StoreListener::_complainOnce(bool& isTold, const std::string& line) {
-    if (!std::exchange(isTold, true)) {
+void StoreListener::_complainOnce(const std::string& line) {
+    if (!std::exchange(_isTold, true)) {
         _complain(line);
     }
 }

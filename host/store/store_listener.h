@@ -29,8 +29,8 @@ struct StoreOptions {
 // the waiting for it has used up the session's patience.
 class StoreListener : public RunListener {
   public:
-    // Says something to the user, in one line: once in a session that the store does not take runs, once that
-    // a run could not be kept at all, and for each file of the spool that was set aside.
+    // Says something to the user, in one line: once in a session that the store does not take runs, and for each
+    // run that could not be kept at all or was set aside in the spool.
     using Complain = std::function<void(const std::string& line)>;
 
     // Throws a Problem as Store does. Does not connect.
@@ -40,8 +40,10 @@ class StoreListener : public RunListener {
     void runEnded(const RunRecord& run) override;
 
   private:
-    bool _deliver();  // false when the store failed
-    void _complainOnce(bool& isTold, const std::string& line);
+    bool _write(const RunRecord& run);
+    void _keep(const RunRecord& run);
+    void _deliver();
+    void _complainOnce(const std::string& line);
 
     Store _store;
     const Spool _spool;
@@ -49,8 +51,7 @@ class StoreListener : public RunListener {
     const Complain _complain;
     const SessionRecord* _session = nullptr;  // the caller's
     std::chrono::milliseconds _patience;      // what is left of it
-    bool _toldOfStore = false;
-    bool _toldOfSpool = false;
+    bool _isTold = false;
 };
 
 }  // namespace host

@@ -81,16 +81,20 @@ CREATE TABLE steps (
     PRIMARY KEY (run_id, part)
 ) {clustered};
 
--- Measurements of the experiment, and results of the analysis.
+-- Measurements of the experiment, results of the analysis, and what limits of the bench found: those of its
+-- user, on what the module records and does not judge.
 CREATE TABLE results (
     run_id BIGINT NOT NULL REFERENCES runs (id),
-    of_analysis SMALLINT NOT NULL,  -- 1 for a result, 0 for a measurement
+    by_bench SMALLINT NOT NULL DEFAULT 0,  -- 1 when a limit of the bench judged, 0 when the module did
+    of_analysis SMALLINT NOT NULL,  -- 1 for a result of the analysis, else 0
     place INTEGER NOT NULL,         -- from 0
     quantity_id BIGINT NOT NULL REFERENCES quantities (id),
     value DOUBLE PRECISION,
     limit_id BIGINT REFERENCES limits (id),
-    judgement SMALLINT NOT NULL,    -- 0 not judged, 1 within its limit, 2 outside
-    PRIMARY KEY (run_id, of_analysis, place)
+    judgement SMALLINT NOT NULL,    -- 0 not judged, 1 within its limit, 2 outside, 3 not measured
+    decides SMALLINT NOT NULL DEFAULT 1,  -- 0 when the judgement is not part of the verdict
+    note TEXT NOT NULL DEFAULT '',  -- why it was not measured
+    PRIMARY KEY (run_id, by_bench, of_analysis, place)
 ) {clustered};
 CREATE INDEX results_outside ON results (quantity_id, run_id) WHERE judgement = 2;
 
@@ -140,7 +144,10 @@ WHERE unit_id IS NOT NULL AND verdict IN ('pass', 'fail');
 CREATE VIEW named_results AS
 SELECT runs.uuid, runs.started, runs.diagnostic, stations.name AS station, units.serial, units.part, runs.lot,
        quantities.name, results.value, quantities.unit, limits.name AS limit_name, limits.bounds,
-       CASE results.judgement WHEN 1 THEN 'within' WHEN 2 THEN 'outside' ELSE 'information' END AS judgement
+       CASE results.judgement WHEN 1 THEN 'within' WHEN 2 THEN 'outside' WHEN 3 THEN 'not measured'
+                              ELSE 'information' END AS judgement,
+       CASE WHEN results.by_bench = 1 THEN 'bench' WHEN results.of_analysis = 1 THEN 'analysis'
+            ELSE 'experiment' END AS source
 FROM results
 JOIN runs ON runs.id = results.run_id
 JOIN quantities ON quantities.id = results.quantity_id

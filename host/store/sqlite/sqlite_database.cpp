@@ -3,63 +3,24 @@
 // The journal is a write-ahead log, so that readers and one writer do not wait for each other. Every commit is
 // synced to the disk (synchronous = FULL): a spooled run is removed once it is committed, so a loss of power
 // must not take the commit back. That costs one sync per run.
-#include <array>
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
+#include <fstream>
 #include <map>
 #include <sqlite3.h>
 #include <stdexcept>
 #include <string>
 #include <utility>
 
-#include <linux/magic.h>
 #include <sys/stat.h>
-#include <sys/vfs.h>
 
 #include "host/store/database.h"
+#include "host/store/sqlite/network_file_system.h"
 
 namespace host {
 
 namespace {
-
-// Network file systems: shared memory, which the write-ahead log needs, does not work there.
-struct NetworkFileSystem {
-    std::uint32_t magic;
-    const char* name;
-};
-constexpr NetworkFileSystem kNetworkFileSystems[] = {
-    {NFS_SUPER_MAGIC, "NFS"},
-    {SMB_SUPER_MAGIC, "SMB"},
-    {SMB2_SUPER_MAGIC, "SMB"},
-    {CIFS_SUPER_MAGIC, "CIFS"},
-    {FUSE_SUPER_MAGIC, "FUSE"},
-    {V9FS_MAGIC, "9p"},
-    {CEPH_SUPER_MAGIC, "Ceph"},
-    {AFS_SUPER_MAGIC, "AFS"},
-    {AFS_FS_MAGIC, "AFS"},
-    {CODA_SUPER_MAGIC, "Coda"},
-    {OCFS2_SUPER_MAGIC, "OCFS2"},
-    {NCP_SUPER_MAGIC, "NCP"},
-    {0x0bd00bd0, "Lustre"},
-    {0x01161970, "GFS2"},
-    {0x786f4256, "a VirtualBox shared folder"},
-    {0xbacbacbc, "a VMware shared folder"},
-};
-
-// The name of the network file system that the file is or would be on; null when it is a local one.
-const char* networkFileSystemOf(const std::filesystem::path& file) {
-    struct statfs status {};
-    if (statfs(file.c_str(), &status) != 0 && statfs(file.parent_path().c_str(), &status) != 0) {
-        return nullptr;
-    }
-    for (const NetworkFileSystem& known : kNetworkFileSystems) {
-        if (known.magic == static_cast<std::uint32_t>(status.f_type)) {
-            return known.name;
-        }
-    }
-    return nullptr;
-}
 
 StoreProblem::Cause causeOf(int code, int systemError) {
     using Cause = StoreProblem::Cause;
@@ -151,11 +112,12 @@ class SqliteDatabase final : public Database {
   public:
     SqliteDatabase(const std::string& path, Access access)
         : _path(std::filesystem::absolute(path)), _name(path), _access(access) {
-        if (const char* network = networkFileSystemOf(_path)) {
-            throw std::runtime_error(
-                std::string("it is on a network file system (") + network +
-                "), where several stations cannot share a file; use a PostgreSQL server, "
-                "postgresql://HOST/DATABASE");
+        std::ifstream mounts("/proc/self/mountinfo");
+        if (const std::string network = networkFileSystemOf(_path, mounts); !network.empty()) {
+            std::string text("it is on a network file system (");
+            text += network;
+            text += "), where a database in a file is not safe; use a file on this machine";
+            throw std::runtime_error(text);
         }
     }
 
@@ -183,10 +145,9 @@ class SqliteDatabase final : public Database {
             _check(code);
             sqlite3_extended_result_codes(opened, 1);
             setPatience(_patience);
-            if (!hasTable("schema_version") &&
-                !_run({"SELECT 1 FROM sqlite_master LIMIT 1"}).empty()) {
-                throw StoreProblem(StoreProblem::Cause::Unusable,
-                                   _name + ": it is a database of something else");
+            const bool isEmpty = _run({"SELECT 1 FROM sqlite_master LIMIT 1"}).empty();
+            if (!hasTable("schema_version") && (!isEmpty || _access == Access::Existing)) {
+                throw StoreProblem(StoreProblem::Cause::Unusable, _name + ": it is not a store");
             }
             _execute(
                 "PRAGMA journal_mode = WAL; PRAGMA synchronous = FULL; PRAGMA foreign_keys = ON;"

@@ -156,11 +156,11 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "zrlab: --report a.pdf: its ending is not one of .html, .json, .jsonl, .txt, .xml\n"},
         {{"run", "VantorMeterixDiagnostic", "--report", "r.json", "--report", "./r.json"},
          64,
-         "zrlab: ./r.json: already used for the device, the limits or another report\n"},
+         "zrlab: ./r.json: already used for the device, the limits, the store or another report\n"},
         {{"run", "VantorMeterixDiagnostic", "--device", kBoardModule, "--output", kBoardModule},
          64,
          "zrlab: " + kBoardModule +
-             ": already used for the device, the limits or another report\n"},
+             ": already used for the device, the limits, the store or another report\n"},
         {{"run", "VantorMeterixDiagnostic", "--speed", "-1"},
          64,
          "zrlab: --speed -1: neither \"max\" nor a factor from 0.001 to 100\n"},

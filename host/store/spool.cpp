@@ -30,6 +30,7 @@ namespace fs = std::filesystem;
 
 constexpr std::string_view kEntry = ".json";
 constexpr std::string_view kPart = ".part";
+constexpr std::size_t kMostName = 60;
 
 // A descriptor that is closed at its end; with it goes the lock on the file.
 class Descriptor {
@@ -193,7 +194,8 @@ void Spool::_deliver(Store& store, std::chrono::milliseconds atMost, Delivery& r
     const std::vector<fs::path> entries = filesWith(kEntry, _folder);
     result.waiting = entries.size();
     for (const fs::path& entry : entries) {
-        if (Clock::now() - start > atMost) {
+        // In milliseconds: the greatest of them do not fit into the clock's unit.
+        if (std::chrono::floor<std::chrono::milliseconds>(Clock::now() - start) > atMost) {
             break;
         }
         const Descriptor file(entry, O_RDONLY);
@@ -249,7 +251,8 @@ std::filesystem::path defaultSpoolFolder(const std::string& where) {
             (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.';
         name += isPlain ? c : '-';
     }
-    name = name.substr(name.size() - std::min<std::size_t>(name.size(), 60));
+    name.erase(0, std::max(name.size(), kMostName) - kMostName);
+    name.erase(0, name.find_first_not_of('-'));
     return base / "zrlab/spool" / fmt::format("{}-{:016x}", name, hash);
 }
 

@@ -208,7 +208,9 @@ class SqliteDatabase final : public Database {
         if (code == SQLITE_OK || code == SQLITE_ROW || code == SQLITE_DONE) {
             return;
         }
-        const int systemError = sqlite3_system_errno(_database.get());
+        // A failed COMMIT leaves it to errno.
+        const int failure = sqlite3_system_errno(_database.get());
+        const int systemError = failure != 0 ? failure : errno;
         const int exact = sqlite3_extended_errcode(_database.get());
         std::string text = _name + ": " + sqlite3_errmsg(_database.get());
         if (const int kind = code & 0xff;
@@ -219,6 +221,7 @@ class SqliteDatabase final : public Database {
     }
 
     void _execute(const std::string& text) {
+        errno = 0;
         _check(sqlite3_exec(_database.get(), text.c_str(), nullptr, nullptr, nullptr));
     }
 
@@ -232,6 +235,7 @@ class SqliteDatabase final : public Database {
                         wanted.parameters[at]));
         }
         Rows rows;
+        errno = 0;
         int code = SQLITE_OK;
         while ((code = sqlite3_step(statement.get())) == SQLITE_ROW) {
             Row& row = rows.emplace_back();

@@ -24,6 +24,7 @@ using host::Spool;
 using host::Store;
 using testing::HasSubstr;
 
+constexpr auto kNobodyWrites = static_cast<fs::perms>(0555);
 constexpr host::Attachments kAll{.frames = true, .images = true};
 
 std::string contentOf(const fs::path& file) {
@@ -99,9 +100,8 @@ std::shared_ptr<void> fill(const Place& place) {
 }
 
 std::shared_ptr<void> makeReadOnly(const Place& place) {
-    fs::permissions(place.file, fs::perms::owner_read | fs::perms::others_read);
-    fs::permissions(place.folder, fs::perms::owner_read | fs::perms::owner_exec |
-                                      fs::perms::others_read | fs::perms::others_exec);
+    fs::permissions(place.file, kNobodyWrites);
+    fs::permissions(place.folder, kNobodyWrites);
     const uid_t user = geteuid();
     if (user == 0) {  // may write everywhere
         EXPECT_EQ(seteuid(65534), 0);
@@ -129,8 +129,8 @@ std::shared_ptr<void> damage(const Place& place) {
 const FailureRow kFailures[] = {
     {"Away", "unable to open database file", moveAway},
     {"Locked", "database is locked", lock},
-    {"Full", "full", fill},
-    {"ReadOnly", "read", makeReadOnly},
+    {"Full", "disk I/O error (File too large)", fill},
+    {"ReadOnly", "attempt to write a readonly database", makeReadOnly},
     {"Newer", "its schema has version 2", makeNewer},
     {"Damaged", "not a database", damage},
 };
@@ -213,6 +213,7 @@ TEST_F(SpoolTest, SeveralProcessesDeliverEachRunOnce) {
         Store store(_place.file.string());
         store.setPatience(std::chrono::seconds(60));
         const Spool::Delivery delivery = _spool.deliver(store);
+        EXPECT_EQ(delivery.problem, std::nullopt);
         return delivery.problem.has_value() || !delivery.setAside.empty()
                    ? 100
                    : static_cast<int>(delivery.delivered);
@@ -311,8 +312,7 @@ TEST_F(SpoolTest, SaysOnceThatItsFolderCannotBeChanged) {
     Store store(_place.file.string());
     store.connect();
     const uid_t user = geteuid();
-    fs::permissions(_place.spool, fs::perms::owner_read | fs::perms::owner_exec |
-                                      fs::perms::others_read | fs::perms::others_exec);
+    fs::permissions(_place.spool, kNobodyWrites);
     if (user == 0) {
         ASSERT_EQ(seteuid(65534), 0);
     }

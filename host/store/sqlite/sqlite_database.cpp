@@ -4,6 +4,7 @@
 // synced to the disk (synchronous = FULL): a spooled run is removed once it is committed, so a loss of power
 // must not take the commit back. That costs one sync per run.
 #include <cerrno>
+#include <chrono>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -11,6 +12,7 @@
 #include <sqlite3.h>
 #include <stdexcept>
 #include <string>
+#include <thread>
 #include <utility>
 
 #include <sys/stat.h>
@@ -149,9 +151,9 @@ class SqliteDatabase final : public Database {
             if (!hasTable("schema_version") && (!isEmpty || _access == Access::Existing)) {
                 throw StoreProblem(StoreProblem::Cause::Unusable, _name + ": it is not a store");
             }
+            _useWriteAheadLog();
             _execute(
-                "PRAGMA journal_mode = WAL; PRAGMA synchronous = FULL; PRAGMA foreign_keys = ON;"
-                "PRAGMA cache_size = -16000");
+                "PRAGMA synchronous = FULL; PRAGMA foreign_keys = ON; PRAGMA cache_size = -16000");
         } catch (...) {
             _disconnect();
             throw;
@@ -218,6 +220,23 @@ class SqliteDatabase final : public Database {
             text += std::string(" (") + std::strerror(systemError) + ")";
         }
         throw StoreProblem(causeOf(exact != SQLITE_OK ? exact : code, systemError), text);
+    }
+
+    // When several processes open a new file at once, SQLite does not wait for the other to make its log.
+    void _useWriteAheadLog() {
+        const auto end = std::chrono::steady_clock::now() + _patience;
+        for (;;) {
+            try {
+                _execute("PRAGMA journal_mode = WAL");
+                return;
+            } catch (const StoreProblem& problem) {
+                if (problem.cause() != StoreProblem::Cause::Locked ||
+                    std::chrono::steady_clock::now() >= end) {
+                    throw;
+                }
+            }
+            std::this_thread::sleep_for(std::chrono::milliseconds(2));
+        }
     }
 
     void _execute(const std::string& text) {

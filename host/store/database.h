@@ -122,7 +122,7 @@ struct Engine {
     std::unique_ptr<Database> (*open)(const std::string& address, Access access);
 };
 inline constexpr int kEngineVersion = 1;
-inline constexpr char kEngineSymbol[] = "zrStoreEngine";
+inline constexpr char kEngineSymbol[] = "kZrStoreEngine";
 
 }  // namespace host
 

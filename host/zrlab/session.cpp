@@ -215,9 +215,8 @@ class Session {
                      (most != UINT64_MAX ? " of " + std::to_string(most) : "") + "  ";
         }
         const Progress progress(plan, *_recorder, std::move(prefix));
-        SequenceOutcome outcome =
-            runOnce({ZRLab::defaultLab(), *_recorder, _listeners, _stop, _judge.get()},
-                    plan, number);
+        SequenceOutcome outcome = runOnce(
+            {ZRLab::defaultLab(), *_recorder, _listeners, _stop, _judge.get()}, plan, number);
         _isGivenUp = outcome.isGivenUp;
         return std::move(outcome.run);
     }

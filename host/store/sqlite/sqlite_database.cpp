@@ -295,6 +295,6 @@ std::unique_ptr<Database> open(const std::string& address, Access access) {
 
 }  // namespace
 
-extern "C" [[gnu::visibility("default")]] const Engine zrStoreEngine{kEngineVersion, open};
+extern "C" [[gnu::visibility("default")]] const Engine kZrStoreEngine{kEngineVersion, open};
 
 }  // namespace host

@@ -1,4 +1,4 @@
-// Store: runs in a database, of a file (SQLite) or of a server (PostgreSQL).
+// Store: runs in a database: of a file (SQLite), or of a server once an engine for one is installed.
 #ifndef ZR_HOST_STORE_STORE_H
 #define ZR_HOST_STORE_STORE_H
 
@@ -37,9 +37,10 @@ struct Attachments {
 //     for it).
 class Store {
   public:
-    // `where` is the path of a file, postgresql://... or postgres://... (as libpq reads it). Throws a Problem
-    // (kExitUsage) when it is neither or cannot be used as a store (a file on a network file system, an address
-    // that is not well formed), and (kExitError) when the engine's module cannot be loaded.
+    // `where` is the path of a file, postgresql://... or postgres://... With Access::Existing a database without
+    // runs' tables is Unusable. Throws a Problem (kExitUsage) when `where` is neither or cannot be used as a store
+    // (a file on a network file system, an address whose engine is not installed), and (kExitError) when the
+    // engine's module cannot be loaded.
     explicit Store(const std::string& where, Access access = Access::Make);
 
     // As messages show it, without a password.

@@ -12,10 +12,10 @@ file(RELATIVE_PATH libraries_from_program
   "${CMAKE_INSTALL_FULL_BINDIR}" "${CMAKE_INSTALL_FULL_LIBDIR}")
 set_target_properties(zrlab PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_program}")
 set_target_properties(zr_platform zr_host_interface zr_devices PROPERTIES INSTALL_RPATH "$ORIGIN")
-set_target_properties(zr_plugin PROPERTIES INSTALL_RPATH "$ORIGIN/..")
+set_target_properties(zr_plugin zr_store_sqlite PROPERTIES INSTALL_RPATH "$ORIGIN/..")
 install(TARGETS zrlab)
 install(TARGETS zr_platform zr_host_interface zr_devices EXPORT zrlab-targets INCLUDES DESTINATION "${headers}")
-install(TARGETS zr_plugin LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
+install(TARGETS zr_plugin zr_store_sqlite LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
 
 # What plug-ins and device modules are built against.
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/platform" DESTINATION "${headers}"

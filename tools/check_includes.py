@@ -31,9 +31,11 @@ MAY_INCLUDE = {
     "host/run": ["platform", "frame/host_interface", "input", "devices/device", "devices/observed",
                  "host/record"],
     "host/report": ["platform", "host/record"],
+    "host/store": ["platform", "host/record"],
+    "host/store/sqlite": ["host/store/database"],
     "host/zrlab": ["platform", "frame/host_interface", "input", "devices/device",
                    "devices/observed", "devices/simulator/kind", "host/record", "host/report",
-                   "host/run"],
+                   "host/run", "host/store"],
     "tools/mutate": [],
 }
 # Where anything may be included from, and where no rule is needed.
@@ -114,6 +116,7 @@ def self_test():
         ("host/report/text_report.cpp", "host/run/run_plan.h", True),
         ("host/run/run_plan.cpp", "devices/simulator/device.h", True),
         ("host/zrlab/main.cpp", "devices/device.h", False),
+        ("host/store/sqlite/sqlite_database.cpp", "host/store/store.h", True),
         ("vantor_fault/a.cpp", "vantor_counters/counter_report.h", False),
         ("frame/plugin/registration.cpp", "kirra/image_experiment.h", False),
         ("kirra/image_stream.cpp", "vector", False),

@@ -3,6 +3,7 @@
 #include <array>
 #include <cerrno>
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 #include <system_error>
 
@@ -35,6 +36,20 @@ std::string newUuid() {
         text += kDigits[bytes[at] & 0x0f];
     }
     return text;
+}
+
+bool isUuid(std::string_view text) {
+    static constexpr std::string_view kForm = "xxxxxxxx-xxxx-xxxx-xxxx-xxxxxxxxxxxx";
+    if (text.size() != kForm.size()) {
+        return false;
+    }
+    for (std::size_t at = 0; at < text.size(); ++at) {
+        const bool isDigit = std::string_view("0123456789abcdef").find(text[at]) != text.npos;
+        if (kForm[at] == 'x' ? !isDigit : text[at] != '-') {
+            return false;
+        }
+    }
+    return true;
 }
 
 }  // namespace host

@@ -76,6 +76,8 @@ constexpr std::string_view kRunExamples = R"(Examples:
       Also judge by limits of your own; write every frame to a table.
   zrlab run VantorMeterixDiagnostic --unit SN-7 --report '{unit}-{started}.html'
       Say which unit it is, and name the report after it.
+  zrlab run VantorMeterixDiagnostic --unit SN-7 --store runs.db
+      Also keep the run in a database.
   zrlab run VantorMeterixDiagnostic --device-module ./board.so --device board:rev-b
       Run on a device of a kind that a device module registers.
 
@@ -213,6 +215,8 @@ CommandLine::CommandLine()
         "Examples:\n  zrlab device show counter-stuck > mine.json\n"
         "  zrlab device check ./mine.json");
 
+    _addStoreCommand();
+
     CLI::App* settings = _app.add_subcommand(
         "settings", "Show the options of run that the environment and files give, and where");
     settings->footer(
@@ -274,6 +278,27 @@ void CommandLine::_addLimitsAndTables(CLI::App& run) {
         ->check(notEmpty());
 }
 
+void CommandLine::_addStore(CLI::App& command) {
+    command
+        .add_option("--store", session.store,
+                    "The store of runs: the file of a database,\nmade when there is none")
+        ->type_name("WHERE")
+        ->check(notEmpty());
+}
+
+void CommandLine::_addStoreCommand() {
+    CLI::App* store = _app.add_subcommand(
+        "store", "Show the store of runs, or deliver the runs that wait for it");
+    store
+        ->add_option("ACTION", action,
+                     "Show the store and how many runs wait for it, or deliver them")
+        ->required()
+        ->type_name("show|sync")
+        ->check(oneOf({"show", "sync"}));
+    _addStore(*store);
+    store->footer("Examples:\n  zrlab store show --store runs.db\n  zrlab store sync");
+}
+
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
     _run = &run;
@@ -320,6 +345,11 @@ void CommandLine::_addRun() {
         ->take_all()
         ->allow_extra_args(false);
     _addLimitsAndTables(run);
+    _addStore(run);
+    run.add_flag("--store-frames", session.storeFrames, "Store the frames of each run too")
+        ->disable_flag_override();
+    run.add_flag("--store-images", session.storeImages, "Store the images of each run too")
+        ->disable_flag_override();
     run.add_option("--repeat", session.repeat, "Run each name this many times and show the spread")
         ->type_name("N")
         ->check(wholeNumber(1, 1'000'000'000));

@@ -36,7 +36,7 @@ class CommandLine {
 
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe and device
-    std::string action;                 // of device
+    std::string action;                 // of device and store
     bool limits = false;                // of describe
     bool namesOnly = false;             // of list and devices
     bool kindsOnly = false;             // of devices
@@ -47,6 +47,8 @@ class CommandLine {
   private:
     void _addRun();
     void _addLimitsAndTables(CLI::App& run);
+    void _addStore(CLI::App& command);
+    void _addStoreCommand();
     void _addPlugin(CLI::App& command);
     void _addDeviceModule(CLI::App& command);
     void _takeSettings();

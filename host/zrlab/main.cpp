@@ -19,6 +19,7 @@
 #include "host/zrlab/device_command.h"
 #include "host/zrlab/interrupt.h"
 #include "host/zrlab/session.h"
+#include "host/zrlab/store_command.h"
 #include "host/zrlab/terminal.h"
 #include "input/nearest.h"
 
@@ -131,6 +132,14 @@ int run(int count, const char* const* arguments) {
         loadDeviceModules(commandLine.session.device.modules);
         const DeviceAnswer answer = deviceCommand(commandLine.action, commandLine.subjects);
         print(answer.text);
+        return answer.status;
+    }
+    if (command == "store") {
+        const StoreAnswer answer = storeCommand(commandLine.action, commandLine.session.store);
+        print(answer.text);
+        for (const std::string& problem : answer.problems) {
+            Terminal::shared().complain(problem);
+        }
         return answer.status;
     }
     if (command == "settings") {

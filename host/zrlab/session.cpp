@@ -9,6 +9,7 @@
 #include <string>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 #include "devices/observed/observe.h"
 #include "frame/host_interface.h"
@@ -21,6 +22,7 @@
 #include "host/run/repeat_statistics.h"
 #include "host/run/run_recorder.h"
 #include "host/run/sequence.h"
+#include "host/store/store_listener.h"
 #include "host/zrlab/interrupt.h"
 #include "host/zrlab/progress.h"
 #include "host/zrlab/session_reports.h"
@@ -78,6 +80,13 @@ class Session {
                 readBenchLimits(options.limits, runnableNames(ZRLab::defaultLab())));
         }
         _reports = std::make_shared<SessionReports>(options, _record);
+        _listeners = _reports->listeners();
+        if (!options.store.empty()) {
+            _listeners.push_back(std::make_shared<StoreListener>(
+                StoreOptions{.where = options.store,
+                             .attachments = {options.storeFrames, options.storeImages}},
+                [](const std::string& line) { Terminal::shared().complain(line); }));
+        }
         devices::Device device = openDevice(options.device);
         _record.deviceName = std::move(device.name);
         _record.deviceSummary = std::move(device.summary);
@@ -92,6 +101,7 @@ class Session {
                 report->logged(line);
             }
         };
+        const bool keepsFrames = !options.store.empty() && options.storeFrames;
         RunRecorder::FramesDelivered framesDelivered;
         const bool judgesFrames = _judge != nullptr && _judge->followsFrames();
         if (_reports->followFrames() || judgesFrames) {
@@ -105,7 +115,7 @@ class Session {
             };
         }
         _recorder =
-            std::make_shared<RunRecorder>(lineLogged, _reports->keepFrames(),
+            std::make_shared<RunRecorder>(lineLogged, _reports->keepFrames() || keepsFrames,
                                           std::move(framesDelivered), _reports->needsDetails());
         platform::setLogSink(_recorder, log.minimum);
         platform::installServices(observed::observe(std::move(device.services), _recorder));
@@ -144,8 +154,8 @@ class Session {
   private:
     template <class Event>
     void _tell(const Event& event) {
-        for (const auto& report : _reports->listeners()) {
-            event(*report);
+        for (const auto& listener : _listeners) {
+            event(*listener);
         }
     }
 
@@ -205,9 +215,8 @@ class Session {
                      (most != UINT64_MAX ? " of " + std::to_string(most) : "") + "  ";
         }
         const Progress progress(plan, *_recorder, std::move(prefix));
-        SequenceOutcome outcome =
-            runOnce({ZRLab::defaultLab(), *_recorder, _reports->listeners(), _stop, _judge.get()},
-                    plan, number);
+        SequenceOutcome outcome = runOnce(
+            {ZRLab::defaultLab(), *_recorder, _listeners, _stop, _judge.get()}, plan, number);
         _isGivenUp = outcome.isGivenUp;
         return std::move(outcome.run);
     }
@@ -240,6 +249,7 @@ class Session {
     const SessionOptions& _options;
     SessionRecord _record;
     std::shared_ptr<SessionReports> _reports;
+    std::vector<std::shared_ptr<RunListener>> _listeners;  // the reports, then the store
     std::shared_ptr<BenchJudge> _judge;  // null when there are no limits of the bench
     std::shared_ptr<RunRecorder> _recorder;
     std::stop_token _stop;

@@ -50,7 +50,7 @@ SessionReports::SessionReports(const SessionOptions& options, const SessionRecor
         _addFile(path, *form, options.verbose);
     }
     _addTables(options, session);
-    _refuseClashes({deviceArgument(options.device), options.limits});
+    _refuseClashes({deviceArgument(options.device), options.limits, options.store});
     for (const File& file : _files) {
         requireWritable(file.path);
     }
@@ -123,7 +123,7 @@ void SessionReports::_refuseClashes(const std::vector<std::string>& inputs) cons
         if (!add(file.path)) {
             throw Problem(
                 kExitUsage,
-                file.path + ": already used for the device, the limits or another report");
+                file.path + ": already used for the device, the limits, the store or another report");
         }
     }
 }

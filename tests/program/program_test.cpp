@@ -1,5 +1,6 @@
 #include "tests/program/program.h"
 
+#include <algorithm>
 #include <chrono>
 #include <csignal>
 #include <filesystem>
@@ -156,11 +157,11 @@ TEST(Program, AWrongCommandLineIsOneLineAndRunsNothing) {
          "zrlab: --report a.pdf: its ending is not one of .html, .json, .jsonl, .txt, .xml\n"},
         {{"run", "VantorMeterixDiagnostic", "--report", "r.json", "--report", "./r.json"},
          64,
-         "zrlab: ./r.json: already used for the device, the limits or another report\n"},
+         "zrlab: ./r.json: already used for the device, the limits, the store or another report\n"},
         {{"run", "VantorMeterixDiagnostic", "--device", kBoardModule, "--output", kBoardModule},
          64,
          "zrlab: " + kBoardModule +
-             ": already used for the device, the limits or another report\n"},
+             ": already used for the device, the limits, the store or another report\n"},
         {{"run", "VantorMeterixDiagnostic", "--speed", "-1"},
          64,
          "zrlab: --speed -1: neither \"max\" nor a factor from 0.001 to 100\n"},
@@ -583,6 +584,50 @@ TEST(Program, WritesFramesAndImagesAsTheyCome) {
     const test::Outcome full = zrlab(with(kFaultRun, {"--frames", (folder / "full.csv").string()}));
     EXPECT_EQ(full.status, 2);
     EXPECT_THAT(full.errors, HasSubstr("full.csv: No space left on device\n"));
+}
+
+// The store's folder is missing at first: the verdict stands, the run waits, and is delivered later.
+TEST(Program, KeepsRunsInAStoreOrUntilItTakesThem) {
+    const fs::path folder = newFolder();
+    const std::string store = (folder / "away/runs.db").string();
+    const std::vector<std::string> variables = {"XDG_STATE_HOME=" + (folder / "state").string(),
+                                                "ZRLAB_STORE=" + store};
+    const auto run = [&variables](const std::string& device) {
+        return test::runProgram({ZR_PROGRAM, "run", "VantorMeterixDiagnostic", "--device", device,
+                                 "--repeat", "2", "--unit", "SN-7", "--log", "off"},
+                                variables);
+    };
+    const auto command = [&variables](const std::string& action) {
+        return test::runProgram({ZR_PROGRAM, "store", action}, variables);
+    };
+    const test::Outcome passed = run("healthy");
+    const test::Outcome failed = run("counter-stuck");
+    EXPECT_EQ(passed.status, 0);
+    EXPECT_EQ(failed.status, 1);
+    for (const test::Outcome& outcome : {passed, failed}) {
+        EXPECT_THAT(outcome.errors, StartsWith("zrlab: store " + store + ": unable to open"));
+        EXPECT_EQ(std::count(outcome.errors.begin(), outcome.errors.end(), '\n'), 1);
+    }
+    const test::Outcome away = command("show");
+    EXPECT_EQ(away.status, 2);
+    EXPECT_THAT(away.output, HasSubstr("waiting  4 in " + (folder / "state/zrlab").string()));
+    EXPECT_EQ(command("sync").status, 2);
+
+    fs::create_directory(folder / "away");
+    EXPECT_EQ(command("sync").output, store + ": 4 runs delivered\n");
+    EXPECT_EQ(command("sync").output, store + ": 0 runs delivered\n");
+    EXPECT_EQ(run("healthy").errors, "");
+    const test::Outcome shown = command("show");
+    EXPECT_EQ(shown.status, 0);
+    EXPECT_THAT(shown.output, HasSubstr("\nruns     6\nwaiting  0 in "));
+
+    const test::Outcome noEngine =
+        zrlab({"run", "VantorMeterixDiagnostic", "--store", "postgresql://joe:secret@db/runs"});
+    EXPECT_EQ(noEngine.status, 64);
+    EXPECT_THAT(noEngine.errors,
+                StartsWith("zrlab: store postgresql://joe:***@db/runs: no engine for it"));
+    EXPECT_EQ(zrlab({"store", "show"}).status, 64);
+    fs::remove_all(folder);
 }
 
 }  // namespace

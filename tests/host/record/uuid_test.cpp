@@ -32,9 +32,19 @@ TEST(Uuid, HasTheTimeTheVersionAndTheVariant) {
         }
         EXPECT_EQ(uuid[14], '7') << uuid;
         EXPECT_NE(std::string("89ab").find(uuid[19]), std::string::npos) << uuid;
+        EXPECT_TRUE(host::isUuid(uuid)) << uuid;
         made.insert(uuid);
     }
     EXPECT_EQ(made.size(), 100U);
+}
+
+TEST(Uuid, IsNotWhatCouldBeAPath) {
+    for (const char* text :
+         {"", "../../etc/passwd", "019ab7f0-0000-7000-8000-00000000000",
+          "019ab7f0-0000-7000-8000-00000000000g", "019ab7f000000-7000-8000-000000000000",
+          "019ab7f0-0000-7000-8000-0000000/../x"}) {
+        EXPECT_FALSE(host::isUuid(text)) << text;
+    }
 }
 
 }  // namespace

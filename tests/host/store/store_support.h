@@ -1,0 +1,52 @@
+// What the tests of stores share: folders, runs, and questions to a store.
+#ifndef ZR_TESTS_HOST_STORE_STORE_SUPPORT_H
+#define ZR_TESTS_HOST_STORE_STORE_SUPPORT_H
+
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "host/record/run_record.h"
+#include "host/store/store.h"
+
+namespace test {
+
+// A folder that lives as long as the object.
+class Folder {
+  public:
+    Folder();
+    ~Folder();
+    Folder(const Folder&) = delete;
+    Folder& operator=(const Folder&) = delete;
+
+    const std::filesystem::path& path() const { return _path; }
+
+  private:
+    std::filesystem::path _path;
+};
+
+// A session of one run that passed, with as many results and a new uuid.
+host::SessionRecord storedSession(std::size_t results = 64);
+
+// Every run of the sample sessions as the only one of its session, with a uuid, and a name for messages.
+std::vector<std::pair<std::string, host::SessionRecord>> sampleRuns();
+
+// The one whole number that the SQL selects.
+std::int64_t numberIn(host::Store& store, std::string_view sql);
+inline std::int64_t runsIn(host::Store& store) {
+    return numberIn(store, "SELECT COUNT(*) FROM runs");
+}
+
+// Runs the function in as many processes at once; returns the sum of what they return, which is below 100
+// each. A process that dies fails the test.
+int inProcesses(int count, const std::function<int(int process)>& function);
+
+// Runs SQL on the file of a store beside the store's own connection.
+void runSql(const std::filesystem::path& file, const std::string& sql);
+
+}  // namespace test
+
+#endif

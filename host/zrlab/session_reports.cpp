@@ -123,7 +123,8 @@ void SessionReports::_refuseClashes(const std::vector<std::string>& inputs) cons
         if (!add(file.path)) {
             throw Problem(
                 kExitUsage,
-                file.path + ": already used for the device, the limits, the store or another report");
+                file.path +
+                    ": already used for the device, the limits, the store or another report");
         }
     }
 }

@@ -19,10 +19,10 @@ StoreAnswer sync(const std::string& where) {
     Store store(where);
     const Spool spool(defaultSpoolFolder(where));
     const Spool::Delivery delivery = spool.deliver(store);
-    StoreAnswer answer{fmt::format("{}: {} delivered\n", store.name(),
-                                   plural(delivery.delivered, "run", "runs")),
-                       {},
-                       kExitPassed};
+    StoreAnswer answer{
+        fmt::format("{}: {} delivered\n", store.name(), plural(delivery.delivered, "run", "runs")),
+        {},
+        kExitPassed};
     for (const std::string& line : delivery.setAside) {
         answer.problems.push_back("set aside: " + line);
     }

@@ -1,15 +1,16 @@
 // Runs scenarios in many orders, and one order again.
 //
-//   interleavings BEGINNING [--more N] [--most N] [--seeds N] [--first-seed S]
+//   interleavings BEGINNING [--more N] [--most N] [--orders N] [--seeds N] [--first-seed S]
 //   interleavings SCENARIO --replay ORDER        prints every step of that order
 //   interleavings --list
 //
-// For each scenario whose name has that beginning: every order with at most the scenario's number of
-// preemptions and N more (0), though at most N, then one random order for each of N seeds (2000). Ends with status 1 at the
-// first order that fails, and prints the command that replays it.
+// For each scenario whose name has that beginning: every order with at most the scenario's number of preemptions
+// and N more (0), though with at most N preemptions, or the first N of these orders; then one random order for each
+// of N seeds (2000). Ends with status 1 at the first order that fails, and prints the command that replays it.
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
+#include <limits>
 #include <random>
 #include <string>
 
@@ -91,10 +92,19 @@ bool advance(Order& order, unsigned most) {
     return false;
 }
 
-std::size_t exploreAll(const Scenario& scenario, unsigned preemptions) {
+struct Explored {
+    std::size_t orders = 0;
+    bool isAll = false;
+};
+
+// At most `most` orders: a scenario of many steps has more than a night's worth.
+Explored exploreAll(const Scenario& scenario, unsigned preemptions, std::size_t most) {
     Order order;
     std::size_t orders = 0;
     do {
+        if (orders == most) {
+            return {orders, false};
+        }
         Execution execution = once(scenario, [&](std::size_t place, const Choice&) {
             return place < order.size() ? order[place].chosen : 0;
         });
@@ -104,7 +114,7 @@ std::size_t exploreAll(const Scenario& scenario, unsigned preemptions) {
         }
         order = std::move(execution.order);
     } while (advance(order, preemptions));
-    return orders;
+    return {orders, true};
 }
 
 void exploreSeed(const Scenario& scenario, unsigned seed) {
@@ -155,6 +165,7 @@ int main(int argc, char** argv) {
     const char* order = nullptr;
     unsigned more = 0;
     unsigned most = 99;
+    unsigned orders = std::numeric_limits<unsigned>::max();
     unsigned seeds = 2000;
     unsigned firstSeed = 1;
     for (int at = 1; at < argc; ++at) {
@@ -174,6 +185,8 @@ int main(int argc, char** argv) {
             more = number();
         } else if (word == "--most") {
             most = number();
+        } else if (word == "--orders") {
+            orders = number();
         } else if (word == "--seeds") {
             seeds = number();
         } else if (word == "--first-seed") {
@@ -201,12 +214,15 @@ int main(int argc, char** argv) {
             std::_Exit(execution.failure.empty() ? 0 : 1);
         }
         const unsigned preemptions = std::min(scenario.preemptions + more, most);
-        const std::size_t orders = exploreAll(scenario, preemptions);
+        const Explored explored = exploreAll(scenario, preemptions, orders);
         for (unsigned seed = firstSeed; seed - firstSeed < seeds; ++seed) {
             exploreSeed(scenario, seed);
         }
         fmt::print("{}: {} orders with at most {} preemptions, {} random orders: passed\n",
-                   scenario.name, orders, preemptions, seeds);
+                   scenario.name,
+                   explored.isAll ? fmt::format("all {}", explored.orders)
+                                  : fmt::format("the first {}", explored.orders),
+                   preemptions, seeds);
         std::fflush(stdout);
     }
     if (!found) {

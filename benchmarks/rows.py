@@ -235,7 +235,7 @@ ROWS = (
         "The program's start, a first frame and the report take 3.9 ms, 0.04 % of the ten seconds, and some 20 "
         "switches. Beyond them a frame wakes the receiving and the processing thread once, each of which goes back "
         "to sleep on an idle core. Two bare threads that do nothing else when each frame wakes them, on the system "
-        "call alone, stand below: what they cost beyond the device is no queue's to save."),
+        "call alone, are in the table below. No queue can save what they cost beyond the device."),
     Row("memory-frames", "Memory of a run by its number of frames", measure.memory_of_frames,
         tuple(Goal(f"{user}: 1,000,000 frames of 1,000", growth(f"{user}/1000000", f"{user}/1000"), 1.03)
               for user in USERS),

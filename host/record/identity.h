@@ -21,6 +21,17 @@ struct Identity {
     std::vector<std::pair<std::string, std::string>> metadata;
 };
 
+// The texts that are not metadata, as reports and stores name them.
+struct IdentityEntry {
+    const char* name;
+    std::string Identity::*text;
+};
+inline constexpr IdentityEntry kIdentityEntries[] = {{"unit", &Identity::unit},
+                                                     {"part", &Identity::part},
+                                                     {"lot", &Identity::lot},
+                                                     {"station", &Identity::station},
+                                                     {"operator", &Identity::operatorName}};
+
 }  // namespace host
 
 #endif

@@ -277,16 +277,11 @@ std::string levelText(const LogRecord& line) {
 
 std::vector<std::pair<std::string, std::string>> identityTexts(const Identity& identity) {
     std::vector<std::pair<std::string, std::string>> texts;
-    const auto add = [&texts](const char* name, const std::string& text) {
-        if (!text.empty()) {
-            texts.emplace_back(name, text);
+    for (const auto& [name, text] : kIdentityEntries) {
+        if (!(identity.*text).empty()) {
+            texts.emplace_back(name, identity.*text);
         }
-    };
-    add("unit", identity.unit);
-    add("part", identity.part);
-    add("lot", identity.lot);
-    add("station", identity.station);
-    add("operator", identity.operatorName);
+    }
     texts.insert(texts.end(), identity.metadata.begin(), identity.metadata.end());
     const bool onlyStation = texts.size() == 1 && !identity.station.empty();
     return onlyStation ? std::vector<std::pair<std::string, std::string>>() : texts;

@@ -241,17 +241,16 @@ Json deviceOf(const SessionRecord& session) {
 }
 
 Json identityOf(const Identity& identity) {
-    const auto orNull = [](const std::string& text) { return text.empty() ? Json() : Json(text); };
+    Json object = Json::object();
+    for (const auto& [name, text] : kIdentityEntries) {
+        object[name] = (identity.*text).empty() ? Json() : Json(identity.*text);
+    }
     Json metadata = Json::object();
     for (const auto& [name, text] : identity.metadata) {
         metadata[name] = text;
     }
-    return {{"unit", orNull(identity.unit)},
-            {"part", orNull(identity.part)},
-            {"lot", orNull(identity.lot)},
-            {"station", orNull(identity.station)},
-            {"operator", orNull(identity.operatorName)},
-            {"metadata", std::move(metadata)}};
+    object["metadata"] = std::move(metadata);
+    return object;
 }
 
 // Text that is not UTF-8 (it may come from a device) must not stop the report.

@@ -73,16 +73,11 @@ Json hardwareOf(const SessionRecord& session) {
 // What belongs to the session and not to the device.
 Json metadataOf(const Identity& identity) {
     Json metadata = Json::object();
-    const auto add = [&metadata](const std::string& name, const std::string& text) {
-        if (!text.empty()) {
-            metadata[name] = text;
+    for (const auto& [name, text] : kIdentityEntries) {
+        if (!(identity.*text).empty()) {
+            metadata[name] = identity.*text;
         }
-    };
-    add("unit", identity.unit);
-    add("part", identity.part);
-    add("lot", identity.lot);
-    add("station", identity.station);
-    add("operator", identity.operatorName);
+    }
     for (const auto& [name, text] : identity.metadata) {
         metadata["meta." + name] = text;
     }

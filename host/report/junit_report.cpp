@@ -158,11 +158,9 @@ class Suite {
                 _property(name, text);
             }
         };
-        add("unit", identity.unit);
-        add("part", identity.part);
-        add("lot", identity.lot);
-        add("station", identity.station);
-        add("operator", identity.operatorName);
+        for (const auto& [name, text] : kIdentityEntries) {
+            add(name, identity.*text);
+        }
         for (const auto& [name, text] : identity.metadata) {
             add("meta." + name, text);
         }

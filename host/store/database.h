@@ -52,7 +52,7 @@ using Rows = std::vector<Row>;
 // What they do not share, and SQL for any store must avoid: functions of date, time, JSON, random numbers and
 // mathematics; group_concat and string_agg; stddev, variance and percentiles (use sums); round() with two
 // arguments; a comparison as a number (count(*) FILTER (WHERE ...) works on both); min() and max() of several
-// columns; LIKE, which only PostgreSQL tells case apart in; the place of NULLs in ORDER BY, unless it says
+// columns; LIKE, which is case-sensitive in PostgreSQL only; the place of NULLs in ORDER BY, unless it says
 // NULLS FIRST or NULLS LAST. An average or a quotient needs CAST(... AS DOUBLE PRECISION).
 struct Statement {
     std::string_view sql;
@@ -92,7 +92,7 @@ class Database {
     // A transaction that writes. commit() returns when the data would survive a loss of power.
     virtual void begin() = 0;
     virtual void commit() = 0;
-    virtual void rollback() noexcept = 0;  // nothing when there is no transaction
+    virtual void rollback() noexcept = 0;  // does nothing without a transaction
 
     // Called first in a transaction: until its end no other process looks at the schema or changes it.
     virtual void lockSchema() = 0;

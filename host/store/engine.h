@@ -12,7 +12,7 @@ namespace host {
 // The database at the address, by the module zr_store_sqlite.so, for an address of a server by
 // zr_store_postgres.so: beside the program, as a build leaves it, or where an installation has it. Does not
 // connect. Throws a Problem as Store does.
-// Any thread, one at a time.
+// May be called on any thread, by one at a time.
 std::unique_ptr<Database> openDatabase(const std::string& address, Access access);
 
 }  // namespace host

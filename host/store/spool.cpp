@@ -242,7 +242,7 @@ std::filesystem::path defaultSpoolFolder(const std::string& where) {
     const std::string store = shown.find("://") != std::string::npos
                                   ? shown
                                   : fs::absolute(shown).lexically_normal().string();
-    // A name that people recognise, and a number that tells apart what it makes alike.
+    // A name that people recognise, and a hash: different stores may get the same name.
     std::uint64_t hash = 14695981039346656037U;  // FNV-1a
     std::string name;
     for (const char c : store) {

@@ -158,7 +158,7 @@ std::string valueIn(const Environment& environment, const char* variable) {
 }
 
 std::string userPath(const Environment& environment) {
-    // The base directory specification: a relative path is not valid there.
+    // A relative path is not valid in this variable, by the XDG rules for base directories.
     const std::string config = valueIn(environment, "XDG_CONFIG_HOME");
     const std::string home = valueIn(environment, "HOME");
     return config.starts_with("/") ? config + "/zrlab/zrlab.conf"

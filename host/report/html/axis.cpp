@@ -40,6 +40,17 @@ std::string markText(double value, double step) {
     return fmt::format("{:.{}f}", value, decimals);
 }
 
+std::string xMarksSvg(const Axis& x) {
+    std::string svg;
+    for (const auto& [value, text] : x.marks()) {
+        svg += fmt::format(
+            "<text class=\"mark\" x=\"{:.2f}%\" y=\"100%\" dy=\"1.6em\" "
+            "text-anchor=\"middle\">{}</text>",
+            100 * x.at(value), text);
+    }
+    return svg;
+}
+
 }  // namespace
 
 bool isDrawable(double value) {
@@ -58,6 +69,13 @@ Axis Axis::around(double least, double greatest) {
     const double middle = (least + greatest) / 2;
     const double half = std::max((greatest - least) * 0.56, std::abs(middle) * 0.005);
     return half > 0 ? Axis(middle - half, middle + half, false) : Axis(-1, 1, false);
+}
+
+Axis Axis::toMarks(double least, double greatest) {
+    const Axis tight(least, greatest, false);
+    const double step = roundStep(tight._greatest - tight._least);
+    return {std::floor(tight._least / step + 1e-6) * step,
+            std::ceil(tight._greatest / step - 1e-6) * step, false};
 }
 
 std::vector<std::pair<double, std::string>> Axis::marks() const {
@@ -91,13 +109,16 @@ std::string axesSvg(const Axis& x, const Axis& y) {
             "text-anchor=\"end\">{1}</text>",
             down, text);
     }
+    return svg + xMarksSvg(x);
+}
+
+std::string verticalGridSvg(const Axis& x) {
+    std::string svg;
     for (const auto& [value, text] : x.marks()) {
-        svg += fmt::format(
-            "<text class=\"mark\" x=\"{:.2f}%\" y=\"100%\" dy=\"1.6em\" "
-            "text-anchor=\"middle\">{}</text>",
-            100 * x.at(value), text);
+        svg += fmt::format(R"(<line class="grid" x1="{0:.2f}%" x2="{0:.2f}%" y1="0" y2="100%"/>)",
+                           100 * x.at(value));
     }
-    return svg;
+    return svg + xMarksSvg(x);
 }
 
 }  // namespace host

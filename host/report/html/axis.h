@@ -19,6 +19,9 @@ class Axis {
     // Around the values with some air above and below, so that a line that hardly moves looks flat.
     static Axis around(double least, double greatest);
 
+    // Widened to the next round values, so that both ends have a mark.
+    static Axis toMarks(double least, double greatest);
+
     // Where the value stands: 0 at the axis's start, 1 at its end.
     double at(double value) const { return (value - _least) / (_greatest - _least); }
 
@@ -33,6 +36,9 @@ class Axis {
 
 // The grid lines and the texts of both axes, as SVG that does not depend on the drawing's width.
 std::string axesSvg(const Axis& x, const Axis& y);
+
+// Upright grid lines and their texts, of a drawing whose rows have names.
+std::string verticalGridSvg(const Axis& x);
 
 }  // namespace host
 

@@ -8,8 +8,8 @@
 
 #include "host/record/clean_text.h"
 #include "host/record/run_text.h"
+#include "host/report/html/page_frame.h"
 #include "host/report/html/run_section.h"
-#include "host/report/html/style.h"
 
 namespace host {
 
@@ -63,11 +63,6 @@ std::string outcomeOf(const SessionRecord& session) {
         return headline(session.runs.front());
     }
     return fmt::format("{} of {} passed", passed, plural(runs, "run", "runs"));
-}
-
-std::string factHtml(std::string_view name, std::string_view value, std::string_view more = "") {
-    return fmt::format("<div><dt>{}</dt><dd>{}{}</dd></div>\n", name, htmlText(value),
-                       more.empty() ? "" : fmt::format(" <span>{}</span>", htmlText(more)));
 }
 
 // The unit first, then the rest of what was given about it and the place.
@@ -145,30 +140,16 @@ std::string footHtml(const SessionRecord& session) {
 }  // namespace
 
 std::string htmlReport(const SessionRecord& session) {
-    std::string page = fmt::format(
-        R"(<!DOCTYPE html>
-<html lang="en">
-<head>
-<meta charset="utf-8">
-<meta name="viewport" content="width=device-width, initial-scale=1">
-<meta name="color-scheme" content="light dark">
-<meta http-equiv="Content-Security-Policy" content="default-src 'none'; style-src 'unsafe-inline'">
-<title>{} · {} · {}zrlab</title>
-<style>
-{}</style>
-</head>
-<body>
-<a class="skip" href="#results">Skip to the results</a>
-)",
-        verdictText(session.verdict), htmlText(subjectOf(session)),
-        session.identity.unit.empty() ? "" : htmlText(session.identity.unit) + " · ", kReportStyle);
+    const std::string& unit = session.identity.unit;
+    std::string page = pageStart(fmt::format("{} · {}{}", verdictText(session.verdict),
+                                             subjectOf(session), unit.empty() ? "" : " · " + unit));
     const bool manyRuns = namesIn(session) > 1 || !session.repeats.empty();
     page += headHtml(session) + contentsHtml(session) + "<main class=\"sheet\" id=\"results\">\n";
     for (std::size_t at = 0; at < session.runs.size(); ++at) {
         page += runHtml(session.runs[at], session.repeatOf(at),
                         {sectionId(at), titleOf(session, at), manyRuns});
     }
-    return page + "</main>\n" + footHtml(session) + "</body>\n</html>\n";
+    return page + "</main>\n" + footHtml(session) + std::string(kPageEnd);
 }
 
 std::shared_ptr<RunListener> openHtmlReport(ReportSink sink, const TextStyle& /*style*/) {

@@ -9,6 +9,7 @@
 
 #include "host/record/clean_text.h"
 #include "host/report/html/axis.h"
+#include "host/report/html/figure.h"
 
 namespace host {
 
@@ -152,25 +153,13 @@ std::string figureOf(const Figure& figure,
                      std::string_view kind,
                      const std::string& data,
                      const std::string& legend) {
-    return fmt::format(
-        R"(<figure>
-<figcaption><h4>{title}</h4><p>{caption}</p></figcaption>
-<p class="y-label" aria-hidden="true">{yLabel}</p>
-<svg class="plot" role="img" aria-labelledby="{id}-title {id}-desc">
-<title id="{id}-title">{title}</title>
-<desc id="{id}-desc">{yLabel} over {xLabel}. {caption}</desc>
-{axes}
-<svg class="{kind}" viewBox="{viewBox}" preserveAspectRatio="none" width="100%" height="100%">
-{data}
-</svg>
-</svg>
-<p class="x-label" aria-hidden="true">{xLabel}</p>
-{legend}</figure>
-)",
-        fmt::arg("title", htmlText(figure.title)), fmt::arg("caption", htmlText(figure.caption)),
-        fmt::arg("xLabel", htmlText(figure.xLabel)), fmt::arg("yLabel", htmlText(figure.yLabel)),
-        fmt::arg("id", figure.id), fmt::arg("axes", axes), fmt::arg("viewBox", viewBox),
-        fmt::arg("kind", kind), fmt::arg("data", data), fmt::arg("legend", legend));
+    return figureHtml(figure, "class=\"plot\"",
+                      fmt::format(R"({}
+<svg class="{}" viewBox="{}" preserveAspectRatio="none" width="100%" height="100%">
+{}
+</svg>)",
+                                  axes, kind, viewBox, data),
+                      legend);
 }
 
 // The means of groups of neighbouring columns, all made equally tall.
@@ -292,6 +281,7 @@ std::string linePlot(const LinePlot& plot) {
     if (up.empty()) {
         return "";
     }
+    measure(plot.room);
     const Axis x(across.least, across.greatest, plot.wholeX);
     const Axis y = plot.wholeY ? Axis(up.least - 0.5, up.greatest + 0.5, true)
                                : Axis::around(up.least, up.greatest);

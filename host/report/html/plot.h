@@ -39,6 +39,7 @@ struct Figure {
     std::string caption;  // what is drawn and the figures to know
     std::string xLabel;
     std::string yLabel;
+    int level = 4;  // of its title as a heading
 };
 
 // A place between two x at which something is missing: an upright line.
@@ -54,6 +55,8 @@ struct LinePlot {
     std::vector<Series> series;
     std::vector<Band> bands;
     std::vector<Gap> gaps;
+    // Not drawn, but the axes reach them: for drawings that are compared with one another.
+    std::vector<Point> room = {};
 };
 
 // Nothing is drawn, and the text is empty, when no point has a drawable y.

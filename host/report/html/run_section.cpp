@@ -14,6 +14,7 @@
 #include "host/record/frame_gap.h"
 #include "host/record/run_text.h"
 #include "host/report/html/figures.h"
+#include "host/report/html/table.h"
 
 namespace host {
 
@@ -24,59 +25,6 @@ constexpr std::size_t kLinesAtEachEnd = 500;
 
 // Findings listed of a repetition, and gaps of a run's frames.
 constexpr std::size_t kMostFindings = 5;
-
-struct Column {
-    std::string_view name;
-    // Class of its cells: "number" lines them up at the right, "judged" stays beside the row's name on
-    // a narrow screen.
-    std::string_view style{};
-};
-
-// A table: a caption, one head cell per column, and rows whose first cell names the row.
-class Table {
-  public:
-    Table(std::string caption, std::vector<Column> columns)
-        : _caption(std::move(caption)), _columns(std::move(columns)) {}
-
-    // Cells are HTML, one for each column. On a narrow screen each cell shows its column's name.
-    void row(const std::vector<std::string>& cells, std::string_view style = "") {
-        _rows += style.empty() ? "<tr>" : fmt::format("<tr class=\"{}\">", style);
-        for (std::size_t at = 0; at < cells.size(); ++at) {
-            const Column& column = _columns[at];
-            _rows += at == 0
-                         ? fmt::format("<th scope=\"row\"{}>{}</th>", _classOf(column), cells[at])
-                         : fmt::format("<td data-name=\"{}\"{}>{}</td>", column.name,
-                                       _classOf(column), cells[at]);
-        }
-        _rows += "</tr>\n";
-    }
-
-    // Nothing when there are no rows. A table wider than the screen scrolls on its own.
-    std::string html() const {
-        if (_rows.empty()) {
-            return "";
-        }
-        std::string head;
-        for (const Column& column : _columns) {
-            head += fmt::format("<th scope=\"col\"{}>{}</th>", _classOf(column), column.name);
-        }
-        const std::string caption = htmlText(_caption);
-        return fmt::format(
-            "<div class=\"scroll\" role=\"group\" aria-label=\"{0}\" tabindex=\"0\">\n"
-            "<table>\n<caption>{0}</caption>\n<thead><tr>{1}</tr></thead>\n<tbody>\n{2}</tbody>\n"
-            "</table>\n</div>\n",
-            caption, head, _rows);
-    }
-
-  private:
-    static std::string _classOf(const Column& column) {
-        return column.style.empty() ? "" : fmt::format(" class=\"{}\"", column.style);
-    }
-
-    std::string _caption;
-    std::vector<Column> _columns;
-    std::string _rows;
-};
 
 // The sections of a run, and the links to them. A section without content is left out.
 class Sections {

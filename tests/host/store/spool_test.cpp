@@ -13,9 +13,11 @@
 #include <gmock/gmock.h>
 
 #include "host/record/uuid.h"
+#include "host/store/engine.h"
 #include "host/store/run_json.h"
 #include "host/store/store_listener.h"
 #include "tests/host/store/store_support.h"
+#include "tests/support/postgres_cluster.h"
 
 namespace {
 
@@ -26,47 +28,47 @@ using testing::HasSubstr;
 
 constexpr auto kNobodyWrites = static_cast<fs::perms>(0555);
 constexpr host::Attachments kAll{.frames = true, .images = true};
+constexpr std::chrono::milliseconds kShort{300};
+constexpr std::chrono::seconds kLong{60};
 
 std::string contentOf(const fs::path& file) {
     std::ifstream stream(file, std::ios::binary);
     return {std::istreambuf_iterator<char>(stream), {}};
 }
 
-// A store's file in a folder of its own, and the folder of the runs that wait for it.
+// A store's address, its file if it is in one, and the folder of the runs that wait for it.
 struct Place {
-    Place() {
+    explicit Place(const test::EngineRow& engine = test::kEngines[0]) {
         fs::create_directory(folder);
         fs::create_directory(spool);
         for (const fs::path& path : {home.path(), spool}) {
             fs::permissions(path, fs::perms::all);
         }
+        where = engine.address(folder);
     }
 
     test::Folder home;
     fs::path folder = home.path() / "store";
     fs::path file = folder / "runs.db";
     fs::path spool = home.path() / "spool";
+    std::string where;
 };
 
-// A failure of a store: it lasts as long as what `make` returns.
-struct FailureRow {
-    const char* name;
-    const char* complaint;
-    std::shared_ptr<void> (*make)(const Place& place);
-};
+// What a failure lasts as long as; its end mends the store.
+using Failure = std::shared_ptr<void>;
 
 template <class Mend>
-std::shared_ptr<void> until(const Mend& mend) {
+Failure until(const Mend& mend) {
     return {nullptr, [mend](void*) { mend(); }};
 }
 
-std::shared_ptr<void> moveAway(const Place& place) {
+Failure moveAway(const Place& place) {
     const fs::path away = place.home.path() / "away";
     fs::rename(place.folder, away);
     return until([=, folder = place.folder] { fs::rename(away, folder); });
 }
 
-std::shared_ptr<void> lock(const Place& place) {
+Failure lock(const Place& place) {
     sqlite3* database = nullptr;
     EXPECT_EQ(sqlite3_open(place.file.c_str(), &database), SQLITE_OK);
     EXPECT_EQ(sqlite3_exec(database, "BEGIN EXCLUSIVE", nullptr, nullptr, nullptr), SQLITE_OK);
@@ -74,22 +76,22 @@ std::shared_ptr<void> lock(const Place& place) {
 }
 
 // No file may grow beyond the size that the log of the store has, which a reader keeps from being used anew.
-std::shared_ptr<void> fill(const Place& place) {
+Failure fill(const Place& place) {
     sqlite3* reader = nullptr;
     EXPECT_EQ(sqlite3_open(place.file.c_str(), &reader), SQLITE_OK);
     EXPECT_EQ(sqlite3_exec(reader, "BEGIN; SELECT COUNT(*) FROM runs", nullptr, nullptr, nullptr),
               SQLITE_OK);
-    Store store(place.file.string());
+    Store store(place.where);
     const host::SessionRecord session = test::storedSession(5000);
     store.write(session, session.runs.front());
-    test::runSql(place.file,
+    test::runSql(place.where,
                  "DELETE FROM results WHERE run_id = (SELECT MAX(id) FROM runs);"
                  "DELETE FROM steps WHERE run_id = (SELECT MAX(id) FROM runs);"
                  "DELETE FROM runs WHERE id = (SELECT MAX(id) FROM runs)");
     rlimit before{};
     getrlimit(RLIMIT_FSIZE, &before);
     rlimit now = before;
-    now.rlim_cur = fs::file_size(place.file.string() + "-wal");
+    now.rlim_cur = fs::file_size(place.where + "-wal");
     setrlimit(RLIMIT_FSIZE, &now);
     void (*const handler)(int) = std::signal(SIGXFSZ, SIG_IGN);
     return until([=] {
@@ -99,7 +101,7 @@ std::shared_ptr<void> fill(const Place& place) {
     });
 }
 
-std::shared_ptr<void> makeReadOnly(const Place& place) {
+Failure makeReadOnly(const Place& place) {
     fs::permissions(place.file, kNobodyWrites);
     fs::permissions(place.folder, kNobodyWrites);
     const uid_t user = geteuid();
@@ -113,80 +115,174 @@ std::shared_ptr<void> makeReadOnly(const Place& place) {
     });
 }
 
-std::shared_ptr<void> makeNewer(const Place& place) {
-    test::runSql(place.file, "UPDATE schema_version SET version = version + 1");
-    return until([file = place.file] {
-        test::runSql(file, "UPDATE schema_version SET version = version - 1");
-    });
-}
-
-std::shared_ptr<void> damage(const Place& place) {
+Failure damage(const Place& place) {
     const std::string content = contentOf(place.file);
     std::ofstream(place.file) << "This was a database.";
     return until([=, file = place.file] { std::ofstream(file, std::ios::binary) << content; });
 }
 
+// A failure that SQL makes and mends, on the engine of that number.
+template <int kEngine, const char* kMake, const char* kMend>
+Failure bySql(const Place& place) {
+    test::kEngines[kEngine].runSql(place.where, kMake);
+    return until([where = place.where] { test::kEngines[kEngine].runSql(where, kMend); });
+}
+
+constexpr char kMakeNewer[] = "UPDATE schema_version SET version = version + 1";
+constexpr char kMakeOlder[] = "UPDATE schema_version SET version = version - 1";
+constexpr char kMakeReadOnly[] = "ALTER ROLE zrlab SET default_transaction_read_only = on";
+constexpr char kMakeWritable[] = "ALTER ROLE zrlab RESET default_transaction_read_only";
+constexpr char kLoseTable[] = "ALTER TABLE results RENAME TO lost";
+constexpr char kFindTable[] = "ALTER TABLE lost RENAME TO results";
+
+using Server = test::PostgresCluster;
+
+// A failure of the whole server.
+template <void (Server::*kMake)(), void (Server::*kMend)()>
+Failure byServer(const Place& /*place*/) {
+    (Server::shared().*kMake)();
+    return until([] { (Server::shared().*kMend)(); });
+}
+
+Failure lockTable(const Place& place) {
+    const std::shared_ptr<host::Database> other =
+        host::openDatabase(place.where, host::Access::Existing);
+    other->setPatience(kLong);
+    other->connect();
+    other->begin();
+    other->runScript("LOCK TABLE results");
+    return other;
+}
+
+// A store that does not work: its engine, what the user is told, how the failure is made, and how long a session
+// waits.
+struct FailureRow {
+    const char* name;
+    int engine;
+    const char* complaint;
+    Failure (*make)(const Place& place);
+    std::chrono::milliseconds patience = std::chrono::seconds(20);
+};
+
+// The first rows also show on a connection that is there.
 const FailureRow kFailures[] = {
-    {"Away", "unable to open database file", moveAway},
-    {"Locked", "database is locked", lock},
-    {"Full", "disk I/O error (File too large)", fill},
-    {"ReadOnly", "attempt to write a readonly database", makeReadOnly},
-    {"Newer", "its schema has version 2", makeNewer},
-    {"Damaged", "not a database", damage},
+    {"Away", 0, "unable to open database file", moveAway},
+    {"Locked", 0, "database is locked", lock, kShort},
+    {"Full", 0, "disk I/O error (File too large)", fill},
+    {"ServerKilled", 1, "server",  // how far its processes have come when it is asked is luck
+     byServer<&Server::kill, &Server::start>},
+    {"ServerSilent", 1, "the server does not answer", byServer<&Server::pause, &Server::resume>,
+     std::chrono::seconds(3)},
+    {"ServerFull", 1, "No space left on device", byServer<&Server::fill, &Server::makeRoom>},
+    {"ServerLocked", 1, "canceling statement due to lock timeout", lockTable,
+     std::chrono::seconds(3)},
+    // From here on only on a new one.
+    {"ServerStopped", 1, "No such file or directory", byServer<&Server::stop, &Server::start>},
+    {"ReadOnly", 0, "attempt to write a readonly database", makeReadOnly},
+    {"ServerReadOnly", 1, "cannot execute INSERT in a read-only transaction",
+     bySql<1, kMakeReadOnly, kMakeWritable>},
+    {"Newer", 0, "its schema has version 2", bySql<0, kMakeNewer, kMakeOlder>},
+    {"ServerNewer", 1, "its schema has version 2", bySql<1, kMakeNewer, kMakeOlder>},
+    {"Damaged", 0, "not a database", damage},
+    {"ServerDamaged", 1, "relation \"results\" does not exist", bySql<1, kLoseTable, kFindTable>},
 };
 
 class FailingStore : public testing::TestWithParam<FailureRow> {
   protected:
-    // A session with these runs; what it told the user.
-    std::vector<std::string> play(const std::vector<host::SessionRecord>& runs) {
-        std::vector<std::string> told;
-        host::StoreListener listener({.where = _place.file.string(),
-                                      .spoolFolder = _place.spool,
-                                      .attachments = kAll,
-                                      .patience = std::chrono::milliseconds(200)},
-                                     [&told](const std::string& line) { told.push_back(line); });
-        for (const host::SessionRecord& session : runs) {
-            listener.sessionStarted(session);
-            listener.runEnded(session.runs.front());
+    FailingStore() {
+        for (int at = 0; at < 6; ++at) {
+            _runs.push_back(test::storedSession(kResults));
         }
-        return told;
     }
 
-    Place _place;
-};
+    // A session, and the lines that its user was told.
+    struct Session {
+        Session(const Place& place, std::chrono::milliseconds patience)
+            : listener({.where = place.where,
+                        .spoolFolder = place.spool,
+                        .attachments = kAll,
+                        .patience = patience},
+                       [this](const std::string& line) { told.push_back(line); }) {}
 
-INSTANTIATE_TEST_SUITE_P(Failures,
-                         FailingStore,
-                         testing::ValuesIn(kFailures),
-                         [](const auto& failure) { return failure.param.name; });
+        void play(const std::vector<host::SessionRecord>& runs) {
+            for (const host::SessionRecord& session : runs) {
+                listener.sessionStarted(session);
+                listener.runEnded(session.runs.front());
+            }
+        }
 
-TEST_P(FailingStore, LosesNothingAndIsToldOfOnce) {
-    // 2 in the store, 3 while it fails, 1 when it is back.
-    std::vector<host::SessionRecord> runs;
-    for (int at = 0; at < 6; ++at) {
-        runs.push_back(test::storedSession());
-    }
-    EXPECT_THAT(play({runs[0], runs[1]}), testing::IsEmpty());
-    {
-        const std::shared_ptr<void> failure = GetParam().make(_place);
+        std::vector<std::string> told;
+        host::StoreListener listener;
+    };
+
+    // Three runs that the store does not take.
+    void playThree(Session& session) {
         const auto start = std::chrono::steady_clock::now();
-        const auto told = play({runs[2], runs[3], runs[4]});
-        EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(30));
-        ASSERT_EQ(told.size(), 1U);
-        EXPECT_THAT(told.front(), HasSubstr(GetParam().complaint));
-        EXPECT_THAT(told.front(), HasSubstr(_place.file.string() + ": "));
-        EXPECT_THAT(told.front(), HasSubstr(_place.spool.string()));
+        session.play({_runs[2], _runs[3], _runs[4]});
+        // A store that is waited for is waited for once.
+        EXPECT_LT(std::chrono::steady_clock::now() - start,
+                  GetParam().patience + std::chrono::seconds(5));
+        ASSERT_EQ(session.told.size(), 1U);
+        EXPECT_THAT(session.told.front(), HasSubstr(GetParam().complaint));
+        EXPECT_THAT(session.told.front(), HasSubstr(_place.where + ": "));
+        EXPECT_THAT(session.told.front(), HasSubstr(_place.spool.string()));
         EXPECT_EQ(Spool(_place.spool).waiting(), 3U);
     }
-    EXPECT_THAT(play({runs[5]}), testing::IsEmpty());
-    EXPECT_EQ(Spool(_place.spool).waiting(), 0U);
-    Store store(_place.file.string());
-    EXPECT_EQ(test::runsIn(store), 6);
-    for (const host::SessionRecord& session : runs) {
-        const auto loaded = store.load(session.runs.front().uuid);
-        ASSERT_TRUE(loaded.has_value());
-        EXPECT_EQ(loaded->runs.front().results.size(), 64U);
+
+    void playRest() {
+        Session session(_place, kLong);
+        session.play({_runs[5]});
+        EXPECT_THAT(session.told, testing::IsEmpty());
+        EXPECT_EQ(Spool(_place.spool).waiting(), 0U);
+        Store store(_place.where);
+        store.setPatience(kLong);
+        EXPECT_EQ(test::runsIn(store), 6);
+        for (const host::SessionRecord& run : _runs) {
+            const auto loaded = store.load(run.runs.front().uuid);
+            ASSERT_TRUE(loaded.has_value());
+            EXPECT_EQ(loaded->runs.front().results.size(), kResults);
+        }
     }
+
+    static constexpr std::size_t kResults = 300;  // so many that the store grows with each run
+
+    const Place _place{test::kEngines[GetParam().engine]};
+    std::vector<host::SessionRecord> _runs;
+};
+
+class FailingConnection : public FailingStore {};
+
+const auto kName = [](const auto& failure) { return failure.param.name; };
+INSTANTIATE_TEST_SUITE_P(Failures, FailingStore, testing::ValuesIn(kFailures), kName);
+INSTANTIATE_TEST_SUITE_P(Failures,
+                         FailingConnection,
+                         testing::ValuesIn(std::begin(kFailures), std::begin(kFailures) + 7),
+                         kName);
+
+TEST_P(FailingStore, LosesNothingAndIsToldOfOnce) {
+    {
+        Session session(_place, kLong);
+        session.play({_runs[0], _runs[1]});
+        EXPECT_THAT(session.told, testing::IsEmpty());
+    }
+    {
+        const Failure failure = GetParam().make(_place);
+        Session failing(_place, GetParam().patience);
+        playThree(failing);
+    }
+    playRest();
+}
+
+TEST_P(FailingConnection, LosesNothingAndIsToldOfOnce) {
+    Session(_place, kLong).play({_runs[0]});  // makes the schema
+    Session session(_place, GetParam().patience);
+    session.play({_runs[1]});
+    EXPECT_THAT(session.told, testing::IsEmpty());
+    {
+        const Failure failure = GetParam().make(_place);
+        playThree(session);
+    }
+    playRest();
 }
 
 class SpoolTest : public testing::Test {

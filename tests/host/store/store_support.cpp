@@ -2,7 +2,6 @@
 
 #include <cstdlib>
 #include <memory>
-#include <sqlite3.h>
 #include <variant>
 
 #include <sys/wait.h>
@@ -54,9 +53,6 @@ host::SessionRecord storedSession(std::size_t results) {
 std::vector<std::pair<std::string, host::SessionRecord>> sampleRuns() {
     std::vector<std::pair<std::string, host::SessionRecord>> all;
     for (const auto& [name, sample] : sampleSessions()) {
-        if (name.starts_with("long")) {
-            continue;  // more of what the others have
-        }
         for (const host::RunRecord& run : sample.runs) {
             host::SessionRecord session = sample;
             session.repeats.clear();
@@ -72,7 +68,9 @@ std::int64_t numberIn(host::Store& store, std::string_view sql) {
     return std::get<std::int64_t>(store.query(sql).at(0).at(0));
 }
 
-int inProcesses(int count, const std::function<int(int process)>& function) {
+int inProcesses(int count,
+                const std::function<int(int process)>& function,
+                const std::function<void()>& meanwhile) {
     std::vector<pid_t> processes;
     for (int at = 0; at < count; ++at) {
         const pid_t process = fork();
@@ -87,6 +85,7 @@ int inProcesses(int count, const std::function<int(int process)>& function) {
         }
         processes.push_back(process);
     }
+    meanwhile();
     int sum = 0;
     for (const pid_t process : processes) {
         int status = 0;
@@ -95,14 +94,6 @@ int inProcesses(int count, const std::function<int(int process)>& function) {
         sum += WEXITSTATUS(status);
     }
     return sum;
-}
-
-void runSql(const std::filesystem::path& file, const std::string& sql) {
-    sqlite3* opened = nullptr;
-    ASSERT_EQ(sqlite3_open(file.c_str(), &opened), SQLITE_OK);
-    const std::unique_ptr<sqlite3, int (*)(sqlite3*)> database(opened, sqlite3_close);
-    ASSERT_EQ(sqlite3_exec(opened, sql.c_str(), nullptr, nullptr, nullptr), SQLITE_OK)
-        << sqlite3_errmsg(opened);
 }
 
 }  // namespace test

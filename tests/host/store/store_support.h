@@ -9,8 +9,11 @@
 #include <utility>
 #include <vector>
 
+#include <gtest/gtest.h>
+
 #include "host/record/run_record.h"
 #include "host/store/store.h"
+#include "tests/support/store_engines.h"
 
 namespace test {
 
@@ -40,12 +43,12 @@ inline std::int64_t runsIn(host::Store& store) {
     return numberIn(store, "SELECT COUNT(*) FROM runs");
 }
 
-// Runs the function in as many processes at once; returns the sum of what they return, which is below 100
-// each. A process that dies fails the test.
-int inProcesses(int count, const std::function<int(int process)>& function);
-
-// Runs SQL on the file of a store beside the store's own connection.
-void runSql(const std::filesystem::path& file, const std::string& sql);
+// Runs the function in as many processes at once, and meanwhile the other one in this; returns the sum of what
+// they return, which is below 100 each. A process that dies fails the test.
+int inProcesses(
+    int count,
+    const std::function<int(int process)>& function,
+    const std::function<void()>& meanwhile = [] {});
 
 }  // namespace test
 

@@ -79,6 +79,8 @@ def write(machine, rows, results):
         "repeat, whose contenders run in one process in random order, five times each; less is better everywhere. "
         "The spread is the distance of the quartiles.",
         "\"here\" is this project; the other contenders are peers that do the same work.",
+        "The rows `linux-frames` and `linux-reports` are made in a virtual machine, in virtual time, as they say; "
+        "`benchmarks/run --only linux-frames --only linux-reports` makes them alone.",
     ]
     PAGE.write_text("\n".join([
         "# Performance\n",

@@ -7,6 +7,7 @@ from dataclasses import dataclass
 from typing import Callable
 
 import measure
+import measure_linux
 
 LOCKED = ("mutex+deque", "asio io_context", "asio strand", "tbb serial node")
 LOCK_FREE = ("moodycamel (lock-free)",)
@@ -81,6 +82,12 @@ EQUAL = ("Poster and worker at the same nice level: -5 as root, which is what ou
          "caller's.")
 RAISED = "The worker five levels above the poster, as our queue has it when root runs the bench."
 ALONE = "One thread measures while a second one sleeps; CPU time."
+GUEST = (
+    "One after the other on Debian's kernel in a virtual machine of one processor. **The time is virtual**: the "
+    "guest's clock counts its instructions, one per nanosecond, and skips the time without any. So the values hardly "
+    "depend on this machine and its load, one boot is enough, and they say nothing about the seconds of a processor. "
+    "Instructions are those of all threads of the process, in the kernel too, and of the interrupts that fall into "
+    "them. \"zrlab run\" is the whole program with its plug-in: what each item more costs it.")
 PIPELINE_CONDITIONS = (
     "A camera of eight buffers delivers as fast as they come back, 100,000 frames, log off, metadata of "
     "30 keys made beforehand. The peers do the same steps on their queue and absl::flat_hash_map, with "
@@ -267,4 +274,34 @@ ROWS = (
     report_row("report-images", "Report of a run of images", "KirraImageExperiment", "images", IMAGES,
                "Every form keeps the run's result, 0.9 kB per image. HTML draws from it; JSON is a tree of values, "
                "one per sample, before it is text: 10 kB per image. jsonl writes image by image."),
+    Row("linux-frames", "Frames of a camera behind Linux", measure_linux.frames,
+        (*(Goal(f"of bare system calls, {rate} per second", of_best(("bare calls",), f"/{rate}"))
+           for rate in measure_linux.RATES),
+         *(Goal(f"instructions per frame, {rate} per second", value(f"here/{rate}", digits=0), None, "instructions")
+           for rate in measure_linux.RATES),
+         *(Goal(f"frames lost of 310, {rate} per second", value(f"here/{rate} [lost]"), 0, "frames")
+           for rate in measure_linux.RATES)),
+        "310 frames of 320 x 180 pixels with metadata, of which the first ten only warm up. The camera is that of the "
+        "kernel's driver vivid, described by `examples/linux/virtual-station.json`: of a frame's numbers four come "
+        "from the metadata buffer, one from a control every 0.2 s, one from a file every 0.5 s, the others are "
+        "constant. The client looks at one number and lets the frame go. Bare calls: poll, VIDIOC_DQBUF and "
+        "VIDIOC_QBUF on both nodes, and the same numbers into a structure. " + GUEST,
+        "Of 38,800 instructions at 30 per second, about 10,500 are in the file, which is found by its pattern each "
+        "time, as its number in /sys may change, and about 350 in each of twelve constants. A description without "
+        "these and the control takes 24,000, beside the bare calls' 19,300, which are nearly all the kernel's. Nothing "
+        "was lost either of 120 frames at 60 per second while twelve other programs in the guest wanted the processor "
+        "all the time.",
+        unit="instructions", repeats=1),
+    Row("linux-reports", "Reports of a HID sensor behind Linux", measure_linux.reports,
+        (Goal("of bare system calls", of_best(("bare calls",))),
+         Goal("latency, of bare system calls", of_best(("bare calls",), " [latency]")),
+         Goal("instructions per report", value("here", digits=0), None, "instructions"),
+         Goal("latency", value("here [latency]", digits=0), None, "instructions"),
+         Goal("reports lost of 210", value("here [lost]"), 0, "reports")),
+        "210 reports of 792 bytes, twenty per second, of which the first ten only warm up, from a sensor behind uhid "
+        "and hidraw. Latency is what passes from the sensor's writing a report to the client's having it: the median, "
+        "and the worst of all. Bare calls: read on the hidraw node. " + GUEST,
+        "A report wakes the device's thread, which wakes the run loop's: three context switches per report, the bare "
+        "calls have one.",
+        unit="instructions", repeats=1),
 )

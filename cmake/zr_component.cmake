@@ -20,6 +20,8 @@ if(ZR_SANITIZER)
   target_compile_options(zr_build_flags INTERFACE
     -fsanitize=${ZR_SANITIZER} -fno-sanitize-recover=all -fno-omit-frame-pointer)
   target_link_options(zr_build_flags INTERFACE -fsanitize=${ZR_SANITIZER})
+  # The standard library checks indices, empty optionals and null pointers too.
+  target_compile_definitions(zr_build_flags INTERFACE _GLIBCXX_ASSERTIONS)
 endif()
 if(ZR_BUILD_FUZZ)
   target_compile_options(zr_build_flags INTERFACE -fsanitize=fuzzer-no-link)

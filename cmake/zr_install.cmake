@@ -12,10 +12,10 @@ file(RELATIVE_PATH libraries_from_program
   "${CMAKE_INSTALL_FULL_BINDIR}" "${CMAKE_INSTALL_FULL_LIBDIR}")
 set_target_properties(zrlab PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_program}")
 set_target_properties(zr_platform zr_host_interface zr_devices PROPERTIES INSTALL_RPATH "$ORIGIN")
-set_target_properties(zr_plugin zr_store_sqlite PROPERTIES INSTALL_RPATH "$ORIGIN/..")
+set_target_properties(zr_plugin zr_store_sqlite zr_store_postgres PROPERTIES INSTALL_RPATH "$ORIGIN/..")
 install(TARGETS zrlab)
 install(TARGETS zr_platform zr_host_interface zr_devices EXPORT zrlab-targets INCLUDES DESTINATION "${headers}")
-install(TARGETS zr_plugin zr_store_sqlite LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
+install(TARGETS zr_plugin zr_store_sqlite zr_store_postgres LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
 
 # What plug-ins and device modules are built against.
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/platform" DESTINATION "${headers}"
@@ -62,7 +62,7 @@ install(DIRECTORY "${PROJECT_SOURCE_DIR}/profiles" DESTINATION "${data}/zrlab"
   FILES_MATCHING PATTERN "*.json" PATTERN "expected-outcomes.json" EXCLUDE)
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/limits" DESTINATION "${data}/zrlab")
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/docs/" DESTINATION "${documents}"
-  FILES_MATCHING PATTERN "*.md" PATTERN "images" EXCLUDE)
+  FILES_MATCHING PATTERN "*.md" PATTERN "*.schema.json" PATTERN "images" EXCLUDE)
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/examples" DESTINATION "${documents}"
   PATTERN "build" EXCLUDE)
 install(FILES "${PROJECT_SOURCE_DIR}/cmake/package/copyright" DESTINATION "${documents}")
@@ -80,4 +80,7 @@ set(CPACK_STRIP_FILES ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_SECTION utils)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+# Only a store on a server needs libpq: whoever has none need not install it.
+set(CPACK_DEBIAN_PACKAGE_RECOMMENDS libpq5)
+set(CPACK_PROJECT_CONFIG_FILE "${PROJECT_SOURCE_DIR}/cmake/package/cpack_options.cmake")
 include(CPack)

@@ -12,6 +12,8 @@
 #ifndef ZR_DEVICES_DEVICE_H
 #define ZR_DEVICES_DEVICE_H
 
+#include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <string>
 #include <string_view>
@@ -23,7 +25,7 @@
 namespace devices {
 
 // The version of this header. It rises with every change after which a module must be built again.
-inline constexpr int kInterfaceVersion = 2;
+inline constexpr int kInterfaceVersion = 4;
 
 // A device, ready to run on. It lives as long as one of its services, streams or sensors is held.
 struct Device {
@@ -37,6 +39,10 @@ struct Device {
 
     // What the bench installs; a service that is null counts as not available.
     platform::Services services = {};
+
+    // How many calls so far the device had no answer for, as when it replays a recording that lacks them. Empty
+    // for a device that answers every call. Any thread.
+    std::function<std::uint64_t()> unanswered = {};
 };
 
 // Which device is asked for.
@@ -49,6 +55,29 @@ struct Request {
 struct Entry {
     std::string name;
     std::string summary;  // one line
+};
+
+// Something wrong that a device can deliver while each call to it succeeds: a counter that rises, a frame without
+// metadata. A campaign (zrlab campaign) runs the diagnostics on one after the other.
+struct DataFault {
+    std::string group;    // of what it is a fault: "frame metadata"
+    std::string kind;     // what is wrong: "missing in every frame"
+    std::string subject;  // with what: "HardwareEvents"; the three together are unique
+    // The service that shows it, by its name in platform::Services; empty when several do.
+    std::string service;
+    // A new device that has this fault and no other; throws as Kind::open() does.
+    std::function<Device(double speed)> open = {};
+};
+
+// What checking the description of a device finds.
+struct Findings {
+    // What is wrong with the description, one line for each problem that names the culprit; none when open() can
+    // make the device that it describes.
+    std::vector<std::string> problems = {};
+    // What it stands for on this machine, one line each. Empty for a device that is made of its description alone.
+    std::vector<std::string> lines = {};
+    // How many of the described things this machine does not have, or does not let us use.
+    std::size_t missing = 0;
 };
 
 struct Kind {
@@ -73,9 +102,13 @@ struct Kind {
     // the kind have no such form. Throws as open() does.
     std::function<std::string(const std::string& what)> show = {};
 
-    // What is wrong with a description, one line for each problem that names the culprit; none when open() can
-    // make the device that it describes. Empty when devices of the kind have no descriptions.
-    std::function<std::vector<std::string>(const std::string& what)> check = {};
+    // Checks a description, and what it describes. Empty when devices of the kind have no descriptions.
+    std::function<Findings(const std::string& what)> check = {};
+
+    // What the device that is asked for by Request::what can deliver wrongly, the faults of a group one after the
+    // other; the same faults in the same order each time. Empty when devices of the kind cannot be made to.
+    // Throws as open() does.
+    std::function<std::vector<DataFault>(const std::string& what)> dataFaults = {};
 };
 
 namespace detail {

@@ -14,13 +14,13 @@
 
 #include <array>
 #include <deque>
-#include <filesystem>
 #include <limits>
 
 #include "fuzz/expect.h"
 #include "fuzz/input.h"
 #include "platform/run_tag.h"
 #include "platform/sync.h"
+#include "tests/platform/threads.h"
 #include "tests/support/eventually.h"
 
 namespace {
@@ -209,10 +209,8 @@ struct Real {
 
 // Waits until the threads of the queue and of the delayed items have ended: no run sees those of another.
 void waitForThreads() {
-    using Tasks = std::filesystem::directory_iterator;
-    const auto count = [] { return std::distance(Tasks("/proc/self/task"), Tasks()); };
-    static const auto without = count();
-    expect(test::eventually([&] { return count() <= without; }), "no thread is left");
+    static const auto without = test::threadCount();
+    expect(test::eventually([&] { return test::threadCount() <= without; }), "no thread is left");
 }
 
 }  // namespace

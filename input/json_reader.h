@@ -2,7 +2,7 @@
 // value of each key is read and written. Every value that is read knows where it stands, and whatever is
 // wrong with it becomes one line.
 //
-// For the simulator's own sources; the parser behind it is nlohmann/json.
+// The parser behind it is nlohmann/json.
 #ifndef ZR_INPUT_JSON_READER_H
 #define ZR_INPUT_JSON_READER_H
 
@@ -141,15 +141,25 @@ T JsonNode::asInteger(T least, T most) const {
 
 // A key that an object of kind T may have: how its value gets into the object, and the value that stands for
 // what the object holds. What one takes, the other gives. A key that says nothing about the object is
-// written as kNotWritten.
+// written as kNotWritten. Objects that are only read need no write.
 template <class T>
 struct JsonKey {
     using Object = T;
 
     std::string_view name;
     void (*read)(const JsonNode& value, T& object);
-    Json (*write)(const T& object);
+    Json (*write)(const T& object) = nullptr;
 };
+
+template <class Pointer>
+struct MemberPointer;
+template <class T, class M>
+struct MemberPointer<M T::*> {
+    using Owner = T;
+};
+// The class of the objects that have this member.
+template <auto Member>
+using OwnerOf = typename MemberPointer<decltype(Member)>::Owner;
 
 inline constexpr Json::value_t kNotWritten = Json::value_t::discarded;
 

@@ -294,11 +294,9 @@ RunLoop::RunLoop() : _state(std::make_shared<State>()) {}
 
 RunLoop::~RunLoop() {
     Entries<RunLoopSource> sources;  // released at the end, without a lock
-    Entries<RunLoopObserver> observers;
     {
         const MutexLock lock(_state->mutex);
         sources.swap(_state->sources);
-        observers.swap(_state->observers);
     }
     for (const auto& entry : sources) {
         const MutexLock lock(entry.object->_wakers->mutex);
@@ -340,6 +338,12 @@ void RunLoop::removeSource(const std::shared_ptr<RunLoopSource>& source, std::st
         wakers.removeOne(_state);
         _state->changed.notifyAll();
     }
+}
+
+bool RunLoop::hasSources(std::string_view mode) const {
+    const MutexLock lock(_state->mutex);
+    return std::any_of(_state->sources.begin(), _state->sources.end(),
+                       [&](const auto& entry) { return entry.mode == memberOf(mode); });
 }
 
 void RunLoop::addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode) {

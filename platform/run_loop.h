@@ -97,6 +97,8 @@ class RunLoop {
     // longer run; a callback in progress finishes.
     void addSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode);
     void removeSource(const std::shared_ptr<RunLoopSource>& source, std::string_view mode);
+    // Whether the mode has a source, so that a run of it would have something to wait for.
+    bool hasSources(std::string_view mode) const;
     void addObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
     void removeObserver(const std::shared_ptr<RunLoopObserver>& observer, std::string_view mode);
 

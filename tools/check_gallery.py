@@ -1,7 +1,9 @@
 #!/usr/bin/python3
 """Runs every diagnostic and experiment on every device of the gallery: the verdict and its reason must be
 the expected ones, the exit status must follow, and the standard report must satisfy its schemas. Expected is
-what expected-outcomes.json says, and PASS for what it does not mention.
+what expected-outcomes.json says, and PASS for what it does not mention. Each run is recorded, and run again on its
+recording: verdict, failures, judged values, images and log must be the same, but for what the timing of threads
+decides.
 
 check_gallery.py ZRLAB OUTPUT-FOLDER
 """
@@ -12,6 +14,8 @@ import pathlib
 import subprocess
 import sys
 
+import outcome
+
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 EXPECTED = ROOT / "profiles" / "expected-outcomes.json"
 VALIDATOR = ROOT / "tools" / "validate_jsonl.py"
@@ -20,46 +24,28 @@ RUNS = {
     "VantorFaultDiagnostic": ["--set", "frameCount=30", "--set", "timeout=3"],
     "KirraImageExperiment": ["--set", "images=5", "--set", "timeout=2"],
 }
-STATUS = {"PASS": 0, "FAIL": 1, "ERROR": 2}
-
-
-def failure_text(failure):
-    """The error's code and message, then what caused it, down to the device."""
-    error = failure["error"]
-    if error is None:
-        return failure["message"]
-    text = f'{error["code"]} {error["description"]}'
-    while error := error.get("underlying"):
-        text += f' < {error["domain"]} {error["code"]}'
-    return text
-
-
-def outcome_of(report):
-    """The verdict of a run and, when it is not PASS, why."""
-    done = report["runs"][0]
-    reasons = [failure_text(failure) for failure in done["failures"]]
-    if not reasons:
-        reasons = [one["name"] for one in done["results"] if one["judgement"] == "outside"]
-    return ": ".join([done["verdict"], *(["; ".join(reasons)] if reasons else [])])
 
 
 def run(zrlab, folder, device, name):
     """The problem with one run, or None."""
     report = folder / f"{device}.{name}.jsonl"
-    command = [zrlab, "run", name, *RUNS[name], "--device", device, "--speed", "max", "--log", "off"]
-    command += ["--format", "json", "--report", str(report)]
+    recording = folder / f"{device}.{name}.zrr"
+    command = [zrlab, "run", name, *RUNS[name], "--device", device, "--speed", "max", "--log", "debug"]
+    command += ["--format", "json", "--report", str(report), "--record", str(recording)]
     done = subprocess.run(command, capture_output=True, text=True, timeout=120, check=False)
     where = f"{device}: {name}"
     try:
-        outcome = outcome_of(json.loads(done.stdout))
+        recorded = json.loads(done.stdout)
+        found = outcome.of(recorded)
     except (ValueError, KeyError):
         return f"{where}: no report; exit status {done.returncode}: {done.stderr.strip()}"
     expected = json.loads(EXPECTED.read_text())[device].get(name, "PASS")
-    if outcome != expected:
-        return f"{where}: {outcome}, expected {expected}"
-    if done.returncode != STATUS[outcome.split(":")[0]]:
-        return f"{where}: exit status {done.returncode} with {outcome}"
-    return None
+    if found != expected:
+        return f"{where}: {found}, expected {expected}"
+    if done.returncode != outcome.status(found):
+        return f"{where}: exit status {done.returncode} with {found}"
+    problem = outcome.replay_problem(zrlab, recording, name, recorded)
+    return f"{where}: {problem}" if problem else None
 
 
 def main():

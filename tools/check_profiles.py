@@ -169,7 +169,7 @@ def main():
         for path in paths:
             path.write_text(examples[path.name])
         checked = zrlab("check", *map(str, paths))
-        if (checked.stdout, checked.returncode) != ("".join(f"{path}: a valid profile\n" for path in paths), 0):
+        if (checked.stdout, checked.returncode) != ("".join(f"{path}: valid\n" for path in paths), 0):
             problems.append((checked.stdout + checked.stderr).strip())
 
     problems += [f"{name}: not in both the gallery and {OUTCOMES.name}"

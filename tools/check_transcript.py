@@ -35,7 +35,8 @@ class Shell:
 
     def run(self, command):
         """What the command prints, and its exit status."""
-        self.process.stdin.write(f"{command}\necho \"{END}$?\"\n")
+        # Leaves $? to the next command as this one left it.
+        self.process.stdin.write(f'{command}\nstatus=$?; echo "{END}$status"; (exit "$status")\n')
         self.process.stdin.flush()
         output = ""
         for line in self.process.stdout:
@@ -105,4 +106,5 @@ def main():
     return 1 if ran == 0 or (problems and not arguments.update) else 0
 
 
-sys.exit(main())
+if __name__ == "__main__":
+    sys.exit(main())

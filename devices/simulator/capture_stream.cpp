@@ -8,6 +8,7 @@
 
 #include "devices/simulator/due_time.h"
 #include "devices/simulator/frame_metadata.h"
+#include "devices/written_handlers.h"
 
 namespace simulator {
 
@@ -24,24 +25,6 @@ constexpr double kHighestRate = 1000;
 
 std::uint64_t microsecondsAt(std::uint64_t frame, double rate) {
     return static_cast<std::uint64_t>(std::llround(static_cast<double>(frame) * 1e6 / rate));
-}
-
-// Null for none and for an empty one.
-template <class Handler>
-const Handler* handlerIn(const Value& handlers, std::string_view key) {
-    const Value& value = handlers[kRylCaptureStreamVideoOutputID_PrimaryScaler][key];
-    const auto* handler = value.object<Handler>();
-    return handler != nullptr && *handler ? handler : nullptr;
-}
-
-const WLRylFrameHandler* frameHandlerIn(const Value& handlers) {
-    return handlerIn<WLRylFrameHandler>(handlers,
-                                        kRylCaptureStreamVideoOutputHandlerKey_PixelBufferHandler);
-}
-
-const WLRylEventHandler* eventHandlerIn(const Value& handlers) {
-    return handlerIn<WLRylEventHandler>(handlers,
-                                        kRylCaptureStreamVideoOutputHandlerKey_EventHandler);
 }
 
 // The rate that was written, within what the sensor can do.
@@ -96,7 +79,8 @@ bool SimulatedStream::start(platform::ErrorSlot error) {
     const MutexLock lock(_mutex);
     const Value* handlers = _properties.find(kRylCaptureStreamProperty_VideoOutputHandlers);
     const Value* rate = _properties.find(kRylCaptureStreamProperty_MaximumFrameRate);
-    if (_state == State::Running || handlers == nullptr || frameHandlerIn(*handlers) == nullptr) {
+    if (_state == State::Running || handlers == nullptr ||
+        devices::frameHandlerIn(*handlers) == nullptr) {
         return false;
     }
     std::thread([self = shared_from_this(), run = ++_run, rate = sensorRate(rate)] {
@@ -220,13 +204,13 @@ void SimulatedStream::_handOver(std::uint64_t frame, std::uint64_t microseconds)
     for (const FrameEvent& event : _profile.events) {
         if (event.frame == frame) {
             const Value handlers = _handlers();
-            if (const auto* handler = eventHandlerIn(handlers)) {
+            if (const auto* handler = devices::eventHandlerIn(handlers)) {
                 (*handler)(event.code, time, event.info);
             }
         }
     }
     const Value handlers = _handlers();
-    const auto* handler = frameHandlerIn(handlers);
+    const auto* handler = devices::frameHandlerIn(handlers);
     if (handler == nullptr || isDropped(_profile, frame)) {
         return;
     }

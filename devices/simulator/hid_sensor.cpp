@@ -1,6 +1,5 @@
 #include "devices/simulator/hid_sensor.h"
 
-#include <algorithm>
 #include <chrono>
 #include <deque>
 #include <set>
@@ -12,6 +11,7 @@
 
 #include "devices/simulator/due_time.h"
 #include "devices/simulator/image_report.h"
+#include "devices/usage_match.h"
 #include "platform/number.h"
 #include "platform/sync.h"
 
@@ -286,23 +286,6 @@ void Sensor::_deliverOne(const DeliveryRef& delivery) {
     }
 }
 
-bool hasEntry(const HidDeviceProfile& device, std::string_view key, const platform::Value& value) {
-    const platform::Number number = value.asNumber();
-    if (!number.isPresent()) {
-        return false;
-    }
-    const auto wanted = number.as<std::int64_t>();
-    return (key == platform::kHidPrimaryUsagePage && wanted == device.usagePage) ||
-           (key == platform::kHidPrimaryUsage && wanted == device.usage);
-}
-
-bool matches(const HidDeviceProfile& device, const platform::Dictionary& matching) {
-    const auto& entries = matching.entries();
-    return std::all_of(entries.begin(), entries.end(), [&device](const auto& entry) {
-        return hasEntry(device, entry.first, entry.second);
-    });
-}
-
 // What a facility and its managers share.
 struct Bus {
     const HidProfile profile;
@@ -317,9 +300,7 @@ class SimulatedManager final : public WLHIDManager {
     void enumerateDevicesMatching(const std::vector<platform::Dictionary>& matching) override {
         _devices.clear();
         for (const HidDeviceProfile& device : _bus->profile.devices) {
-            if (std::any_of(matching.begin(), matching.end(), [&device](const auto& dictionary) {
-                    return matches(device, dictionary);
-                })) {
+            if (devices::matchesAny(device.usagePage, device.usage, matching)) {
                 _devices.push_back(std::make_shared<Sensor>(device, _bus->speed)->makeHandle());
             }
         }

@@ -1,11 +1,13 @@
 #include "devices/simulator/kind.h"
 
+#include <memory>
 #include <optional>
 #include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "devices/simulator/device.h"
+#include "devices/simulator/profile/profile_faults.h"
 #include "devices/simulator/profile/reader.h"
 #include "devices/simulator/profile/writer.h"
 
@@ -35,22 +37,40 @@ DeviceProfile loadOrThrow(const std::string& what) {
     return *std::move(profile);
 }
 
-devices::Device openProfile(const devices::Request& request) {
-    const DeviceProfile profile = loadOrThrow(request.what);
+devices::Device deviceOf(const DeviceProfile& profile, double speed) {
     return {.name = profile.name,
             .summary = profile.summary,
             .facts = {{"platform", "simulated device"}},
-            .services = makeDevice(profile, request.speed)};
+            .services = makeDevice(profile, speed)};
+}
+
+devices::Device openProfile(const devices::Request& request) {
+    return deviceOf(loadOrThrow(request.what), request.speed);
+}
+
+std::vector<devices::DataFault> listFaults(const std::string& what) {
+    const auto profile = std::make_shared<const DeviceProfile>(loadOrThrow(what));
+    std::vector<devices::DataFault> faults;
+    for (const ProfileFault& fault : profileFaults(*profile)) {
+        faults.push_back({.group = std::string(fault.group),
+                          .kind = std::string(fault.kind),
+                          .subject = fault.subject,
+                          .service = std::string(fault.service),
+                          .open = [profile, fault](double speed) {
+                              return deviceOf(withFault(*profile, fault), speed);
+                          }});
+    }
+    return faults;
 }
 
 std::string showProfile(const std::string& what) {
     return profileText(loadOrThrow(what));
 }
 
-std::vector<std::string> checkProfile(const std::string& what) {
-    std::vector<std::string> problems;
-    load(what, problems);
-    return problems;
+devices::Findings checkProfile(const std::string& what) {
+    devices::Findings findings;
+    load(what, findings.problems);
+    return findings;
 }
 
 }  // namespace
@@ -63,7 +83,8 @@ devices::Kind kind() {
             .list = listGallery,
             .open = openProfile,
             .show = showProfile,
-            .check = checkProfile};
+            .check = checkProfile,
+            .dataFaults = listFaults};
 }
 
 }  // namespace simulator

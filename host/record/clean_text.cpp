@@ -73,4 +73,9 @@ std::string plainLine(std::string_view text) {
     return line;
 }
 
+std::size_t widthOf(std::string_view text) {
+    return static_cast<std::size_t>(
+        std::count_if(text.begin(), text.end(), [](char c) { return (c & 0xC0) != 0x80; }));
+}
+
 }  // namespace host

@@ -2,6 +2,7 @@
 #ifndef ZR_HOST_RECORD_CLEAN_TEXT_H
 #define ZR_HOST_RECORD_CLEAN_TEXT_H
 
+#include <cstddef>
 #include <string>
 #include <string_view>
 
@@ -16,6 +17,9 @@ std::string htmlText(std::string_view text);
 
 // The text in one line that cannot control a terminal: every control character becomes a question mark.
 std::string plainLine(std::string_view text);
+
+// How many characters of a terminal the UTF-8 text takes, near enough: its code points.
+std::size_t widthOf(std::string_view text);
 
 }  // namespace host
 

@@ -194,10 +194,29 @@ const std::vector<FrameSeries>& frameSeries() {
     return kAll;
 }
 
+platform::Date after(const platform::Date& date, double seconds) {
+    return platform::Date(date.moment() +
+                          std::chrono::duration_cast<std::chrono::system_clock::duration>(
+                              std::chrono::duration<double>(seconds)));
+}
+
 }  // namespace
+
+platform::Date JsonlReport::_time() const {
+    return _past.has_value() ? *_past : platform::Date::now();
+}
+
+void JsonlReport::_passTo(const platform::Date& time) {
+    if (_past.has_value() && time.moment() > _past->moment()) {
+        _past = time;
+    }
+}
 
 void JsonlReport::sessionStarted(const SessionRecord& session) {
     const platform::MutexLock lock(_mutex);
+    if (!session.runs.empty()) {
+        _past = session.started;
+    }
     _writeRun("testRunStart", {{"name", "zrlab"},
                                {"version", session.version},
                                {"commandLine", session.commandLine},
@@ -209,6 +228,7 @@ void JsonlReport::sessionStarted(const SessionRecord& session) {
 void JsonlReport::runStarted(const RunRecord& run) {
     const platform::MutexLock lock(_mutex);
     _runStarted = run.started;
+    _passTo(run.started);
     _failuresWritten = 0;
 }
 
@@ -235,6 +255,7 @@ void JsonlReport::logged(const LogRecord& line) {
     if (_ended) {
         return;
     }
+    _passTo(line.time);
     Json content{{"severity", severityText(line.level)}, {"message", line.message}};
     if (line.late) {
         // Not into the step that is open, which belongs to another run.
@@ -247,6 +268,8 @@ void JsonlReport::logged(const LogRecord& line) {
 
 void JsonlReport::partEnded(const RunRecord& run, Part part) {
     const platform::MutexLock lock(_mutex);
+    _passTo(after(run.started, run.experimentSeconds +
+                                   (part == Part::Analysis ? run.analysisSeconds.value_or(0) : 0)));
     _writePart(run, part);
 }
 
@@ -283,6 +306,7 @@ void JsonlReport::_writePart(const RunRecord& run, Part part) {
 
 void JsonlReport::runEnded(const RunRecord& run) {
     const platform::MutexLock lock(_mutex);
+    _passTo(after(run.started, run.seconds));
     // A part that was given up has not ended; what it had found until then is in the record.
     if (_part.has_value()) {
         _writePart(run, *_part);
@@ -324,8 +348,7 @@ void JsonlReport::_write(std::string_view kind, Json artifact) {
     if (_sequenceNumber == 0 && kind != "schemaVersion") {
         _write("schemaVersion", {{"major", 2}, {"minor", 0}});
     }
-    Json line{{"sequenceNumber", _sequenceNumber++},
-              {"timestamp", platform::Date::now().timestamp()}};
+    Json line{{"sequenceNumber", _sequenceNumber++}, {"timestamp", _time().timestamp()}};
     line[kind] = std::move(artifact);
     _unwritten += textOf(line) + "\n";
     _flush();
@@ -402,12 +425,8 @@ void JsonlReport::framesDelivered(const FrameBatch& batch) {
 
 // There are ten lines per frame, so they are made without a tree of values, and written together.
 void JsonlReport::_writeFrame(const FrameRecord& frame) {
-    const std::string now = platform::Date::now().timestamp();
-    const std::chrono::duration<double> sinceStart(frame.delivered);
-    const std::string delivered =
-        platform::Date(_runStarted.moment() +
-                       std::chrono::duration_cast<std::chrono::system_clock::duration>(sinceStart))
-            .timestamp();
+    const std::string now = _time().timestamp();
+    const std::string delivered = after(_runStarted, frame.delivered).timestamp();
     std::string metadata = fmt::format(R"({{"frame":{})", frame.number);
     if (isNumberedApart(frame)) {
         metadata += fmt::format(R"(,"sensorFrame":{})", *frame.sensorNumber);

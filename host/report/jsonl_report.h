@@ -20,6 +20,8 @@
 //                  "NAME-interrupted"
 //   log            in the step that is open; in the run between steps, and for a line that came when its
 //                  run had ended
+// A timestamp is when the artifact is written. Of a session that was over when it began to be told, a stored run,
+// it is when that happened: the start or end of the part or the run, the time of the log line before it.
 // A name that was not started has one step, which ends with the status SKIP.
 // Numbers are written as host/report/json_value.h says.
 #ifndef ZR_HOST_REPORT_JSONL_REPORT_H
@@ -61,6 +63,9 @@ class JsonlReport final : public RunListener {
   private:
     using Json = nlohmann::ordered_json;
 
+    // Now; of a session that is over when it is told, what is told of then.
+    platform::Date _time() const ZR_REQUIRES(_mutex);
+    void _passTo(const platform::Date& time) ZR_REQUIRES(_mutex);
     void _write(std::string_view kind, Json artifact) ZR_REQUIRES(_mutex);
     void _writeRun(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
     void _writeStep(std::string_view kind, Json content) ZR_REQUIRES(_mutex);
@@ -91,6 +96,7 @@ class JsonlReport final : public RunListener {
     bool _stepFailed ZR_GUARDED_BY(_mutex) = false;
     // The part that has started and not ended.
     std::optional<Part> _part ZR_GUARDED_BY(_mutex);
+    std::optional<platform::Date> _past ZR_GUARDED_BY(_mutex);  // of a session that is over
     platform::Date _runStarted ZR_GUARDED_BY(_mutex) = platform::Date::now();
     // Of the frames of the run's experiment: its step as JSON text, the number of its first series, the
     // elements in each series so far, and the last frame written.

@@ -185,6 +185,15 @@ ParameterSetting readSetting(std::string_view text) {
     return setting;
 }
 
+std::vector<ParameterSetting> readSettings(const std::vector<std::string>& texts) {
+    std::vector<ParameterSetting> settings;
+    settings.reserve(texts.size());
+    for (const std::string& text : texts) {
+        settings.push_back(readSetting(text));
+    }
+    return settings;
+}
+
 std::vector<RunPlan> planRuns(const ZRLab& lab,
                               const std::vector<std::string>& names,
                               const std::vector<ParameterSetting>& settings) {

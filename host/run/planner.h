@@ -25,6 +25,7 @@ struct ParameterSetting {
 // decimal or an exponent a double, true and false a boolean. Throws a Problem (kExitUsage) when it is
 // not one.
 ParameterSetting readSetting(std::string_view text);
+std::vector<ParameterSetting> readSettings(const std::vector<std::string>& texts);
 
 // Plans a run for each name: a diagnostic, or an experiment on its own. Every part gets the settings that
 // it declares: one for that part over one for every part, then a later one over an earlier. Throws a

@@ -1,4 +1,4 @@
-// Store: runs in a database: of a file (SQLite), or of a server once an engine for one is installed.
+// Store: runs in a database: a file (SQLite) or one of a server (PostgreSQL).
 #ifndef ZR_HOST_STORE_STORE_H
 #define ZR_HOST_STORE_STORE_H
 

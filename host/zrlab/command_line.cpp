@@ -11,9 +11,11 @@
 
 #include <fmt/format.h>
 
+#include "host/campaign/campaign_forms.h"
 #include "host/record/mask_passwords.h"
 #include "host/record/problem.h"
 #include "host/report/report_forms.h"
+#include "host/results/questions.h"
 #include "host/zrlab/default_plugin.h"
 #include "host/zrlab/file_template.h"
 #include "host/zrlab/identity_options.h"
@@ -78,6 +80,10 @@ constexpr std::string_view kRunExamples = R"(Examples:
       Say which unit it is, and name the report after it.
   zrlab run VantorMeterixDiagnostic --unit SN-7 --store runs.db
       Also keep the run in a database.
+  zrlab run VantorFaultDiagnostic --set frameCount=90 --set timeout=10 --record failure.zrr
+      Also record what the device gives.
+  zrlab run VantorFaultDiagnostic --device replay:failure.zrr
+      Run it again on the recording, with the same parameters.
   zrlab run VantorMeterixDiagnostic --device-module ./board.so --device board:rev-b
       Run on a device of a kind that a device module registers.
 
@@ -116,6 +122,23 @@ std::string settingsLines() {
            "\n  {{ and }} stand for braces\n\n"
            "Options can also come from variables such as ZRLAB_UNIT and ZRLAB_UNTIL_FAIL, and\n"
            "from the settings files that \"zrlab settings\" lists.\n";
+}
+
+// The form of a command's answer, and the file that gets it.
+void addAnswerForm(CLI::App& command,
+                   const std::vector<std::string>& forms,
+                   std::string& format,
+                   std::string& output) {
+    command
+        .add_option("--format", format,
+                    "Form of the answer; without it the form of the --output, or text")
+        ->type_name(joined(forms, "|"))
+        ->check(oneOf(forms));
+    command
+        .add_option("--output", output,
+                    "Write the answer to this file, whole or not at all;\n- is standard output")
+        ->type_name("FILE")
+        ->check(notEmpty());
 }
 
 // Which of `names` was meant by a word, or where the commands or options behind `path` are listed.
@@ -195,6 +218,9 @@ CommandLine::CommandLine()
     _addPlugin(*describe);
 
     _addRun();
+    _addCampaign();
+    _addConformance();
+    _addResults();
 
     CLI::App* devices = _app.add_subcommand("devices", "List the devices that a run can use");
     CLI::Option* names = devices->add_flag("--names", namesOnly, "Only the names, one per line");
@@ -214,6 +240,20 @@ CommandLine::CommandLine()
     device->footer(
         "Examples:\n  zrlab device show counter-stuck > mine.json\n"
         "  zrlab device check ./mine.json");
+
+    CLI::App* recording = _app.add_subcommand(
+        "recording", "Show what a recording holds, or make a device profile of it");
+    recording->add_option("ACTION", action, "Show the recording, or print a device profile")
+        ->required()
+        ->type_name("show|profile")
+        ->check(oneOf({"show", "profile"}));
+    recording->add_option("FILE", recordingFile, "What --record wrote")
+        ->required()
+        ->type_name("")
+        ->check(notEmpty());
+    recording->footer(
+        "Examples:\n  zrlab recording show failure.zrr\n"
+        "  zrlab recording profile failure.zrr > failure.json");
 
     _addStoreCommand();
 
@@ -261,13 +301,17 @@ void CommandLine::_addDeviceModule(CLI::App& command) {
         ->allow_extra_args(false);
 }
 
-void CommandLine::_addLimitsAndTables(CLI::App& run) {
-    run.add_option(
-           "--limits", session.limits,
-           "Also judge by the limits of this file;\nbounds on what the module records and does "
-           "not judge,\npart of the verdict where the file says so")
+void CommandLine::_addLimits(CLI::App& command) {
+    command
+        .add_option(
+            "--limits", session.limits,
+            "Also judge by the limits of this file;\nbounds on what the module records and does "
+            "not judge,\npart of the verdict where the file says so")
         ->type_name("FILE")
         ->check(notEmpty());
+}
+
+void CommandLine::_addTables(CLI::App& run) {
     run.add_option("--frames", session.frames,
                    "Write every frame and event to this file as they come: .csv or .jsonl")
         ->type_name("FILE")
@@ -281,7 +325,8 @@ void CommandLine::_addLimitsAndTables(CLI::App& run) {
 void CommandLine::_addStore(CLI::App& command) {
     command
         .add_option("--store", session.store,
-                    "The store of runs: the file of a database,\nmade when there is none")
+                    "The store of runs: the file of a database,\nmade when there is none, or "
+                    "postgresql://...")
         ->type_name("WHERE")
         ->check(notEmpty());
 }
@@ -299,52 +344,90 @@ void CommandLine::_addStoreCommand() {
     store->footer("Examples:\n  zrlab store show --store runs.db\n  zrlab store sync");
 }
 
+void CommandLine::_addSettings(CLI::App& command) {
+    command
+        .add_option(
+            "--set", session.settings,
+            "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
+            "analysis:PARAM=VALUE\ngives it to one part only. VALUE is a number, true or false;\n"
+            "a count that is not whole or a negative time-out gets a warning")
+        ->type_name("PARAM=VALUE")
+        ->check(notEmpty())
+        ->take_all()
+        ->allow_extra_args(false);
+}
+
+// `speed` is the usual one.
+void CommandLine::_addDevice(CLI::App& command, std::string_view speed) {
+    command
+        .add_option("--device", session.device.device,
+                    "The device: one that \"zrlab devices\" lists, a file of a simulated one, or\n"
+                    "KIND:WHAT for another kind")
+        ->type_name("DEVICE|FILE|KIND:WHAT")
+        ->check(notEmpty())
+        ->capture_default_str();
+    _addDeviceModule(command);
+    command
+        .add_option(
+            "--speed", session.device.speed,
+            "Simulated seconds per real second: 0.001 to 100, or max;\ntime-outs stay those "
+            "of real time")
+        ->type_name("FACTOR|max")
+        ->check(notEmpty())
+        ->default_str(std::string(speed));
+}
+
+void CommandLine::_addReports(CLI::App& command) {
+    const std::vector<std::string> formats = reportFormNames();
+    command.add_option("--format", session.format, "Form of the report")
+        ->check(oneOf(formats))
+        ->type_name(joined(formats, "|"))
+        ->capture_default_str();
+    command
+        .add_option("--output", session.output,
+                    "Write the report to this file, whole or not at all;\n- is standard output")
+        ->type_name("FILE")
+        ->check(notEmpty());
+    command
+        .add_option(
+            "--report", session.reports,
+            "Write a further report; its ending gives the form:\n" + joined(reportEndings(), ", "))
+        ->type_name("FILE")
+        ->check(notEmpty())
+        ->take_all()
+        ->allow_extra_args(false);
+}
+
+void CommandLine::_addTextStyle(CLI::App& command) {
+    command.add_flag("-v,--verbose", session.verbose, "Show what the text report folds")
+        ->disable_flag_override();
+    command.add_option("--color", "Colour in the text report")
+        ->type_name("auto|always|never")
+        ->default_str("auto")
+        ->each([this](const std::string& value) {
+            session.colour = value == "always"  ? Colour::Always
+                             : value == "never" ? Colour::Never
+                                                : Colour::Automatic;
+        })
+        ->check(oneOf({"auto", "always", "never"}));
+}
+
 void CommandLine::_addRun() {
     CLI::App& run = *_app.add_subcommand("run", "Run diagnostics or experiments and report");
     _run = &run;
     run.add_option("NAME", session.names, "What to run: diagnostics or experiments, in this order")
         ->required()
         ->type_name("");
-    run.add_option(
-           "--set", session.settings,
-           "Give a parameter to every part that declares it;\nexperiment:PARAM=VALUE or "
-           "analysis:PARAM=VALUE\ngives it to one part only. VALUE is a number, true or false;\n"
-           "a count that is not whole or a negative time-out gets a warning")
-        ->type_name("PARAM=VALUE")
-        ->check(notEmpty())
-        ->take_all()
-        ->allow_extra_args(false);
-    run.add_option("--device", session.device.device,
-                   "The device: one that \"zrlab devices\" lists, a file of a simulated one, or\n"
-                   "KIND:WHAT for another kind")
-        ->type_name("DEVICE|FILE|KIND:WHAT")
-        ->check(notEmpty())
-        ->capture_default_str();
-    _addDeviceModule(run);
-    run.add_option("--speed", session.device.speed,
-                   "Simulated seconds per real second: 0.001 to 100, or max;\ntime-outs stay those "
-                   "of real time")
-        ->type_name("FACTOR|max")
-        ->check(notEmpty())
-        ->default_str("1");
+    _addSettings(run);
+    _addDevice(run, "1");
     addIdentityOptions(run, session.identity, _metadata);
-    const std::vector<std::string> formats = reportFormNames();
-    run.add_option("--format", session.format, "Form of the report")
-        ->check(oneOf(formats))
-        ->type_name(joined(formats, "|"))
-        ->capture_default_str();
-    run.add_option("--output", session.output,
-                   "Write the report to this file, whole or not at all;\n- is standard output")
+    _addReports(run);
+    _addLimits(run);
+    _addTables(run);
+    run.add_option("--record", session.record,
+                   "Record the device to this file; --device replay:FILE\nplays it back")
         ->type_name("FILE")
         ->check(notEmpty());
-    run.add_option(
-           "--report", session.reports,
-           "Write a further report; its ending gives the form:\n" + joined(reportEndings(), ", "))
-        ->type_name("FILE")
-        ->check(notEmpty())
-        ->take_all()
-        ->allow_extra_args(false);
-    _addLimitsAndTables(run);
     _addStore(run);
     run.add_flag("--store-frames", session.storeFrames, "Store the frames of each run too")
         ->disable_flag_override();
@@ -356,23 +439,135 @@ void CommandLine::_addRun() {
     run.add_flag("--until-fail", session.untilFail,
                  "Repeat until a run does not pass; with --repeat at most N times")
         ->disable_flag_override();
-    run.add_flag("-v,--verbose", session.verbose, "Show what the text report folds")
-        ->disable_flag_override();
-    run.add_option("--color", "Colour in the text report")
-        ->type_name("auto|always|never")
-        ->default_str("auto")
-        ->each([this](const std::string& value) {
-            session.colour = value == "always"  ? Colour::Always
-                             : value == "never" ? Colour::Never
-                                                : Colour::Automatic;
-        })
-        ->check(oneOf({"auto", "always", "never"}));
+    _addTextStyle(run);
     run.add_option("--log", session.logLevel, "Lowest level of log lines on standard error")
         ->check(oneOf({"debug", "default", "error", "off"}))
         ->type_name("debug|default|error|off")
         ->capture_default_str();
     _addPlugin(run);
     run.footer(formLines() + "\n" + settingsLines() + "\n" + std::string(kRunExamples));
+}
+
+void CommandLine::_addConformance() {
+    CLI::App& command = *_app.add_subcommand(
+        "conformance", "Check that a device keeps the promises of its interfaces");
+    command
+        .add_option("SERVICE", session.names,
+                    "What to check: meterix, display, hid or capture; without it each service\n"
+                    "that the device has")
+        ->type_name("");
+    _addDevice(command, "1");
+    addIdentityOptions(command, session.identity, _metadata);
+    _addReports(command);
+    _addTextStyle(command);
+    command.footer(
+        formLines() +
+        "\nExamples:\n  zrlab conformance --device-module ./board.so --device board:rev-b\n"
+        "  zrlab conformance hid --device replay:failure.zrr --report conformance.html");
+}
+
+void CommandLine::_addCampaign() {
+    CLI::App& command = *_app.add_subcommand(
+        "campaign", "Give a device one fault at a time and show which ones are caught");
+    command
+        .add_option("NAME", session.names,
+                    "What to run on each fault; without it every diagnostic, and every\n"
+                    "experiment that is no part of one")
+        ->type_name("");
+    _addSettings(command);
+    _addDevice(command, "max");
+    _addLimits(command);
+    command
+        .add_option("--jobs", campaign.jobs, "Runs at a time; without it two for each processor")
+        ->type_name("N")
+        ->check(wholeNumber(1, 1000));
+    std::vector<std::string> forms;
+    for (const CampaignForm& form : campaignForms()) {
+        forms.emplace_back(form.name);
+    }
+    addAnswerForm(command, forms, campaign.format, campaign.output);
+    _addPlugin(command);
+    command.footer(
+        "Counts and time-outs have small values unless they are set.\n\n"
+        "Examples:\n  zrlab campaign --output faults.html\n"
+        "  zrlab campaign VantorFaultDiagnostic --limits limits/coverage.json");
+}
+
+// A command for each question, and one that shows a run.
+void CommandLine::_addResults() {
+    CLI::App& all =
+        *_app.add_subcommand("results", "Ask a store of runs: yields, failures, spreads, trends");
+    all.require_subcommand(1);
+    const auto add = [&](const std::string& name, const std::string& summary,
+                         const std::vector<std::string>& forms) {
+        CLI::App& command = *all.add_subcommand(name, summary);
+        command.callback([this, name] { results.question = name; });
+        command
+            .add_option("--store", results.store,
+                        "The store to ask: the file of a database,\nor postgresql://...")
+            ->type_name("WHERE")
+            ->check(notEmpty());
+        addAnswerForm(command, forms, results.format, results.output);
+        return &command;
+    };
+    const auto addText = [](CLI::App& command, const char* option, std::string& text,
+                            const char* summary, const char* type) {
+        command.add_option(option, text, summary)->type_name(type)->check(notEmpty());
+    };
+    for (const Question& question : questions()) {
+        CLI::App& command = *add(std::string(question.name), std::string(question.summary),
+                                 answerFormNames(question));
+        Asked& asked = results.asked;
+        if (!question.subject.empty()) {
+            command
+                .add_option(std::string(question.subject), asked.subject,
+                            std::string(question.subjectSummary))
+                ->required()
+                ->type_name("")
+                ->check(notEmpty());
+        }
+        addText(command, "--since", results.since,
+                "Only runs that started at this time (UTC) or later:\n2026-11-25, \"2026-11-25 "
+                "14:30\", or a time ago: 90m, 12h, 7d, 2w",
+                "TIME");
+        addText(command, "--until", results.until,
+                "Only runs that started before this time; of a date,\nbefore its end", "TIME");
+        addText(command, "--station", asked.filter.station, "Only runs of this station", "STATION");
+        addText(command, "--part", asked.filter.part, "Only runs of units of this part number",
+                "PART");
+        addText(command, "--lot", asked.filter.lot, "Only runs of units of this lot", "LOT");
+        addText(command, "--diagnostic", asked.filter.diagnostic,
+                "Only runs of this diagnostic or experiment", "DIAGNOSTIC");
+        addText(command, "--program-version", asked.filter.version,
+                "Only runs of this version of zrlab", "VERSION");
+        if (question.takesBy) {
+            const std::vector<std::string> groups(yieldGroups().begin(), yieldGroups().end());
+            command.add_option("--by", asked.by, "A row for each of these, beside the diagnostic")
+                ->type_name(joined(groups, "|"))
+                ->check(oneOf(groups))
+                ->capture_default_str();
+        }
+        if (question.takesMeasurements) {
+            command
+                .add_flag("--measurements", asked.measurements,
+                          "Compare the means of measurements instead of the yields")
+                ->disable_flag_override();
+        }
+        if (question.limit >= 0) {
+            command.add_option("--limit", results.limit, "Rows at most")
+                ->type_name("N")
+                ->check(wholeNumber(1, 1'000'000'000))
+                ->default_str(question.limit > 0 ? fmt::to_string(question.limit) : "");
+        }
+    }
+    CLI::App& show = *add("show", "Show a stored run in any form of report", reportFormNames());
+    addText(show, "UUID", results.asked.subject,
+            "The run's UUID, or a beginning that no other run has", "");
+    show.get_option("UUID")->required();
+    all.footer(
+        "Examples:\n  zrlab results yield --store runs.db --since 7d --by station\n"
+        "  zrlab results pareto --store runs.db --output pareto.html\n"
+        "  zrlab results show 019abcde --store runs.db --format junit");
 }
 
 std::string CommandLine::_explain(const CLI::ParseError& error,
@@ -399,8 +594,9 @@ std::string CommandLine::_explain(const CLI::ParseError& error,
                       meantBy(argument, commandNames(*given), path));
         }
     }
-    if (given == &_app) {
-        return "no command given; zrlab --help lists them";
+    if (!given->get_subcommands({}).empty()) {
+        return in(fmt::format("no command given; zrlab {}{}--help lists them", path,
+                              path.empty() ? "" : " "));
     }
     if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ExtrasError)) {
         return in(
@@ -415,6 +611,7 @@ std::optional<std::string> CommandLine::read(int count, const char* const* argum
         session.commandLine += at > 0 ? " " + maskPasswords(arguments[at]) : "zrlab";
     }
     session.version = ZR_VERSION;
+    results.asked.commandLine = session.commandLine;
     try {
         _app.parse(count, arguments);
     } catch (const CLI::Success& success) {
@@ -431,6 +628,21 @@ std::optional<std::string> CommandLine::read(int count, const char* const* argum
 // Every command that has options of `run`: those that load a module take the modules from the settings too.
 void CommandLine::_takeSettings() {
     CLI::App& given = *_app.get_subcommands().front();
+    if (given.get_name() == "results") {
+        // Other options of run have the names of filters here.
+        Settings(*_run, processEnvironment())
+            .fill(*given.get_subcommands().front()->get_option("--store"));
+        return;
+    }
+    if (given.get_name() == "campaign") {
+        // What is run, and on what; the form of its answer is none of run's.
+        Settings settings(*_run, processEnvironment());
+        for (const char* option :
+             {"--set", "--device", "--device-module", "--speed", "--limits", "--plugin"}) {
+            settings.fill(*given.get_option(option));
+        }
+        return;
+    }
     CLI::App& command = given.get_name() == "settings" ? *_run : given;
     const auto options = std::as_const(command).get_options();
     if (std::any_of(options.begin(), options.end(), [this](const CLI::Option* option) {

@@ -6,10 +6,13 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include <CLI/CLI.hpp>
 
+#include "host/zrlab/campaign_command.h"
+#include "host/zrlab/results_command.h"
 #include "host/zrlab/session_options.h"
 #include "host/zrlab/settings.h"
 
@@ -36,19 +39,30 @@ class CommandLine {
 
     std::string plugin;                 // the module to load
     std::vector<std::string> subjects;  // of describe and device
-    std::string action;                 // of device and store
+    std::string action;                 // of device, recording and store
     bool limits = false;                // of describe
     bool namesOnly = false;             // of list and devices
     bool kindsOnly = false;             // of devices
+    std::string recordingFile;          // of recording
     std::string helpTopic;              // of help
     std::string shell;                  // of completion
-    SessionOptions session;             // of run
+    SessionOptions session;             // of run, campaign and conformance
+    CampaignOptions campaign;           // of campaign
+    ResultsOptions results;             // of results
 
   private:
     void _addRun();
-    void _addLimitsAndTables(CLI::App& run);
+    void _addCampaign();
+    void _addConformance();
+    void _addReports(CLI::App& command);
+    void _addTextStyle(CLI::App& command);
+    void _addDevice(CLI::App& command, std::string_view speed);
+    void _addSettings(CLI::App& command);
+    void _addLimits(CLI::App& command);
+    void _addTables(CLI::App& run);
     void _addStore(CLI::App& command);
     void _addStoreCommand();
+    void _addResults();
     void _addPlugin(CLI::App& command);
     void _addDeviceModule(CLI::App& command);
     void _takeSettings();

@@ -213,7 +213,7 @@ class Answer {
         std::string_view placeholder;
         void (Answer::*offer)();
     };
-    static const Source kSources[7];
+    static const Source kSources[8];
 
     const Line& _line;
     const std::string _prefix;
@@ -228,6 +228,7 @@ const Answer::Source Answer::kSources[] = {
     {"PARAM=VALUE", &Answer::_offerParameters},
     {"FILE", &Answer::_offerAnyFile},
     {"PATH", &Answer::_offerAnyFile},
+    {"WHERE", &Answer::_offerAnyFile},
 };
 
 }  // namespace

@@ -8,17 +8,13 @@
 
 #include <fmt/format.h>
 
-#include "devices/observed/observe.h"
 #include "host/record/clean_text.h"
 #include "host/record/problem.h"
 #include "host/record/run_text.h"
+#include "host/run/lone_run.h"
 #include "host/run/planner.h"
-#include "host/run/run_recorder.h"
-#include "host/run/sequence.h"
 #include "host/zrlab/device_choice.h"
 #include "input/nearest.h"
-#include "platform/log.h"
-#include "platform/services.h"
 
 namespace host {
 
@@ -76,21 +72,14 @@ RunPlan leastPlan(const ZRLab& lab, const std::string& name) {
     return planRuns(lab, {name}, settings).front();
 }
 
-RunRecord runOnHealthy(const ZRLab& lab, const RunPlan& plan) {
-    const auto recorder = std::make_shared<RunRecorder>([](const LogRecord&) {}, false);
-    platform::setLogSink(recorder, platform::LogLevel::Error);
-    devices::Device device = openDevice({.device = "healthy", .speed = "max", .modules = {}});
-    platform::installServices(observed::observe(std::move(device.services), recorder));
-    return runOnce({.lab = lab, .recorder = *recorder, .listeners = {}}, plan, 1).run;
-}
-
 std::string limitLines(const ZRLab& lab, const std::string& name) {
     const std::string runnable = runnableWith(lab, name);
     if (runnable.empty()) {
         return "results are not known: no diagnostic has this part\n";
     }
     const RunPlan plan = leastPlan(lab, runnable);
-    const RunRecord run = runOnHealthy(lab, plan);
+    const RunRecord run =
+        runAlone(openDevice({.device = "healthy", .speed = "max", .modules = {}}).services, plan);
     std::string parameters;
     for (const auto& [parameter, value] : plan.experiment.parameters) {
         parameters +=

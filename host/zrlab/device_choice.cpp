@@ -6,6 +6,8 @@
 #include <stdexcept>
 #include <string_view>
 
+#include "devices/linux/kind.h"
+#include "devices/recording/kind.h"
 #include "devices/simulator/kind.h"
 #include "host/record/problem.h"
 #include "input/nearest.h"
@@ -17,7 +19,7 @@ namespace {
 // The built-in kinds. They are listed here, and not registered by initializers of their own, because the
 // linker drops an object file of a library that only an initializer would need. The first one is meant by a
 // name without a kind.
-constexpr devices::Kind (*kBuiltIn[])() = {simulator::kind};
+constexpr devices::Kind (*kBuiltIn[])() = {simulator::kind, linux_device::kind, recording::kind};
 
 // Any faster, frames could outrun their validation and results would depend on the machine's load.
 constexpr double kLeastSpeed = 0.001;
@@ -129,15 +131,34 @@ std::string deviceArgument(const DeviceChoice& choice) {
     return argumentOf(choice.device);
 }
 
+std::string deviceKind(const DeviceChoice& choice) {
+    return choice.device.substr(0, kindLength(choice.device));
+}
+
 devices::Device openDevice(const DeviceChoice& choice) {
     const devices::Kind kind = kindOf(choice.device, "--device ");
     if (choice.speed.has_value() && !kind.takesSpeed) {
         throw Problem(kExitUsage, "--speed " + *choice.speed + ": devices of the kind \"" +
                                       kind.name + "\" do not take a speed");
     }
-    const double speed = choice.speed.has_value() ? readSpeed(*choice.speed) : 1;
     const std::string what = argumentOf(choice.device);
+    const double speed = speedOf(choice);
     return answer(kind, what, [&] { return kind.open({.what = what, .speed = speed}); });
+}
+
+bool takesSpeed(const DeviceChoice& choice) {
+    return kindOf(choice.device, "--device ").takesSpeed;
+}
+
+double speedOf(const DeviceChoice& choice) {
+    return choice.speed.has_value() ? readSpeed(*choice.speed) : 1;
+}
+
+std::vector<devices::DataFault> dataFaults(const DeviceChoice& choice) {
+    const devices::Kind kind = kindOf(choice.device, "--device ");
+    const std::string what = argumentOf(choice.device);
+    return kind.dataFaults ? answer(kind, what, [&] { return kind.dataFaults(what); })
+                           : std::vector<devices::DataFault>();
 }
 
 std::string showDevice(const std::string& device) {
@@ -147,7 +168,7 @@ std::string showDevice(const std::string& device) {
     return answer(kind, what, [&] { return show(what); });
 }
 
-std::vector<std::string> checkDevice(const std::string& device) {
+devices::Findings checkDevice(const std::string& device) {
     const devices::Kind kind = kindOf(device);
     return require(kind.check, kind, device, "checked")(argumentOf(device));
 }

@@ -29,17 +29,30 @@ void loadDeviceModules(const std::vector<std::string>& files);
 // What the device is opened with: the part of `device` behind its kind. It may be the name of a file.
 std::string deviceArgument(const DeviceChoice& choice);
 
+// The name of its kind; empty when `device` names none.
+std::string deviceKind(const DeviceChoice& choice);
+
 // Opens the device. Throws a Problem: kExitUsage about an unknown kind or device, or a speed that is
 // wrong or that the kind does not take; kExitError about a device that fails.
 devices::Device openDevice(const DeviceChoice& choice);
+
+// Whether its devices can run faster or slower than real time. Throws a Problem as openDevice() does.
+bool takesSpeed(const DeviceChoice& choice);
+
+// What the device can deliver wrongly, as its kind says; nothing when the kind has no such faults. Each is opened
+// at speedOf(choice). Throws a Problem as openDevice() does.
+std::vector<devices::DataFault> dataFaults(const DeviceChoice& choice);
+
+// The speed that the choice asks for, in simulated seconds per real second.
+double speedOf(const DeviceChoice& choice);
 
 // The description of a device, as its kind shows it. Throws a Problem as openDevice() does, and kExitUsage
 // when the kind does not show its devices.
 std::string showDevice(const std::string& device);
 
-// What is wrong with a description of a device, one line for each problem; none when it is valid. Throws a
-// Problem (kExitUsage) about an unknown kind, and about one that has no descriptions.
-std::vector<std::string> checkDevice(const std::string& device);
+// What is found about a description of a device. Throws a Problem (kExitUsage) about an unknown kind, and about one
+// that has no descriptions.
+devices::Findings checkDevice(const std::string& device);
 
 // The devices that the registered kinds list, by kind. The simulator's, which come first, go without
 // their kind.

@@ -14,7 +14,8 @@ struct DeviceAnswer {
 };
 
 // "show" gives the description of the one device; "check" says of each description that it is valid, or what
-// is wrong with it: kExitUsage when one is not. Throws a Problem (kExitUsage) when more than one device is to
+// is wrong with it: kExitUsage when one is not; and what it stands for on this machine, if its kind knows: kExitFailed
+// when some of it is not there. Throws a Problem (kExitUsage) when more than one device is to
 // be shown, and as showDevice() and checkDevice() do.
 DeviceAnswer deviceCommand(const std::string& action, const std::vector<std::string>& devices);
 

@@ -12,12 +12,16 @@
 #include "host/record/problem.h"
 #include "host/run/module_loader.h"
 #include "host/run/planner.h"
+#include "host/zrlab/campaign_command.h"
 #include "host/zrlab/command_line.h"
 #include "host/zrlab/completion.h"
+#include "host/zrlab/conformance_command.h"
 #include "host/zrlab/describe.h"
 #include "host/zrlab/device_choice.h"
 #include "host/zrlab/device_command.h"
 #include "host/zrlab/interrupt.h"
+#include "host/zrlab/recording_command.h"
+#include "host/zrlab/results_command.h"
 #include "host/zrlab/session.h"
 #include "host/zrlab/store_command.h"
 #include "host/zrlab/terminal.h"
@@ -110,7 +114,8 @@ int withPlugin(const CommandLine& commandLine) {
         return print(describeText(ZRLab::defaultLab(), commandLine.subjects, commandLine.limits));
     }
     loadDeviceModules(commandLine.session.device.modules);
-    return runSession(commandLine.session);
+    return command == "campaign" ? campaignCommand(commandLine.campaign, commandLine.session)
+                                 : runSession(commandLine.session);
 }
 
 int run(int count, const char* const* arguments) {
@@ -128,11 +133,18 @@ int run(int count, const char* const* arguments) {
         loadDeviceModules(commandLine.session.device.modules);
         return commandLine.kindsOnly ? deviceKinds() : listedDevices(commandLine.namesOnly);
     }
+    if (command == "conformance") {
+        loadDeviceModules(commandLine.session.device.modules);
+        return conformanceCommand(commandLine.session);
+    }
     if (command == "device") {
         loadDeviceModules(commandLine.session.device.modules);
         const DeviceAnswer answer = deviceCommand(commandLine.action, commandLine.subjects);
         print(answer.text);
         return answer.status;
+    }
+    if (command == "recording") {
+        return print(recordingCommand(commandLine.action, commandLine.recordingFile));
     }
     if (command == "store") {
         const StoreAnswer answer = storeCommand(commandLine.action, commandLine.session.store);
@@ -144,6 +156,9 @@ int run(int count, const char* const* arguments) {
     }
     if (command == "settings") {
         return print(commandLine.settingsText());
+    }
+    if (command == "results") {
+        return print(resultsCommand(commandLine.results));
     }
     if (command == "help") {
         return help(commandLine.helpTopic);

@@ -52,6 +52,16 @@ std::string footerOf(const CLI::App& app) {
     return app.get_footer().empty() ? "" : ".PP\n.nf\n" + escaped(app.get_footer()) + "\n.fi\n";
 }
 
+// A command and those below it.
+std::string commandOf(const CLI::App& app, const std::string& path) {
+    std::string out = ".SS " + path + "\n" + escaped(app.get_description()) + ".\n" +
+                      optionsOf(app) + footerOf(app);
+    for (const CLI::App* inner : app.get_subcommands({})) {
+        out += commandOf(*inner, path + " " + inner->get_name());
+    }
+    return out;
+}
+
 }  // namespace
 
 std::string manualPage(const CLI::App& app, const std::string& version) {
@@ -62,8 +72,7 @@ std::string manualPage(const CLI::App& app, const std::string& version) {
     page += ".SH OPTIONS\n" + optionsOf(app);
     page += ".SH COMMANDS\n";
     for (const CLI::App* command : app.get_subcommands({})) {
-        page += ".SS zrlab " + command->get_name() + "\n" + escaped(command->get_description()) +
-                ".\n" + optionsOf(*command) + footerOf(*command);
+        page += commandOf(*command, "zrlab " + command->get_name());
     }
     page += ".SH EXAMPLES\n" + footerOf(app);
     return page;

@@ -25,6 +25,7 @@
 #include "host/store/store_listener.h"
 #include "host/zrlab/interrupt.h"
 #include "host/zrlab/progress.h"
+#include "host/zrlab/recording_session.h"
 #include "host/zrlab/session_reports.h"
 #include "host/zrlab/terminal.h"
 
@@ -60,21 +61,17 @@ void showLine(const LogRecord& line) {
         line.message);
 }
 
-std::vector<RunPlan> plansOf(const SessionOptions& options) {
-    std::vector<ParameterSetting> settings;
-    for (const std::string& text : options.settings) {
-        settings.push_back(readSetting(text));
-    }
-    return planRuns(ZRLab::defaultLab(), options.names, settings);
-}
-
 class Session {
   public:
     explicit Session(const SessionOptions& options) : _options(options) {
         _record.version = options.version;
         _record.commandLine = options.commandLine;
         _record.identity = options.identity;
-        _record.planned = plansOf(options);
+        const RecordedSession recorded = recordedSession(options.device);
+        const auto parameters = withRecorded(options.settings, recorded, options.names);
+        _record.planned = planRuns(ZRLab::defaultLab(), options.names, readSettings(parameters));
+        requireRecorded(options.names, recorded, options.device);
+        _warnings = recorded.warnings;
         if (!options.limits.empty()) {
             _judge = std::make_shared<BenchJudge>(
                 readBenchLimits(options.limits, runnableNames(ZRLab::defaultLab())));
@@ -88,6 +85,9 @@ class Session {
                 [](const std::string& line) { Terminal::shared().complain(line); }));
         }
         devices::Device device = openDevice(options.device);
+        if (_reports->recorder() != nullptr) {
+            _reports->recorder()->record(device, parameters, options.version);
+        }
         _record.deviceName = std::move(device.name);
         _record.deviceSummary = std::move(device.summary);
         _record.deviceFacts = std::move(device.facts);
@@ -122,6 +122,9 @@ class Session {
     }
 
     int run() {
+        for (const std::string& warning : _warnings) {
+            Terminal::shared().complain("warning: " + warning);
+        }
         for (const std::string& warning : valueWarnings(_record.planned)) {
             Terminal::shared().complain(warning);
         }
@@ -147,8 +150,7 @@ class Session {
             }
             return interrupt::exitStatus();
         }
-        static constexpr int kStatuses[] = {kExitPassed, kExitFailed, kExitError};
-        return isWritten ? kStatuses[static_cast<std::size_t>(_record.verdict)] : kExitError;
+        return isWritten ? exitStatusOf(_record.verdict) : kExitError;
     }
 
   private:
@@ -252,11 +254,17 @@ class Session {
     std::vector<std::shared_ptr<RunListener>> _listeners;  // the reports, then the store
     std::shared_ptr<BenchJudge> _judge;  // null when there are no limits of the bench
     std::shared_ptr<RunRecorder> _recorder;
+    std::vector<std::string> _warnings;  // what is missing in the recording that is replayed
     std::stop_token _stop;
     bool _isGivenUp = false;  // the last run
 };
 
 }  // namespace
+
+int exitStatusOf(Verdict verdict) {
+    static constexpr int kStatuses[] = {kExitPassed, kExitFailed, kExitError};
+    return kStatuses[static_cast<std::size_t>(verdict)];
+}
 
 int runSession(const SessionOptions& options) {
     return Session(options).run();

@@ -25,7 +25,8 @@ struct SessionOptions {
     // The files of the frames' and of the images' table, with placeholders; empty when there is none.
     std::string frames;
     std::string images;
-    std::string store;         // where runs are stored, see Store; empty when they are not
+    std::string record;  // the file of the recording, with placeholders; empty when there is none
+    std::string store;   // where runs are stored, see Store; empty when they are not
     bool storeFrames = false;  // with a run's frames, and with its images
     bool storeImages = false;
     std::uint64_t repeat = 0;  // how often; 0 when not asked for

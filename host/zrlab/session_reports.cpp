@@ -50,6 +50,13 @@ SessionReports::SessionReports(const SessionOptions& options, const SessionRecor
         _addFile(path, *form, options.verbose);
     }
     _addTables(options, session);
+    if (!options.record.empty()) {
+        _files.push_back(
+            {fileNameOf("--record", options.record, session), true, [this](ReportSink sink) {
+                 _recorder = std::make_shared<SessionRecorder>(std::move(sink));
+                 return _recorder;
+             }});
+    }
     _refuseClashes({deviceArgument(options.device), options.limits, options.store});
     for (const File& file : _files) {
         requireWritable(file.path);
@@ -131,6 +138,11 @@ void SessionReports::_refuseClashes(const std::vector<std::string>& inputs) cons
 
 bool SessionReports::finish() {
     bool isWhole = true;
+    const std::string missing = _recorder != nullptr ? _recorder->finish() : "";
+    if (!missing.empty()) {
+        Terminal::shared().complain(missing);
+        isWhole = false;
+    }
     for (const File& file : _files) {
         try {
             file.content->finish();

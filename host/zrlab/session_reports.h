@@ -12,12 +12,14 @@
 #include "host/record/run_listener.h"
 #include "host/report/report_form.h"
 #include "host/zrlab/output_file.h"
+#include "host/zrlab/recording_session.h"
 #include "host/zrlab/session_options.h"
 
 namespace host {
 
 // One report goes to standard output, or to the file that --output names; a further one to each file that
-// --report names, and a table of numbers to those of --frames and --images.
+// --report names, a table of numbers to those of --frames and --images, and a recording of the device to that of
+// --record.
 //
 // Owner    The session, and the log's sink: a time-out that outlives its run may log when the session is
 //          gone.
@@ -40,6 +42,9 @@ class SessionReports {
     bool followFrames() const { return _followFrames; }
     bool needsDetails() const { return _needsDetails; }
     bool keepFrames() const { return _keepFrames; }
+
+    // The recording of the device; null when there is none.
+    const std::shared_ptr<SessionRecorder>& recorder() const { return _recorder; }
 
     // Whether standard output takes no more: its reader has gone.
     bool outputFailed() const { return _outputFailed; }
@@ -65,6 +70,7 @@ class SessionReports {
 
     std::vector<File> _files;
     std::vector<std::shared_ptr<RunListener>> _listeners;
+    std::shared_ptr<SessionRecorder> _recorder;  // one of the listeners
     bool _followFrames = false;
     bool _needsDetails = false;
     bool _keepFrames = false;

@@ -300,18 +300,22 @@ std::vector<Setting> Settings::_settingsOf(const CLI::Option& option) const {
 
 void Settings::fill(CLI::App& command) {
     for (CLI::Option* option : command.get_options([](const CLI::Option*) { return true; })) {
-        if (!_isSetting(*option)) {
-            continue;
-        }
-        std::vector<Setting> settings = _settingsOf(*option);
-        if (settings.empty()) {
-            continue;
-        }
-        if (settings.front().from != kCommandLine) {
-            giveChecked(*option, settings);
-        }
-        _filled[nameOf(*option)] = std::move(settings);
+        fill(*option);
     }
+}
+
+void Settings::fill(CLI::Option& option) {
+    if (!_isSetting(option)) {
+        return;
+    }
+    std::vector<Setting> settings = _settingsOf(option);
+    if (settings.empty()) {
+        return;
+    }
+    if (settings.front().from != kCommandLine) {
+        giveChecked(option, settings);
+    }
+    _filled[nameOf(option)] = std::move(settings);
 }
 
 std::string Settings::text(const CLI::App& command) const {

@@ -46,6 +46,9 @@ class Settings {
     // refuses, with where it came from.
     void fill(CLI::App& command);
 
+    // The same of one option.
+    void fill(CLI::Option& option);
+
     // The files, and each option of the command that was filled with its value and where that came from;
     // passwords masked.
     std::string text(const CLI::App& command) const;

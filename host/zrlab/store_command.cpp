@@ -52,12 +52,18 @@ StoreAnswer show(const std::string& where) {
 
 }  // namespace
 
-StoreAnswer storeCommand(const std::string& action, const std::string& where) {
+void requireNamedStore(const std::string& command, const std::string& where) {
     if (where.empty()) {
-        throw Problem(kExitUsage,
-                      "store: which one? Give --store, the variable ZRLAB_STORE or a line "
-                      "\"store = WHERE\" of a settings file");
+        throw Problem(
+            kExitUsage,
+            fmt::format("{}: which store? Give --store, the variable ZRLAB_STORE or a line "
+                        "\"store = WHERE\" of a settings file",
+                        command));
     }
+}
+
+StoreAnswer storeCommand(const std::string& action, const std::string& where) {
+    requireNamedStore("store", where);
     return action == "sync" ? sync(where) : show(where);
 }
 

@@ -14,6 +14,9 @@ struct StoreAnswer {
     int status;
 };
 
+// Throws a Problem (kExitUsage) that says where a store can be named when `where` is empty.
+void requireNamedStore(const std::string& command, const std::string& where);
+
 // "show" tells of the store at `where` what it is, how many runs it has, and how many wait for it where. "sync"
 // writes the runs that wait to it: kExitError when one still waits or was set aside. Throws a Problem: kExitUsage
 // when `where` is empty, and as Store does; kExitError when the store does not work.

@@ -19,6 +19,9 @@
 //     handler.
 //   - After stop() a few frames that were already on their way may still be delivered.
 //   - After invalidate() no handler is called any more.
+//   - The frames of a stream come in the order in which they were taken: presentation times do not fall, and
+//     the numbers that a device gives its frames rise.
+//   - A buffer that somebody holds a reference to is neither changed nor lent again.
 #ifndef ZR_PLATFORM_WELKIN_CAPTURE_H
 #define ZR_PLATFORM_WELKIN_CAPTURE_H
 

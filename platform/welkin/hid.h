@@ -44,8 +44,9 @@ class WLIOHIDDeviceInterface {
                                         std::span<const std::byte> data,
                                         platform::ErrorSlot error) = 0;
 
-    // Starts and stops the delivery of callbacks on the run loop in the mode. Stopping what was not
-    // started does nothing. Pass null to unscheduleFromRunLoop() when the run loop no longer exists.
+    // Starts and stops the delivery of callbacks on the run loop in the mode: a report wakes the loop, and
+    // a device that is not scheduled calls nothing. Stopping what was not started does nothing. Pass null
+    // to unscheduleFromRunLoop() when the run loop no longer exists.
     virtual void scheduleWithRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,
                                      std::string_view mode) = 0;
     virtual void unscheduleFromRunLoop(const std::shared_ptr<platform::RunLoop>& runLoop,

@@ -59,7 +59,7 @@ TEST(DeviceModule, ABadOneIsNamedWithTheReason) {
                       HasSubstr("nobodyHasThisFunction")));
     EXPECT_EQ(load(module("silent")), "it registers no kind of device");
     EXPECT_EQ(load(module("other_version")),
-              "it is built for version 3 of the device interface, this is version 2");
+              "it is built for version 5 of the device interface, this is version 4");
     EXPECT_EQ(load(module("taken")), "the kind \"simulator\" is registered already");
     EXPECT_EQ(devices::kinds().size(), before);
 }

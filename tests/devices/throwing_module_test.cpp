@@ -1,6 +1,7 @@
 // A device module whose initializer throws. In a process of its own, which ends at once: the exception
 // leaves the loader's lock held.
 #include <cstdio>
+#include <cstdlib>
 #include <stdexcept>
 #include <string>
 
@@ -25,6 +26,10 @@ namespace {
 TEST(DeviceModuleDeathTest, AnInitializerThatThrowsIsNamed) {
     EXPECT_EXIT(loadAndEnd(), testing::ExitedWithCode(0),
                 "throws.so: its initializer failed: no driver for the board");
+    setenv("ZR_TEST_THROWS", "number", 1);
+    EXPECT_EXIT(loadAndEnd(), testing::ExitedWithCode(0),
+                "throws.so: its initializer failed with an exception of an unknown kind");
+    unsetenv("ZR_TEST_THROWS");
 }
 
 }  // namespace

@@ -22,6 +22,17 @@ ZRLab::ExperimentFactory factory(const std::string& summary) {
     return [summary] { return std::make_shared<EmptyExperiment>(summary); };
 }
 
+// Reports and stores know units and domains by these texts.
+TEST(HostInterface, NamesItsUnitsAndDomains) {
+    EXPECT_EQ(ZRDimensionlessUnit::events().symbol(), "events");
+    EXPECT_EQ(ZRDimensionlessUnit::frames().symbol(), "frames");
+    EXPECT_EQ(ZRDimensionlessUnit::errors().symbol(), "errors");
+    EXPECT_EQ(ZRErrorDomain, "ZRErrorDomain");
+    EXPECT_EQ(ZRCapturePlugInErrorDomain, "ZRCapturePlugInErrorDomain");
+    EXPECT_EQ(ZRMeterixErrorDomain, "ZRMeterixErrorDomain");
+    EXPECT_EQ(ZRKirraImageExperimentErrorDomain, "ZRKirraImageExperimentErrorDomain");
+}
+
 // One lab a process, so the test works with names of its own.
 TEST(Lab, KeepsTheFirstOfANameAndRemembersTheRefusal) {
     ZRLab& lab = ZRLab::defaultLab();

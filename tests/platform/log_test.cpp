@@ -4,6 +4,7 @@
 #include <atomic>
 #include <cstdarg>
 #include <cstdio>
+#include <cstdlib>
 #include <string>
 #include <thread>
 #include <utility>
@@ -81,6 +82,12 @@ TEST_F(LogTest, GoesToTheSystemLogWithoutASinkOfItsOwn) {
     EXPECT_THAT(systemLog,
                 ::testing::ElementsAre(std::pair(LOG_DEBUG, line), std::pair(LOG_NOTICE, line),
                                        std::pair(LOG_ERR, line)));
+}
+
+TEST(LogDeathTest, AsksForNoDebugLinesAtFirst) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");  // a process in which nobody set a level
+    EXPECT_EXIT(std::_Exit(Log::isEnabled(LogLevel::Debug) || !Log::isEnabled(LogLevel::Default)),
+                ::testing::ExitedWithCode(0), "");
 }
 
 // Counts lines, and notices a line that reaches it after its end.

@@ -14,7 +14,7 @@
 
 #include <unistd.h>
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 
 namespace {
 
@@ -159,6 +159,17 @@ const Row kRows[] = {
               [&s] { std::thread([loop = s.loop] { loop->stop(); }).detach(); });
      },
      kForever, Stopped, "<.wW>"},
+    {"AddedFromAnotherThread",
+     [](Script& s) {
+         s.source('a');
+         s.ready('b', s.stopping()), s.remove('b');
+         s.on(platform::RunLoopBeforeWaiting, [&s] {
+             std::thread([loop = s.loop, b = s.sources['b']] {
+                 loop->addSource(b, kRunLoopDefaultMode);
+             }).detach();
+         });
+     },
+     kForever, Stopped, "<.wW.b>"},
     {"RemovedFromAnotherThread",
      [](Script& s) {
          s.source('a');
@@ -262,7 +273,11 @@ TEST(RunLoop, NotifiesEveryExitObserverAndThrowsTheFirstException) {
 TEST(RunLoop, RunsOnItsOwnThreadOnly) {
     std::shared_ptr<RunLoop> kept;
     const auto runElsewhere = [&kept] {
-        onNewThread([&] { EXPECT_THROW(kept->run(kRunLoopDefaultMode, 0), std::logic_error); });
+        onNewThread([&] {
+            EXPECT_THAT([&] { kept->run(kRunLoopDefaultMode, 0); },
+                        testing::ThrowsMessage<std::logic_error>(
+                            "a run loop can only be run on its own thread"));
+        });
     };
     onNewThread([&] {
         Script script;
@@ -353,6 +368,47 @@ TEST(RunLoop, BelongsToTheThreadThatAskedForIt) {
     kept.reset();
     EXPECT_EQ(source.use_count(), 1);
     source->signal();
+}
+
+TEST(RunLoop, SaysWhetherAModeHasASource) {
+    const auto loop = RunLoop::forThisThread();
+    const auto source = std::make_shared<platform::RunLoopSource>([] {});
+    EXPECT_FALSE(loop->hasSources(kRunLoopDefaultMode));
+    loop->addSource(source, kRunLoopDefaultMode);
+    EXPECT_TRUE(loop->hasSources(kRunLoopDefaultMode));
+    EXPECT_TRUE(loop->hasSources(platform::kRunLoopCommonModes));
+    EXPECT_FALSE(loop->hasSources("other"));
+    loop->removeSource(source, kRunLoopDefaultMode);
+    EXPECT_FALSE(loop->hasSources(kRunLoopDefaultMode));
+}
+
+TEST(RunLoop, TakesItsObserversAlongThoughItsSourcesStay) {
+    const std::function<void(RunLoop&, const std::shared_ptr<RunLoopSource>&)> kUses[] = {
+        [](RunLoop& loop, const auto& source) { loop.addSource(source, "other"); },
+        [](RunLoop& loop, const auto& source) {
+            loop.addSource(source, "other");
+            loop.removeSource(source, "other");
+        },
+        [](RunLoop& loop, const auto& source) {
+            loop.addSource(source, "other");
+            loop.addSource(source, "other");
+        },
+    };
+    for (const auto& use : kUses) {
+        const auto source = std::make_shared<RunLoopSource>([] {});
+        int entries = 0;
+        const auto observer = std::make_shared<RunLoopObserver>(
+            RunLoopObserver{platform::RunLoopEntry, std::numeric_limits<int>::min(),
+                            [&entries](std::uint32_t) { ++entries; }});
+        onNewThread([&] {
+            const auto loop = RunLoop::forThisThread();
+            loop->addObserver(observer, kRunLoopDefaultMode);
+            use(*loop, source);
+            EXPECT_EQ(loop->run(kRunLoopDefaultMode, kForever), Finished);
+        });
+        EXPECT_EQ(entries, 1);
+        EXPECT_EQ(observer.use_count(), 1);
+    }
 }
 
 // Each signaller waits until its signal was served before it gives the next: one that is lost, or

@@ -5,7 +5,6 @@
 #include <cstddef>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <map>
 #include <string>
 #include <system_error>
@@ -14,21 +13,37 @@
 
 namespace test {
 
-// How many threads the process has, by name.
-inline std::map<std::string, std::size_t> threadNames() {
-    std::map<std::string, std::size_t> names;
-    std::error_code threadEnded;
-    for (const auto& task : std::filesystem::directory_iterator("/proc/self/task", threadEnded)) {
-        std::string name;
-        std::getline(std::ifstream(task.path() / "comm"), name);
-        ++names[name];
+// How many threads the process has. The kernel's count: a listing of /proc/self/task leaves threads out when one
+// ends meanwhile.
+inline std::size_t threadCount() {
+    std::ifstream status("/proc/self/status");
+    std::size_t count = 0;
+    for (std::string word; status >> word;) {
+        if (word == "Threads:") {
+            status >> count;
+        }
     }
-    return names;
+    return count;
 }
 
-inline std::size_t threadCount() {
-    return static_cast<std::size_t>(
-        std::distance(std::filesystem::directory_iterator("/proc/self/task"), {}));
+// The same by name. Listed until a listing is whole.
+inline std::map<std::string, std::size_t> threadNames() {
+    for (;;) {
+        const std::size_t before = threadCount();
+        std::map<std::string, std::size_t> names;
+        std::size_t listed = 0;
+        std::error_code threadEnded;
+        for (const auto& task :
+             std::filesystem::directory_iterator("/proc/self/task", threadEnded)) {
+            std::string name;
+            std::getline(std::ifstream(task.path() / "comm"), name);
+            ++names[name];
+            ++listed;
+        }
+        if (listed == before && threadCount() == before) {
+            return names;
+        }
+    }
 }
 
 inline std::size_t threadsNamed(const std::string& name) {

@@ -13,6 +13,8 @@
 #include <gmock/gmock.h>
 #include <nlohmann/json.hpp>
 
+#include "tests/support/postgres_cluster.h"
+
 namespace {
 
 namespace fs = std::filesystem;
@@ -280,6 +282,9 @@ TEST(Program, RunsOnADeviceOfAModule) {
     EXPECT_EQ(zrlab({"devices", "--kinds", "--device-module", kBoardModule}).output,
               "simulator     Simulated devices: a gallery of profiles, or a profile's file; takes "
               "--speed, can be made to fail\n"
+              "linux         Parts of this Linux machine, by the file of a port description; runs "
+              "in real time\n"
+              "replay        Recordings of a device, by their files; takes --speed\n"
               "board         Boards without services; runs in real time\n");
     const test::Outcome outcome = zrlab(board({"--device", "board:rev-b", "--format", "json"}));
     EXPECT_EQ(outcome.status, 2) << outcome.errors;  // the board has no counters
@@ -422,7 +427,15 @@ std::string contentOf(const fs::path& file) {
     return {std::istreambuf_iterator<char>(in), {}};
 }
 
+// A program that nohup or a script's & started ignores some signals, and so would those that it starts.
+void ignoreNoSignal() {
+    for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
+        std::signal(number, SIG_DFL);
+    }
+}
+
 TEST(Program, AnInterruptLosesNothing) {
+    ignoreNoSignal();
     for (const auto& [number, status] :
          {std::pair(SIGINT, 130), std::pair(SIGTERM, 143), std::pair(SIGHUP, 129)}) {
         const fs::path folder = newFolder();
@@ -452,6 +465,7 @@ TEST(Program, AnInterruptLosesNothing) {
 // A second request does not wait for the run, and a program that is killed cannot: what was written as it
 // happened is there.
 TEST(Program, ASecondInterruptAndAKillKeepWhatWasWritten) {
+    ignoreNoSignal();
     for (const int last : {SIGTERM, SIGKILL}) {
         const fs::path folder = newFolder();
         test::Program program(endlessRun(folder));
@@ -621,12 +635,52 @@ TEST(Program, KeepsRunsInAStoreOrUntilItTakesThem) {
     EXPECT_EQ(shown.status, 0);
     EXPECT_THAT(shown.output, HasSubstr("\nruns     6\nwaiting  0 in "));
 
-    const test::Outcome noEngine =
-        zrlab({"run", "VantorMeterixDiagnostic", "--store", "postgresql://joe:secret@db/runs"});
-    EXPECT_EQ(noEngine.status, 64);
-    EXPECT_THAT(noEngine.errors,
-                StartsWith("zrlab: store postgresql://joe:***@db/runs: no engine for it"));
     EXPECT_EQ(zrlab({"store", "show"}).status, 64);
+    fs::remove_all(folder);
+}
+
+// Whatever the server does, a session ends as it would without a store, and every run is in it once afterwards.
+TEST(Program, KeepsItsVerdictsWhateverItsServerDoes) {
+    const fs::path folder = newFolder();
+    test::PostgresCluster& server = test::PostgresCluster::shared();
+    const std::string store = server.newDatabase();
+    const std::vector<std::string> variables = {"XDG_STATE_HOME=" + folder.string(),
+                                                "ZRLAB_STORE=" + store};
+    const auto command = [&variables](std::vector<std::string> words) {
+        words.insert(words.begin(), ZR_PROGRAM);
+        return test::runProgram(words, variables);
+    };
+    using Server = test::PostgresCluster;
+    struct Row {
+        const char* device;
+        int status;
+        const char* complaint;  // how the store's line goes on
+        void (Server::*make)();
+        void (Server::*mend)();
+    };
+    const Row rows[] = {
+        {"healthy", 0, "the server does not answer", &Server::pause, &Server::resume},
+        {"counter-stuck", 1, "connection to server on socket", &Server::stop, &Server::start},
+        {"counters-unavailable", 2, "could not extend file", &Server::fill, &Server::makeRoom},
+    };
+    EXPECT_EQ(command({"run", "VantorMeterixDiagnostic", "--repeat", "30"}).errors, "");
+    for (const Row& row : rows) {
+        (server.*row.make)();
+        const test::Outcome outcome = command({"run", "VantorMeterixDiagnostic", "--device",
+                                               row.device, "--repeat", "30", "--log", "off"});
+        (server.*row.mend)();
+        EXPECT_EQ(outcome.status, row.status) << row.complaint;
+        EXPECT_THAT(outcome.errors, StartsWith("zrlab: store " + store + ": " + row.complaint));
+        EXPECT_EQ(std::count(outcome.errors.begin(), outcome.errors.end(), '\n'), 1);
+    }
+    EXPECT_EQ(command({"store", "sync"}).status, 0);
+    EXPECT_THAT(command({"store", "show"}).output, HasSubstr("\nruns     120\nwaiting  0 in "));
+    EXPECT_EQ(command({"store", "sync"}).output, store + ": 0 runs delivered\n");
+
+    // No command pays for a library of a database that it does not use.
+    const test::Outcome list = test::runProgram({ZR_PROGRAM, "list"}, {"LD_DEBUG=libs"});
+    EXPECT_EQ(list.status, 0);
+    EXPECT_THAT(list.errors, testing::Not(HasSubstr("libpq")));
     fs::remove_all(folder);
 }
 

@@ -4,7 +4,7 @@
 //   ZR_MUTANTS_REACHED=file  the healthy program, which sets byte n of the file where mutant n would have
 //                            made a difference
 //
-// Each shared object has a copy of its own, set before any other of its initializers.
+// Each shared object has a copy of its own, hidden from the others, and set before any other of its initializers.
 #ifndef ZR_TOOLS_MUTATE_MUTANTS_H
 #define ZR_TOOLS_MUTATE_MUTANTS_H
 
@@ -45,7 +45,7 @@ __attribute__((constructor(101))) static void choose() {
 }  // namespace mutants
 
 // Whether this process is the mutant. Not constexpr, so that what asks is decided at run time.
-inline bool zrMutant(int number) {
+__attribute__((visibility("hidden"))) inline bool zrMutant(int number) {
     if (mutants::reached != nullptr) {
         __atomic_store_n(&mutants::reached[number], 1, __ATOMIC_RELAXED);
     }
@@ -53,7 +53,7 @@ inline bool zrMutant(int number) {
 }
 
 // The same for constexpr functions: what the compiler evaluates is never mutated.
-constexpr bool zrMutantUnlessConstant(int number) {
+__attribute__((visibility("hidden"))) constexpr bool zrMutantUnlessConstant(int number) {
     return !__builtin_is_constant_evaluated() && zrMutant(number);
 }
 

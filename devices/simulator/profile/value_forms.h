@@ -25,6 +25,7 @@ using input::Json;
 using input::JsonKey;
 using input::JsonNames;
 using input::JsonNode;
+using input::OwnerOf;
 
 // What a device measures, in any unit: a number of a profile that is larger is a mistake.
 constexpr std::int64_t kLargestQuantity = 1'000'000'000;
@@ -88,16 +89,6 @@ Json jsonOf(const Fault& fault);
 Json jsonOf(const platform::ErrorRef& error);
 Json jsonOf(const NumberRange& range);
 Json jsonOf(const platform::Value& value);
-
-template <class Pointer>
-struct MemberPointer;
-template <class T, class M>
-struct MemberPointer<M T::*> {
-    using Owner = T;
-    using Member = M;
-};
-template <auto Member>
-using OwnerOf = typename MemberPointer<decltype(Member)>::Owner;
 
 // A key for the member of an object.
 template <auto Member>

@@ -10,6 +10,7 @@
 #include <gmock/gmock.h>
 #include <nlohmann/json.hpp>
 
+#include "host/report/replay.h"
 #include "tests/host/report/sample_sessions.h"
 
 namespace {
@@ -32,7 +33,7 @@ std::vector<Json> artifactsOf(const host::SessionRecord& session) {
             artifacts.push_back(std::move(artifact));
         }
     });
-    test::play(session, report);
+    host::replay(session, report);
     return artifacts;
 }
 
@@ -214,7 +215,7 @@ TEST(JsonlReport, KeepsLinesWholeWhateverThreadLogs) {
             });
         }
         start.arrive_and_wait();
-        test::play(test::mixedSession(), report);
+        host::replay(test::mixedSession(), report);
         const std::size_t atTheEnd = lines.size();
         threads.clear();
         EXPECT_EQ(lines.size(), atTheEnd);
@@ -248,7 +249,7 @@ TEST(JsonlReport, WritesSampleOutputs) {
         }
         std::string output;
         host::JsonlReport report([&output](std::string_view line) { output += line; });
-        test::play(session, report);
+        host::replay(session, report);
         test::writeSample(name + ".jsonl", output);
     }
 }

@@ -12,6 +12,7 @@
 
 #include "host/report/frame_table.h"
 #include "host/report/image_table.h"
+#include "host/report/replay.h"
 #include "tests/host/report/sample_sessions.h"
 
 namespace {
@@ -105,7 +106,7 @@ TEST(FrameTable, JsonLinesHaveTheMetadataAsItIs) {
 TEST(ImageTable, HasARowForEachImageAndLosesNothing) {
     std::string text;
     const auto table = host::openImagesCsv([&text](std::string_view piece) { text += piece; });
-    test::play(test::imagesSession(70), *table);
+    host::replay(test::imagesSession(70), *table);
     auto rows = linesOf(text, "\r\n");
     ASSERT_EQ(rows.size(), 71U);
     EXPECT_THAT(rows[0], StartsWith("run,number,uuid,image,frameID,timestampInMilliseconds,"

@@ -9,6 +9,7 @@
 
 #include <gmock/gmock.h>
 
+#include "host/report/replay.h"
 #include "tests/host/report/sample_sessions.h"
 
 namespace {
@@ -20,8 +21,8 @@ std::string reportOf(const char* form,
                      const host::SessionRecord& session,
                      const host::TextStyle& style = {}) {
     std::string text;
-    test::play(session, *host::reportFormNamed(form)->open(
-                            [&text](std::string_view piece) { text += piece; }, style));
+    host::replay(session, *host::reportFormNamed(form)->open(
+                              [&text](std::string_view piece) { text += piece; }, style));
     return text;
 }
 

@@ -1,6 +1,5 @@
 #include "tests/host/report/sample_sessions.h"
 
-#include <algorithm>
 #include <chrono>
 #include <cmath>
 #include <cstdint>
@@ -10,7 +9,6 @@
 #include <limits>
 #include <memory>
 #include <optional>
-#include <span>
 
 #include <gtest/gtest.h>
 
@@ -255,48 +253,6 @@ SessionRecord mixedSession() {
     }
     session.verdict = Verdict::Error;
     return session;
-}
-
-void play(const SessionRecord& session, host::RunListener& listener) {
-    listener.sessionStarted(session);
-    for (const RunRecord& whole : session.runs) {
-        RunRecord run = whole;
-        run.failures.clear();
-        // A misuse of the device is only written down when the run is over.
-        const auto tell = [&](host::Part part, bool device) {
-            for (const host::FailureRecord& failure : whole.failures) {
-                if (failure.part == part && (failure.step == host::kStepDevice) == device) {
-                    run.failures.push_back(failure);
-                }
-            }
-        };
-        listener.runStarted(run);
-        listener.partStarted(run, host::Part::Experiment);
-        for (const host::LogRecord& line : run.log) {
-            listener.logged(line);
-        }
-        // Some at a time, as they come.
-        for (std::size_t at = 0; at < run.frames.size(); at += 32) {
-            const auto frames = std::span(run.frames)
-                                    .subspan(at, std::min<std::size_t>(32, run.frames.size() - at));
-            listener.framesDelivered({.frames = {frames.begin(), frames.end()},
-                                      .metadata = std::vector<platform::Dictionary>(frames.size()),
-                                      .events = {}});
-        }
-        tell(host::Part::Experiment, false);
-        // What was given up does not end its part.
-        if (run.verdict != Verdict::Interrupted) {
-            listener.partEnded(run, host::Part::Experiment);
-        }
-        if (run.analysisSeconds.has_value()) {
-            listener.partStarted(run, host::Part::Analysis);
-            tell(host::Part::Analysis, false);
-            listener.partEnded(run, host::Part::Analysis);
-        }
-        tell(host::Part::Experiment, true);
-        listener.runEnded(run);
-    }
-    listener.sessionEnded(session);
 }
 
 SessionRecord identifiedSession() {

@@ -7,7 +7,6 @@
 #include <utility>
 #include <vector>
 
-#include "host/record/run_listener.h"
 #include "host/record/run_record.h"
 
 namespace test {
@@ -47,9 +46,6 @@ host::SessionRecord identifiedSession();
 
 // All of the above as one session of several runs.
 host::SessionRecord mixedSession();
-
-// Tells the listener of the session as the host does, log lines inside the experiment's step.
-void play(const host::SessionRecord& session, host::RunListener& listener);
 
 // Every session above with a name for a file.
 std::vector<std::pair<std::string, host::SessionRecord>> sampleSessions();

@@ -64,8 +64,8 @@ TEST(DeviceCommand, ShowsAndChecksWhatTheKindCanShowAndCheck) {
          64,
          bad + ": /hid/manger: unknown key; did you mean manager?\n" + bad +
              ": /display/powerInfo: neither true nor false\n" + good +
-             ": a valid profile\nsimulator:healthy: a valid profile\n"},
-        {"check", {good}, 0, good + ": a valid profile\n"},
+             ": valid\nsimulator:healthy: valid\n"},
+        {"check", {good}, 0, good + ": valid\n"},
     };
     for (const Row& row : rows) {
         try {

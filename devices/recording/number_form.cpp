@@ -14,7 +14,7 @@ namespace {
 using Kind = platform::Number::Kind;
 
 template <class T>
-T integer(const Json& json) {
+T narrowed(const Json& json) {
     const auto fits = [](auto value) {
         return std::cmp_greater_equal(value, std::numeric_limits<T>::min()) &&
                std::cmp_less_equal(value, std::numeric_limits<T>::max());
@@ -54,23 +54,23 @@ platform::Number numberOf(Kind kind, const Json& payload) {
             }
             break;
         case Kind::Int8:
-            return integer<std::int8_t>(payload);
+            return narrowed<std::int8_t>(payload);
         case Kind::Int16:
-            return integer<std::int16_t>(payload);
+            return narrowed<std::int16_t>(payload);
         case Kind::Int32:
-            return integer<std::int32_t>(payload);
+            return narrowed<std::int32_t>(payload);
         case Kind::Int64:
-            return integer<std::int64_t>(payload);
+            return narrowed<std::int64_t>(payload);
         case Kind::UInt8:
-            return integer<std::uint8_t>(payload);
+            return narrowed<std::uint8_t>(payload);
         case Kind::UInt16:
-            return integer<std::uint16_t>(payload);
+            return narrowed<std::uint16_t>(payload);
         case Kind::UInt32:
-            return integer<std::uint32_t>(payload);
+            return narrowed<std::uint32_t>(payload);
         case Kind::UInt64:
-            return integer<std::uint64_t>(payload);
+            return narrowed<std::uint64_t>(payload);
         case Kind::Float:
-            return std::bit_cast<float>(integer<std::uint32_t>(payload));
+            return std::bit_cast<float>(narrowed<std::uint32_t>(payload));
         case Kind::Double:
             if (payload.is_number_float()) {
                 return payload.get<double>();

@@ -84,7 +84,7 @@ Json metadataOf(const Identity& identity) {
     return metadata;
 }
 
-Json deviceOf(const SessionRecord& session) {
+Json dutInfoOf(const SessionRecord& session) {
     Json metadata{{"summary", session.deviceSummary}};
     for (const auto& [name, text] : session.deviceFacts) {
         if (name != kPlatformFact) {
@@ -221,7 +221,7 @@ void JsonlReport::sessionStarted(const SessionRecord& session) {
                                {"version", session.version},
                                {"commandLine", session.commandLine},
                                {"parameters", parametersOf(session)},
-                               {"dutInfo", deviceOf(session)},
+                               {"dutInfo", dutInfoOf(session)},
                                {"metadata", metadataOf(session.identity)}});
 }
 

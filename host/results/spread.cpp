@@ -13,7 +13,7 @@ namespace {
 
 // Numbers that can be calculated with: sums of squares of greater ones would not fit, and of infinities nothing
 // is known. `middle` is near the mean; see Moments.
-constexpr std::string_view kSql = R"(
+constexpr std::string_view kSpreadSql = R"(
 WITH chosen AS (
     SELECT runs.diagnostic AS diagnostic, {source} AS source, results.quantity_id AS quantity_id,
            COALESCE(results.limit_id, 0) AS limit_id, results.judgement AS judgement,
@@ -119,7 +119,7 @@ void answerSpread(Store& store, const Asked& asked, Answer& answer) {
                       {"notNumbers", "No number", ColumnKind::Count}};
     std::set<Name> analysed;
     std::vector<Drawn> drawn;
-    for (const Row& row : Selection(asked.filter).rows(store, kSql)) {
+    for (const Row& row : Selection(asked.filter).rows(store, kSpreadSql)) {
         // A result of the analysis repeats the experiment's measurement of the same name.
         const std::int64_t source = integerAt(row, 1);
         if (source == kAnalysis) {

@@ -14,7 +14,7 @@ namespace host {
 namespace {
 
 // One row for each stretch of time, station and limit.
-constexpr std::string_view kSql = R"(
+constexpr std::string_view kTrendSql = R"(
 WITH chosen AS (
     SELECT runs.diagnostic AS diagnostic, {source} AS source, quantities.unit AS unit,
            stations.name AS station, runs.started / CAST({stretch} AS BIGINT) AS stretch,
@@ -56,7 +56,7 @@ Rows rowsBy(std::int64_t stretch, Store& store, const Asked& asked) {
                                                                    {"{name}", name}};
     std::set<std::string> analysed;
     Rows rows;
-    for (Row& row : selection.rows(store, withWords(kSql, words))) {
+    for (Row& row : selection.rows(store, withWords(kTrendSql, words))) {
         const std::int64_t source = integerAt(row, 1);
         if (source == kAnalysis) {
             analysed.insert(textAt(row, 0));

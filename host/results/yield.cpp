@@ -19,7 +19,7 @@ constexpr std::string_view kColumns[] = {"''", "stations.name", "runs.lot", "run
                                          "runs.day"};
 
 // Attempts are counted over the whole store, so that a filter does not make a second attempt the first.
-constexpr std::string_view kSql = R"(
+constexpr std::string_view kYieldSql = R"(
 SELECT runs.diagnostic, {group}, COUNT(*),
        COUNT(*) FILTER (WHERE runs.verdict = 'pass'), COUNT(*) FILTER (WHERE runs.verdict = 'fail'),
        COUNT(*) FILTER (WHERE runs.verdict = 'error'), COUNT(*) FILTER (WHERE runs.verdict = 'interrupted'),
@@ -146,7 +146,7 @@ void answerYield(Store& store, const Asked& asked, Answer& answer) {
         std::find(std::begin(kGroups), std::end(kGroups), asked.by) - std::begin(kGroups);
     const std::pair<std::string_view, std::string_view> group[] = {{"{group}", kColumns[at]}};
     std::int64_t withoutUnit = 0;
-    for (const Row& row : Selection(asked.filter).rows(store, withWords(kSql, group))) {
+    for (const Row& row : Selection(asked.filter).rows(store, withWords(kYieldSql, group))) {
         std::vector<Datum>& cells = answer.rows.emplace_back();
         cells.emplace_back(textAt(row, 0));
         if (isGrouped) {

@@ -58,10 +58,10 @@ struct Line {
     }
 };
 
-class Answer {
+class Candidates {
   public:
     // `value` is what has been typed; `prefix` stands before it in the same word: "--format=".
-    Answer(const Line& line, std::string prefix, std::string value)
+    Candidates(const Line& line, std::string prefix, std::string value)
         : _line(line), _prefix(std::move(prefix)), _value(std::move(value)) {}
 
     void offerOptions() {
@@ -211,7 +211,7 @@ class Answer {
 
     struct Source {
         std::string_view placeholder;
-        void (Answer::*offer)();
+        void (Candidates::*offer)();
     };
     static const Source kSources[8];
 
@@ -220,15 +220,15 @@ class Answer {
     const std::string _value;
 };
 
-const Answer::Source Answer::kSources[] = {
-    {"NAME", &Answer::_offerNames},
-    {"COMMAND", &Answer::_offerCommands},
-    {"DEVICE", &Answer::_offerDevices},
-    {"WHAT", &Answer::_offerDevices},
-    {"PARAM=VALUE", &Answer::_offerParameters},
-    {"FILE", &Answer::_offerAnyFile},
-    {"PATH", &Answer::_offerAnyFile},
-    {"WHERE", &Answer::_offerAnyFile},
+const Candidates::Source Candidates::kSources[] = {
+    {"NAME", &Candidates::_offerNames},
+    {"COMMAND", &Candidates::_offerCommands},
+    {"DEVICE", &Candidates::_offerDevices},
+    {"WHAT", &Candidates::_offerDevices},
+    {"PARAM=VALUE", &Candidates::_offerParameters},
+    {"FILE", &Candidates::_offerAnyFile},
+    {"PATH", &Candidates::_offerAnyFile},
+    {"WHERE", &Candidates::_offerAnyFile},
 };
 
 }  // namespace
@@ -256,19 +256,19 @@ std::string completions(const CommandLine& commandLine, std::vector<std::string>
             return "";
         }
     }
-    Answer answer(line, std::move(prefix), value);
+    Candidates candidates(line, std::move(prefix), value);
     try {
         if (line.waiting != nullptr) {
-            answer.offerValues(*line.waiting);
+            candidates.offerValues(*line.waiting);
         } else if (value.starts_with("-")) {
-            answer.offerOptions();
+            candidates.offerOptions();
         } else {
-            answer.offerArguments();
+            candidates.offerArguments();
         }
     } catch (const std::exception&) {
         // A module cannot be loaded or throws: what it would offer is not known.
     }
-    return std::move(answer.text);
+    return std::move(candidates.text);
 }
 
 }  // namespace host

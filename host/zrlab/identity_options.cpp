@@ -42,13 +42,13 @@ std::string hostName() {
     return gethostname(name, HOST_NAME_MAX) == 0 && name[0] != '\0' ? cleanText(name) : "unknown";
 }
 
-struct Row {
+struct IdentityRow {
     const char* name;
     const char* type;
     const char* description;
     std::string Identity::*text;
 };
-constexpr Row kRows[] = {
+constexpr IdentityRow kRows[] = {
     {"--unit", "SERIAL", "Serial number of the unit under test", &Identity::unit},
     {"--part", "PART", "Part number of the unit", &Identity::part},
     {"--lot", "LOT", "Lot of the unit", &Identity::lot},
@@ -60,7 +60,7 @@ constexpr Row kRows[] = {
 }  // namespace
 
 void addIdentityOptions(CLI::App& command, Identity& identity, std::vector<std::string>& metadata) {
-    for (const Row& row : kRows) {
+    for (const IdentityRow& row : kRows) {
         command.add_option(row.name, identity.*row.text, row.description)
             ->type_name(row.type)
             ->check(oneLine());

@@ -28,7 +28,6 @@ using platform::RunLoopSource;
 using enum RunLoopOutcome;
 
 constexpr double kForever = std::numeric_limits<double>::infinity();
-constexpr double kNan = std::numeric_limits<double>::quiet_NaN();
 
 // A thread's loop on which everything that happens is written down: a letter for a source that runs,
 // '<' entry, '.' before a turn, 'w' before a wait, 'W' after it, '>' exit.
@@ -103,7 +102,8 @@ const Row kRows[] = {
     {"SourceOfAnotherMode", [](Script& s) { s.ready('a', {}, "other"); }, kForever, Finished, "<>"},
     {"NothingReadyAndNoTime", [](Script& s) { s.source('a'); }, 0, TimedOut, "<.>"},
     {"ReadyAndNoTime", [](Script& s) { s.ready('a'); }, 0, TimedOut, "<.a>"},
-    {"ReadyAndNanTime", [](Script& s) { s.ready('a'); }, kNan, TimedOut, "<.a>"},
+    {"ReadyAndNanTime", [](Script& s) { s.ready('a'); }, std::numeric_limits<double>::quiet_NaN(),
+     TimedOut, "<.a>"},
     {"InTheOrderAdded", [](Script& s) { s.ready('b'), s.source('x'), s.ready('a'); }, 0, TimedOut,
      "<.ba>"},
     {"SignalledTwice", [](Script& s) { s.ready('a'), s.sources['a']->signal(); }, 0, TimedOut,

@@ -4,6 +4,7 @@
 #include <fstream>
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <gmock/gmock.h>
@@ -19,9 +20,9 @@ using testing::IsEmpty;
 using testing::StartsWith;
 
 test::Outcome campaign(std::vector<std::string> arguments) {
-    arguments.insert(arguments.begin(), {ZR_PROGRAM, "campaign"});
+    arguments.insert(arguments.begin(), "campaign");
     // The program waits for signals on a thread when it forks; a process of a run may start threads all the same.
-    return test::runProgram(arguments, {"TSAN_OPTIONS=die_after_fork=0"});
+    return test::zrlab(std::move(arguments), {"TSAN_OPTIONS=die_after_fork=0"});
 }
 
 // The faults of a campaign by their outcomes.

@@ -11,13 +11,9 @@
 namespace {
 
 using Json = nlohmann::json;
+using test::zrlab;
 using testing::HasSubstr;
 using testing::IsEmpty;
-
-test::Outcome zrlab(std::vector<std::string> arguments) {
-    arguments.insert(arguments.begin(), ZR_PROGRAM);
-    return test::runProgram(arguments);
-}
 
 TEST(Conformance, ReportsARunForEachServiceOfTheDevice) {
     const auto done = zrlab({"conformance", "--speed", "max", "--format", "json"});

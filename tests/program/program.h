@@ -46,6 +46,13 @@ inline Outcome runProgram(const std::vector<std::string>& arguments,
     return Program(arguments, variables).finish();
 }
 
+// zrlab, as it was built.
+inline Outcome zrlab(std::vector<std::string> arguments,
+                     const std::vector<std::string>& variables = {}) {
+    arguments.insert(arguments.begin(), ZR_PROGRAM);
+    return runProgram(arguments, variables);
+}
+
 }  // namespace test
 
 #endif

@@ -20,6 +20,7 @@ namespace {
 namespace fs = std::filesystem;
 using nlohmann::json;
 using test::Outcome;
+using test::zrlab;
 using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
@@ -33,10 +34,6 @@ class RecordingProgram : public ::testing::Test {
 
     std::string path(const std::string& name) const { return (_folder / name).string(); }
 
-    static Outcome zrlab(std::vector<std::string> arguments) {
-        arguments.insert(arguments.begin(), ZR_PROGRAM);
-        return test::runProgram(arguments);
-    }
     // A run of a gallery's device, or of a replay, as fast as can be.
     static Outcome run(const std::string& name,
                        const std::string& device,

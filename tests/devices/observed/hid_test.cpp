@@ -35,7 +35,8 @@ struct Journal final : observed::Observer {
     std::vector<std::string> lines;
 };
 
-const auto kIgnore = [](std::int64_t, std::span<const std::byte>, const platform::ErrorRef&) {};
+const auto kIgnoreReports =
+    [](std::int64_t, std::span<const std::byte>, const platform::ErrorRef&) {};
 
 class ObservedHid : public ::testing::Test {
   protected:
@@ -92,7 +93,7 @@ TEST_F(ObservedHid, ReportsTheClientsMisuses) {
         {"scheduleWithRunLoop() was called on another thread than the run loop's",
          [&] { elsewhere(schedule); }},
         {"setInputReportCallback() was called on another thread than the run loop's",
-         scheduledElsewhere([&] { sensor->setInputReportCallback(kIgnore); })},
+         scheduledElsewhere([&] { sensor->setInputReportCallback(kIgnoreReports); })},
         {"setFeatureReportWithID() was called on another thread than the run loop's",
          scheduledElsewhere([&] { setMode(*sensor, 171, 171); })},
         {"unscheduleFromRunLoop() was called on another thread than the run loop's",
@@ -115,7 +116,7 @@ TEST_F(ObservedHid, ReportsTheClientsMisuses) {
     schedule();
     sensor->unscheduleFromRunLoop(runLoop, kMode);
     elsewhere([&] { sensor->scheduleWithRunLoop(RunLoop::forThisThread(), kMode); });
-    sensor->setInputReportCallback(kIgnore);
+    sensor->setInputReportCallback(kIgnoreReports);
     sensor->unscheduleFromRunLoop(nullptr, kMode);
     schedule();
     elsewhere([last = std::move(sensor)]() mutable { last = nullptr; });
@@ -152,7 +153,7 @@ TEST_F(ObservedHid, ReportsACallbackOnAnotherThreadOnce) {
     EXPECT_EQ(manager->devices().at(0), sensor);
     sensor = nullptr;
     sensor = manager->devices().at(0);  // still open
-    sensor->setInputReportCallback(kIgnore);
+    sensor->setInputReportCallback(kIgnoreReports);
     sensor->scheduleWithRunLoop(runLoop, kMode);
     const std::vector<std::byte> image(792);
     fake->callback(118, image, nullptr);

@@ -38,7 +38,7 @@ struct FakeMeterix final : platform::MeterixFacility {
     int samples = 2;
 };
 
-struct Journal final : observed::Observer {
+struct MeterixJournal final : observed::Observer {
     void countersSampled(const MeterixSamples& samples) override {
         lines.push_back(std::to_string(samples.size()) + " samples");
     }
@@ -50,7 +50,7 @@ struct Journal final : observed::Observer {
 };
 
 TEST(ObservedMeterix, ReportsSnapshotsErrorsAndSamplesThatDoNotMatch) {
-    const auto journal = std::make_shared<Journal>();
+    const auto journal = std::make_shared<MeterixJournal>();
     const auto fake = std::make_shared<FakeMeterix>();
     const auto meterix = observed::observeMeterix(fake, observed::Reporter(journal));
     const MeterixChannels channels(2);

@@ -64,7 +64,7 @@ std::vector<host::FrameRecord> framesOf(double hottest) {
     return frames;
 }
 
-struct Row {
+struct BenchRow {
     const char* what;
     BenchLimit limit;
     std::vector<std::string> found;  // name, value, judgement of each result
@@ -81,7 +81,7 @@ TEST(BenchJudge, JudgesMeasurementsAndFigures) {
     static constexpr const char* kJudgements[] = {"information", "within", "outside",
                                                   "not measured"};
     const auto images = host::FigureGroup::Images;
-    const Row rows[] = {
+    const BenchRow rows[] = {
         {"a measurement", on({}, "LPDP", {}, kNought), {"LPDP 4 errors outside"}},
         {"both bounds", on({}, "UART", kNought, kNought), {"UART 0 errors within"}},
         {"a slip",
@@ -109,7 +109,7 @@ TEST(BenchJudge, JudgesMeasurementsAndFigures) {
          on(figureOf("amplitude", images), "", BoundRecord{50, true}, {}),
          {"image amplitude, least 50  outside"}},
     };
-    for (const Row& row : rows) {
+    for (const BenchRow& row : rows) {
         std::vector<std::string> found;
         for (const BenchResult& one : judged(row.limit, framesOf(30), runOf())) {
             found.push_back(one.name + " " + platform::Number(one.value).text() + " " + one.unit +

@@ -24,9 +24,6 @@ using host::StoreProblem;
 using testing::HasSubstr;
 namespace fs = std::filesystem;
 
-constexpr std::chrono::milliseconds kShort{300};
-constexpr std::chrono::seconds kLong{60};
-
 // Plays eight runs to a store that does not answer and is waited for once; delivers them to the real one.
 void playToSilence(const std::string& silent, Store& real, std::size_t runsThere) {
     const test::Folder spool;
@@ -60,7 +57,7 @@ TEST(Server, ThatTakesConnectionsAndSaysNothingIsWaitedForOnce) {
     ASSERT_EQ(bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
     ASSERT_EQ(listen(socket, 5), 0);
     Store real(where);
-    real.setPatience(kLong);
+    real.setPatience(test::kLong);
     playToSilence("postgresql:///runs?host=" + folder.path().string(), real, 0);
     close(socket);
 }
@@ -69,7 +66,7 @@ TEST(Server, ThatTakesConnectionsAndSaysNothingIsWaitedForOnce) {
 TEST(Server, WhoseAnswerToACommitIsLostHasTheRunOnce) {
     const std::string where = test::PostgresCluster::shared().newDatabase();
     Store real(where);
-    real.setPatience(kLong);
+    real.setPatience(test::kLong);
     real.connect();
     test::runOnPostgres(
         where,
@@ -88,7 +85,7 @@ TEST(Server, KilledUnderManyWritersHasEveryRunOnce) {
     test::PostgresCluster& server = test::PostgresCluster::shared();
     const std::string where = server.newDatabase();
     Store store(where);
-    store.setPatience(kLong);
+    store.setPatience(test::kLong);
     store.connect();
     test::Folder folder;
     const fs::path spool = folder.path() / "spool";
@@ -143,7 +140,7 @@ TEST(Server, KilledUnderManyWritersHasEveryRunOnce) {
 TEST(Server, StartedAgainTakesTheNextRun) {
     test::PostgresCluster& server = test::PostgresCluster::shared();
     Store store(server.newDatabase());
-    store.setPatience(kLong);
+    store.setPatience(test::kLong);
     for (int runs = 1; runs < 4; ++runs) {
         const host::SessionRecord session = test::storedSession();
         EXPECT_TRUE(store.write(session, session.runs.front()));
@@ -156,7 +153,7 @@ TEST(Server, StartedAgainTakesTheNextRun) {
 // After a statement that failed, the same connection and its transactions are as before.
 TEST(Server, GoesOnAfterAStatementThatFailed) {
     Store store(test::PostgresCluster::shared().newDatabase());
-    store.setPatience(kLong);
+    store.setPatience(test::kLong);
     using Cause = StoreProblem::Cause;
     const std::pair<const char*, Cause> rows[] = {
         {"SELEC 1", Cause::Unusable},
@@ -185,10 +182,10 @@ TEST(Server, GivesUpWhatItsClientGaveUp) {
     const std::string where = test::PostgresCluster::shared().newDatabase();
     Store store(where);
     store.connect();
-    store.setPatience(kShort);
+    store.setPatience(test::kShort);
     EXPECT_THROW(store.query("SELECT pg_advisory_xact_lock(1), pg_sleep(600)"), StoreProblem);
     Store other(where);
-    other.setPatience(kLong);
+    other.setPatience(test::kLong);
     EXPECT_NO_THROW(other.query("SELECT pg_advisory_xact_lock(1)"));
 }
 

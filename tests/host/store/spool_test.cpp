@@ -27,9 +27,6 @@ using host::Store;
 using testing::HasSubstr;
 
 constexpr auto kNobodyWrites = static_cast<fs::perms>(0555);
-constexpr host::Attachments kAll{.frames = true, .images = true};
-constexpr std::chrono::milliseconds kShort{300};
-constexpr std::chrono::seconds kLong{60};
 
 std::string contentOf(const fs::path& file) {
     std::ifstream stream(file, std::ios::binary);
@@ -147,7 +144,7 @@ Failure byServer(const Place& /*place*/) {
 Failure lockTable(const Place& place) {
     const std::shared_ptr<host::Database> other =
         host::openDatabase(place.where, host::Access::Existing);
-    other->setPatience(kLong);
+    other->setPatience(test::kLong);
     other->connect();
     other->begin();
     other->runScript("LOCK TABLE results");
@@ -167,7 +164,7 @@ struct FailureRow {
 // The first rows also show on a connection that is there.
 const FailureRow kFailures[] = {
     {"Away", 0, "unable to open database file", moveAway},
-    {"Locked", 0, "database is locked", lock, kShort},
+    {"Locked", 0, "database is locked", lock, test::kShort},
     {"Full", 0, "disk I/O error (File too large)", fill},
     {"ServerKilled", 1, "server",  // how far its processes have come when it is asked is luck
      byServer<&Server::kill, &Server::start>},
@@ -200,7 +197,7 @@ class FailingStore : public testing::TestWithParam<FailureRow> {
         Session(const Place& place, std::chrono::milliseconds patience)
             : listener({.where = place.where,
                         .spoolFolder = place.spool,
-                        .attachments = kAll,
+                        .attachments = test::kAll,
                         .patience = patience},
                        [this](const std::string& line) { told.push_back(line); }) {}
 
@@ -230,12 +227,12 @@ class FailingStore : public testing::TestWithParam<FailureRow> {
     }
 
     void playRest() {
-        Session session(_place, kLong);
+        Session session(_place, test::kLong);
         session.play({_runs[5]});
         EXPECT_THAT(session.told, testing::IsEmpty());
         EXPECT_EQ(Spool(_place.spool).waiting(), 0U);
         Store store(_place.where);
-        store.setPatience(kLong);
+        store.setPatience(test::kLong);
         EXPECT_EQ(test::runsIn(store), 6);
         for (const host::SessionRecord& run : _runs) {
             const auto loaded = store.load(run.runs.front().uuid);
@@ -261,7 +258,7 @@ INSTANTIATE_TEST_SUITE_P(Failures,
 
 TEST_P(FailingStore, LosesNothingAndIsToldOfOnce) {
     {
-        Session session(_place, kLong);
+        Session session(_place, test::kLong);
         session.play({_runs[0], _runs[1]});
         EXPECT_THAT(session.told, testing::IsEmpty());
     }
@@ -274,7 +271,7 @@ TEST_P(FailingStore, LosesNothingAndIsToldOfOnce) {
 }
 
 TEST_P(FailingConnection, LosesNothingAndIsToldOfOnce) {
-    Session(_place, kLong).play({_runs[0]});  // makes the schema
+    Session(_place, test::kLong).play({_runs[0]});  // makes the schema
     Session session(_place, GetParam().patience);
     session.play({_runs[1]});
     EXPECT_THAT(session.told, testing::IsEmpty());
@@ -289,7 +286,7 @@ class SpoolTest : public testing::Test {
   protected:
     host::SessionRecord add() {
         host::SessionRecord session = test::storedSession(3);
-        _spool.add(session, session.runs.front(), kAll);
+        _spool.add(session, session.runs.front(), test::kAll);
         return session;
     }
     fs::path entryOf(const host::SessionRecord& session) const {
@@ -393,7 +390,7 @@ TEST_F(SpoolTest, SetsAsideWhatTheStoreRefuses) {
                  "BEGIN SELECT RAISE(ABORT, 'bad lot'); END");
     host::SessionRecord session = test::storedSession();
     session.identity.lot = "bad";
-    _spool.add(session, session.runs.front(), kAll);
+    _spool.add(session, session.runs.front(), test::kAll);
     add();
     const Spool::Delivery delivery = _spool.deliver(store);
     EXPECT_EQ(delivery.problem, std::nullopt);
@@ -436,7 +433,7 @@ TEST_F(SpoolTest, SaysOnceThatItsFolderCannotBeChanged) {
 TEST_F(SpoolTest, TakesNoRunWithoutAUuid) {
     host::SessionRecord session = test::storedSession();
     session.runs.front().uuid = "../outside";
-    EXPECT_THROW(_spool.add(session, session.runs.front(), kAll), std::runtime_error);
+    EXPECT_THROW(_spool.add(session, session.runs.front(), test::kAll), std::runtime_error);
     EXPECT_TRUE(fs::is_empty(_place.spool));
 }
 

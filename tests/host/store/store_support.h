@@ -2,6 +2,7 @@
 #ifndef ZR_TESTS_HOST_STORE_STORE_SUPPORT_H
 #define ZR_TESTS_HOST_STORE_STORE_SUPPORT_H
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <functional>
@@ -16,6 +17,11 @@
 #include "tests/support/store_engines.h"
 
 namespace test {
+
+inline constexpr host::Attachments kAll{.frames = true, .images = true};
+// Patience with a store: with one that does not answer, and with one that will.
+inline constexpr std::chrono::milliseconds kShort{300};
+inline constexpr std::chrono::seconds kLong{60};
 
 // A folder that lives as long as the object.
 class Folder {

@@ -23,8 +23,6 @@ using host::Judgement;
 using host::Store;
 using Json = nlohmann::json;
 
-constexpr host::Attachments kAll{.frames = true, .images = true};
-
 class StoreTest : public testing::TestWithParam<test::EngineRow> {
   protected:
     std::string address() const { return GetParam().address(_folder.path()); }
@@ -58,7 +56,7 @@ TEST_P(StoreTest, GivesBackEverySampleAsItWas) {
     Store store(address());
     for (const auto& [name, session] : test::sampleRuns()) {
         const host::RunRecord& run = session.runs.front();
-        ASSERT_TRUE(store.write(session, run, kAll)) << name;
+        ASSERT_TRUE(store.write(session, run, test::kAll)) << name;
         const auto loaded = store.load(run.uuid);
         ASSERT_TRUE(loaded.has_value()) << name;
         if (name.starts_with("long")) {  // a report of it takes minutes with a sanitizer
@@ -74,7 +72,8 @@ TEST_P(StoreTest, GivesBackEverySampleAsItWas) {
         EXPECT_EQ(loaded->runs.front().uuid, run.uuid) << name;
         EXPECT_EQ(loaded->runs.front().frames.size(), run.frames.size()) << name;
 
-        const host::SessionRecord spooled = host::runFromJson(host::runToJson(session, run, kAll));
+        const host::SessionRecord spooled =
+            host::runFromJson(host::runToJson(session, run, test::kAll));
         EXPECT_EQ(reportOf(spooled), report) << name;
     }
     EXPECT_EQ(store.load(host::newUuid()), std::nullopt);
@@ -100,7 +99,7 @@ TEST_P(StoreTest, KeepsEveryNumber) {
     ASSERT_TRUE(store.write(session, run));
     const auto loaded = store.load(run.uuid);
     const host::RunRecord spooled =
-        host::runFromJson(host::runToJson(session, run, kAll)).runs.front();
+        host::runFromJson(host::runToJson(session, run, test::kAll)).runs.front();
     for (const host::RunRecord& kept : {loaded->runs.front(), spooled}) {
         ASSERT_EQ(kept.measurements.size(), std::size(numbers));
         ASSERT_EQ(kept.results.size(), std::size(numbers));

@@ -12,21 +12,40 @@ namespace {
 
 constexpr std::size_t kLongestLine = 160;
 
-// What an object or an array holds, one entry after the other; `lineStart` begins each, "" for all of it in
-// one line.
+// Appends the value in one line. False, with a part of it appended, where the text becomes longer than `longest`.
+bool appendLine(const input::Json& json, std::size_t longest, std::string& text) {
+    if (!json.is_structured() || json.empty()) {
+        text += json.dump();
+        return text.size() <= longest;
+    }
+    text += json.is_object() ? '{' : '[';
+    std::string_view separator;
+    for (const auto& [key, value] : json.items()) {
+        text += separator;
+        text += json.is_object() ? input::Json(key).dump() + ": " : "";
+        if (!appendLine(value, longest, text)) {
+            return false;
+        }
+        separator = ", ";
+    }
+    text += json.is_object() ? '}' : ']';
+    return text.size() <= longest;
+}
+
+// The value, one entry after the other, each of which `lineStart` and two spaces begin.
 std::string layOut(const input::Json& json, const std::string& lineStart) {
     if (!json.is_structured() || json.empty()) {
         return json.dump();
     }
-    const std::string entryStart = lineStart.empty() ? "" : lineStart + "  ";
+    const std::string entryStart = lineStart + "  ";
     std::string text;
     for (const auto& [key, value] : json.items()) {
-        text += text.empty() ? "" : lineStart.empty() ? ", " : ",";
+        text += text.empty() ? "" : ",";
         text += entryStart + (json.is_object() ? input::Json(key).dump() + ": " : "");
-        const std::string line = layOut(value, "");
-        text += entryStart.size() + key.size() + line.size() <= kLongestLine
-                    ? line
-                    : layOut(value, entryStart);
+        const std::size_t begin = entryStart.size() + key.size();
+        std::string line;
+        const bool fits = begin <= kLongestLine && appendLine(value, kLongestLine - begin, line);
+        text += fits ? line : layOut(value, entryStart);
     }
     text += lineStart;
     return json.is_object() ? "{" + text + "}" : "[" + text + "]";

@@ -40,7 +40,8 @@ class Folder {
 // A session of one run that passed, with as many results and a new uuid.
 host::SessionRecord storedSession(std::size_t results = 64);
 
-// Every run of the sample sessions as the only one of its session, with a uuid, and a name for messages.
+// Every run of the sample sessions, but for the long ones, as the only one of its session, with a uuid, and a
+// name for messages.
 std::vector<std::pair<std::string, host::SessionRecord>> sampleRuns();
 
 // The one whole number that the SQL selects.

@@ -26,9 +26,10 @@ endif()
 if(ZR_BUILD_FUZZ)
   target_compile_options(zr_build_flags INTERFACE -fsanitize=fuzzer-no-link)
 endif()
+# What is counted compiles with these; whatever it is linked into keeps the counts.
+set(ZR_COVERAGE_OPTIONS "")
 if(ZR_COVERAGE)
-  target_compile_options(zr_build_flags INTERFACE
-    -fprofile-instr-generate -fcoverage-mapping -fprofile-update=atomic)
+  set(ZR_COVERAGE_OPTIONS -fprofile-instr-generate -fcoverage-mapping -fprofile-update=atomic)
   target_link_options(zr_build_flags INTERFACE -fprofile-instr-generate)
 endif()
 

@@ -259,6 +259,18 @@ void addUsualTargets(StreamDescription& stream) {
     add("maximumFrameRate", FrameInterval());
 }
 
+// A counter that the description leaves out is recorded as 0: as a constant, reports and the check name it.
+void addUsualErrorCounters(StreamDescription& stream) {
+    for (const ShortName& counter : kErrorCounters) {
+        if (std::none_of(stream.errorCounters.begin(), stream.errorCounters.end(),
+                         [&](const NumberSource& each) { return each.name == counter.name; })) {
+            stream.errorCounters.push_back({.name = std::string(counter.name),
+                                            .key = std::string(counter.shortName),
+                                            .source = Constant{0}});
+        }
+    }
+}
+
 }  // namespace
 
 StreamDescription streamOf(const Node& node, const std::string& name) {
@@ -266,6 +278,7 @@ StreamDescription streamOf(const Node& node, const std::string& name) {
     StreamDescription stream = objectOf<kStreamKeys>(node);
     stream.name = name;
     addUsualTargets(stream);
+    addUsualErrorCounters(stream);
     for (const NumberSource& number : stream.metadata) {
         if (std::holds_alternative<BufferField>(number.source) && stream.metadataFormat.empty()) {
             node.fail("\"" + number.name +

@@ -27,7 +27,8 @@ TEST(Check, SaysWhatTheMachineLacksAndWhatItHasInstead) {
 
     files.write("/station.json", R"({
         "capture": {"streams": {"infrared": {
-            "portType": "front-infrared", "video": {"driver": "uvcvideo", "name": "Camera"}}}},
+            "portType": "front-infrared", "video": {"driver": "uvcvideo", "name": "Camera"},
+            "errorCounters": {"sif": {"errorBuffers": true}, "uart": {"file": "/run/events", "field": 2}}}}},
         "counters": {"channels": {
             "A": {"group": "G", "subgroup": "S", "file": "/run/events", "field": 2},
             "B": {"group": "G", "subgroup": "S", "file": "/run/none"},
@@ -53,6 +54,12 @@ TEST(Check, SaysWhatTheMachineLacksAndWhatItHasInstead) {
         "  missing   video                                  no camera matches \"video\" of the "
         "stream "
         "infrared",
+        "  ok        errorCounters/sif                      counted while streaming",
+        "  ok        errorCounters/uart                     3  /run/events",
+        "  constant  errorCounters/i2c                      0",
+        "  constant  errorCounters/mipi                     0",
+        "  constant  errorCounters/lpdp                     0",
+        "  constant  errorCounters/projector                0",
         "counters/channels",
         "  ok        A  3  /run/events",
         "  missing   B  /run/none: No such file or directory (ENOENT)",
@@ -67,7 +74,7 @@ TEST(Check, SaysWhatTheMachineLacksAndWhatItHasInstead) {
         "\"vendor\": \"0x0abc\", \"product\": \"0x00f1\"}",
         "/dev/hidraw0 is {\"vendor\": \"0xabcd\", \"product\": \"0xef01\", \"serial\": \"SN-7\"}: "
         "Other sensor",
-        "25 described, 4 found, 1 constant, 20 missing"};
+        "31 described, 6 found, 5 constant, 20 missing"};
     EXPECT_EQ(lines, expected);
     EXPECT_EQ(findings.missing, 20U);
 }

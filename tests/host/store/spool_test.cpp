@@ -230,9 +230,13 @@ class FailingStore : public testing::TestWithParam<FailureRow> {
         Session session(_place, test::kLong);
         session.play({_runs[5]});
         EXPECT_THAT(session.told, testing::IsEmpty());
-        EXPECT_EQ(Spool(_place.spool).waiting(), 0U);
+        const Spool spool(_place.spool);
+        EXPECT_LT(spool.waiting(), 3U);
         Store store(_place.where);
         store.setPatience(test::kLong);
+        // On a slow machine the time that a run has for others ends before the last of them.
+        spool.deliver(store, test::kLong);
+        EXPECT_EQ(spool.waiting(), 0U);
         EXPECT_EQ(test::runsIn(store), 6);
         for (const host::SessionRecord& run : _runs) {
             const auto loaded = store.load(run.runs.front().uuid);

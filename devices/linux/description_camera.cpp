@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <iterator>
 #include <map>
+#include <utility>
 
 #include "devices/linux/description_numbers.h"
 #include "platform/welkin/capture.h"
@@ -243,31 +244,27 @@ constexpr JsonKey<StreamDescription> kStreamKeys[] = {
     kNote<StreamDescription>,
 };
 
-// What becomes of these unless the description says something else.
-void addUsualTargets(StreamDescription& stream) {
-    const auto add = [&stream](std::string_view name, auto target) {
-        const auto& properties = stream.properties;
-        if (std::none_of(properties.begin(), properties.end(),
-                         [&](const PropertyTarget& each) { return each.name == name; })) {
-            stream.properties.push_back({.name = std::string(name), .target = target});
-        }
-    };
-    if (!stream.formats.empty()) {
-        add("formatIndex", FormatChoice());
+template <class Entry>
+void addUnlessNamed(std::vector<Entry>& entries, Entry entry) {
+    if (std::none_of(entries.begin(), entries.end(),
+                     [&](const Entry& each) { return each.name == entry.name; })) {
+        entries.push_back(std::move(entry));
     }
-    add("minimumFrameRate", FrameInterval());
-    add("maximumFrameRate", FrameInterval());
 }
 
-// A counter that the description leaves out is recorded as 0: as a constant, reports and the check name it.
-void addUsualErrorCounters(StreamDescription& stream) {
+// What holds unless the description says something else.
+void addUsual(StreamDescription& stream) {
+    if (!stream.formats.empty()) {
+        addUnlessNamed(stream.properties, {.name = "formatIndex", .target = FormatChoice()});
+    }
+    for (const char* const rate : {"minimumFrameRate", "maximumFrameRate"}) {
+        addUnlessNamed(stream.properties, {.name = rate, .target = FrameInterval()});
+    }
+    // A counter that is left out is recorded as 0: as a constant, reports and the check name it.
     for (const ShortName& counter : kErrorCounters) {
-        if (std::none_of(stream.errorCounters.begin(), stream.errorCounters.end(),
-                         [&](const NumberSource& each) { return each.name == counter.name; })) {
-            stream.errorCounters.push_back({.name = std::string(counter.name),
-                                            .key = std::string(counter.shortName),
-                                            .source = Constant{0}});
-        }
+        addUnlessNamed(stream.errorCounters, {.name = std::string(counter.name),
+                                              .key = std::string(counter.shortName),
+                                              .source = Constant{0}});
     }
 }
 
@@ -277,8 +274,7 @@ StreamDescription streamOf(const Node& node, const std::string& name) {
     node.requireKeys({"portType", "video"}, R"(needs "portType" and "video")");
     StreamDescription stream = objectOf<kStreamKeys>(node);
     stream.name = name;
-    addUsualTargets(stream);
-    addUsualErrorCounters(stream);
+    addUsual(stream);
     for (const NumberSource& number : stream.metadata) {
         if (std::holds_alternative<BufferField>(number.source) && stream.metadataFormat.empty()) {
             node.fail("\"" + number.name +

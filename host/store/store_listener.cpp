@@ -14,15 +14,13 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-// For how long a run that ended may bring others with it.
-constexpr std::chrono::milliseconds kDeliveryTime{1000};
-
 }  // namespace
 
 StoreListener::StoreListener(const StoreOptions& options, Complain complain)
     : _store(options.where)
     , _spool(options.spoolFolder)
     , _attachments(options.attachments)
+    , _deliveryTime(options.deliveryTime)
     , _complain(std::move(complain))
     , _patience(options.patience) {}
 
@@ -62,7 +60,7 @@ void StoreListener::_keep(const RunRecord& run) {
 
 void StoreListener::_deliver() {
     const auto start = Clock::now();
-    const Spool::Delivery delivery = _spool.deliver(_store, kDeliveryTime);
+    const Spool::Delivery delivery = _spool.deliver(_store, _deliveryTime);
     for (const std::string& line : delivery.setAside) {
         _complain(
             fmt::format("store {}: a run that waited was set aside: {}", _store.name(), line));

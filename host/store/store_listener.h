@@ -19,13 +19,15 @@ struct StoreOptions {
     Attachments attachments = {};
     // How long a session waits for a store that does not work, over all its runs. Then it spools.
     std::chrono::milliseconds patience{2000};
+    // For how long a run that ended may bring others with it, out of the spool.
+    std::chrono::milliseconds deliveryTime{1000};
 };
 
 // A listener of a session. Nothing that a store does changes a run or its verdict, and nothing is thrown once
 // the session has started.
 //
-// A run is written when it ends; then runs that wait in the spool are delivered, for at most a second. A run
-// that the store does not take goes to the spool. A store that failed is tried again with the next run, until
+// A run is written when it ends; then runs that wait in the spool are delivered, for at most the delivery
+// time. A run that the store does not take goes to the spool. A store that failed is tried again with the next run, until
 // the waiting for it has used up the session's patience.
 class StoreListener : public RunListener {
   public:
@@ -48,6 +50,7 @@ class StoreListener : public RunListener {
     Store _store;
     const Spool _spool;
     const Attachments _attachments;
+    const std::chrono::milliseconds _deliveryTime;
     const Complain _complain;
     const SessionRecord* _session = nullptr;  // the caller's
     std::chrono::milliseconds _patience;      // what is left of it

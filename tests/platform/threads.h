@@ -3,6 +3,7 @@
 #define ZR_TESTS_PLATFORM_THREADS_H
 
 #include <cstddef>
+#include <ctime>
 #include <filesystem>
 #include <fstream>
 #include <map>
@@ -48,6 +49,13 @@ inline std::map<std::string, std::size_t> threadNames() {
 
 inline std::size_t threadsNamed(const std::string& name) {
     return threadNames()[name];
+}
+
+// The processor time that the calling thread has used.
+inline double threadSeconds() {
+    timespec used{};
+    clock_gettime(CLOCK_THREAD_CPUTIME_ID, &used);
+    return static_cast<double>(used.tv_sec) + static_cast<double>(used.tv_nsec) * 1e-9;
 }
 
 // As long as it lives, no thread can be started: each would need a stack beyond the address space.

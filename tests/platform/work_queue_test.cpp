@@ -28,6 +28,7 @@ using Clock = std::chrono::steady_clock;
 using Priority = platform::WorkQueue::Priority;
 using std::chrono::nanoseconds;
 using test::eventually;
+using test::threadSeconds;
 using test::threadsNamed;
 
 TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
@@ -52,12 +53,6 @@ TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
         ASSERT_EQ(items.size(), static_cast<std::size_t>(kItemsEach));
         EXPECT_TRUE(std::is_sorted(items.begin(), items.end()));
     }
-}
-
-double threadSeconds() {
-    timespec used{};
-    clock_gettime(CLOCK_THREAD_CPUTIME_ID, &used);
-    return static_cast<double>(used.tv_sec) + static_cast<double>(used.tv_nsec) * 1e-9;
 }
 
 TEST(WorkQueue, WaitsForAnItemWithoutWork) {

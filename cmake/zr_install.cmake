@@ -14,14 +14,20 @@ set_target_properties(zrlab PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_p
 set_target_properties(zr_platform zr_host_interface zr_devices PROPERTIES INSTALL_RPATH "$ORIGIN")
 set_target_properties(zr_plugin zr_store_sqlite zr_store_postgres PROPERTIES INSTALL_RPATH "$ORIGIN/..")
 install(TARGETS zrlab)
-install(TARGETS zr_platform zr_host_interface zr_devices EXPORT zrlab-targets INCLUDES DESTINATION "${headers}")
+install(TARGETS zr_platform zr_host_interface zr_devices zr_faulty
+  EXPORT zrlab-targets INCLUDES DESTINATION "${headers}")
 install(TARGETS zr_plugin zr_store_sqlite zr_store_postgres LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/zrlab")
 
-# What plug-ins and device modules are built against.
+# What plug-ins, device modules and tests of them are built against.
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/platform" DESTINATION "${headers}"
   FILES_MATCHING PATTERN "*.h")
 install(FILES "${PROJECT_SOURCE_DIR}/frame/host_interface.h" DESTINATION "${headers}/frame")
 install(FILES "${PROJECT_SOURCE_DIR}/devices/device.h" DESTINATION "${headers}/devices")
+install(
+  FILES
+    "${PROJECT_SOURCE_DIR}/devices/faulty/fault.h"
+    "${PROJECT_SOURCE_DIR}/devices/faulty/faulty_device.h"
+  DESTINATION "${headers}/devices/faulty")
 configure_package_config_file(
   "${PROJECT_SOURCE_DIR}/cmake/package/zrlab-config.cmake.in"
   "${PROJECT_BINARY_DIR}/package/zrlab-config.cmake"

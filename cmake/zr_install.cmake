@@ -22,7 +22,8 @@ install(TARGETS zr_plugin zr_store_sqlite zr_store_postgres LIBRARY DESTINATION 
 install(DIRECTORY "${PROJECT_SOURCE_DIR}/platform" DESTINATION "${headers}"
   FILES_MATCHING PATTERN "*.h")
 install(FILES "${PROJECT_SOURCE_DIR}/frame/host_interface.h" DESTINATION "${headers}/frame")
-install(FILES "${PROJECT_SOURCE_DIR}/devices/device.h" DESTINATION "${headers}/devices")
+file(GLOB device_headers CONFIGURE_DEPENDS "${PROJECT_SOURCE_DIR}/devices/*.h")
+install(FILES ${device_headers} DESTINATION "${headers}/devices")
 install(
   FILES
     "${PROJECT_SOURCE_DIR}/devices/faulty/fault.h"

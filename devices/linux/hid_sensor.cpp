@@ -2,7 +2,6 @@
 
 #include <cerrno>
 #include <cstddef>
-#include <deque>
 #include <string>
 #include <utility>
 
@@ -15,6 +14,7 @@
 #include "devices/linux/file_descriptor.h"
 #include "devices/linux/system_problem.h"
 #include "devices/linux/waker.h"
+#include "devices/report_delivery.h"
 #include "devices/usage_match.h"
 #include "platform/number.h"
 #include "platform/sync.h"
@@ -28,7 +28,6 @@ using platform::ErrorSlot;
 using platform::MutexLock;
 using platform::RunLoop;
 
-constexpr std::size_t kMostQueued = 64;
 constexpr std::size_t kLongestReport = 16384;  // HID_MAX_BUFFER_SIZE of the kernel
 
 // A report, or the error that ends them.
@@ -54,7 +53,9 @@ class HidSensor final : public WLIOHIDDeviceInterface,
     }
 
     bool open(ErrorSlot error) override;
-    void setInputReportCallback(WLHIDInputReportCallback callback) override;
+    void setInputReportCallback(WLHIDInputReportCallback callback) override {
+        _callback.set(std::move(callback));
+    }
     bool setFeatureReportWithID(std::int64_t reportID,
                                 std::span<const std::byte> data,
                                 ErrorSlot error) override;
@@ -65,17 +66,13 @@ class HidSensor final : public WLIOHIDDeviceInterface,
     bool close(ErrorSlot error) override;
 
   private:
-    using Callback = std::shared_ptr<const WLHIDInputReportCallback>;
     using File = std::shared_ptr<const FileDescriptor>;
 
-    // The device on a run loop. The reports that still wait when it ends are lost.
+    // The device on a run loop, and what its thread reads meanwhile.
     struct Delivery {
-        std::weak_ptr<RunLoop> runLoop;
-        std::string mode;
         File file;
-        std::shared_ptr<platform::RunLoopSource> source = nullptr;
+        std::shared_ptr<devices::ReportDelivery<InputReport>> reports;
         Waker end = {};
-        std::deque<InputReport> queue = {};  // guarded by the sensor's mutex
     };
     using DeliveryRef = std::shared_ptr<Delivery>;
 
@@ -87,19 +84,17 @@ class HidSensor final : public WLIOHIDDeviceInterface,
     // The device's thread.
     void _read(const DeliveryRef& delivery);
     InputReport _nextReport(const Delivery& delivery, std::vector<std::byte>& buffer) const;
-    bool _awaitRoom(const DeliveryRef& delivery);
-    bool _enqueue(const DeliveryRef& delivery, InputReport report);
 
     // The run loop's thread.
-    void _deliverOne(const DeliveryRef& delivery);
+    bool _receive(const InputReport& report);
 
     const HidNode _node;
     const Machine _machine;
 
+    devices::ReportCallback _callback;
+
     platform::Mutex _mutex;
-    platform::Condition _changed;
-    File _file ZR_GUARDED_BY(_mutex);  // null while it is closed
-    Callback _callback ZR_GUARDED_BY(_mutex);
+    File _file ZR_GUARDED_BY(_mutex);             // null while it is closed
     DeliveryRef _delivery ZR_GUARDED_BY(_mutex);  // null while it is not scheduled
 };
 
@@ -117,15 +112,6 @@ bool HidSensor::open(ErrorSlot error) {
         _file = file;
         return true;
     });
-}
-
-void HidSensor::setInputReportCallback(WLHIDInputReportCallback callback) {
-    Callback other;  // the one before goes without the lock: it may own anything
-    if (callback) {
-        other = std::make_shared<const WLHIDInputReportCallback>(std::move(callback));
-    }
-    const MutexLock lock(_mutex);
-    _callback.swap(other);
 }
 
 bool HidSensor::setFeatureReportWithID(std::int64_t reportID,
@@ -156,17 +142,12 @@ void HidSensor::scheduleWithRunLoop(const std::shared_ptr<RunLoop>& runLoop,
         return;
     }
     _endDelivery();
-    const auto delivery = std::make_shared<Delivery>(
-        Delivery{.runLoop = runLoop, .mode = std::string(mode), .file = file});
-    delivery->source = std::make_shared<platform::RunLoopSource>(
-        [weakSelf = weak_from_this(), weakDelivery = std::weak_ptr(delivery)] {
-            const auto self = weakSelf.lock();
-            const auto delivery = weakDelivery.lock();
-            if (self != nullptr && delivery != nullptr) {
-                self->_deliverOne(delivery);
-            }
+    auto reports = devices::ReportDelivery<InputReport>::start(
+        runLoop, mode, [weak = weak_from_this()](const InputReport& report) {
+            const auto self = weak.lock();
+            return self != nullptr && self->_receive(report);
         });
-    runLoop->addSource(delivery->source, mode);
+    const auto delivery = std::make_shared<Delivery>(Delivery{file, std::move(reports)});
     {
         const MutexLock lock(_mutex);
         _delivery = delivery;
@@ -177,7 +158,7 @@ void HidSensor::scheduleWithRunLoop(const std::shared_ptr<RunLoop>& runLoop,
 void HidSensor::unscheduleFromRunLoop(const std::shared_ptr<RunLoop>& runLoop,
                                       std::string_view mode) {
     const DeliveryRef delivery = _currentDelivery();
-    if (delivery != nullptr && delivery->runLoop.lock() == runLoop && delivery->mode == mode) {
+    if (delivery != nullptr && delivery->reports->isOn(runLoop, mode)) {
         _endDelivery();
     }
 }
@@ -215,27 +196,20 @@ void HidSensor::_endDelivery() {
     {
         const MutexLock lock(_mutex);
         ended.swap(_delivery);
-        _changed.notifyAll();
     }
     if (ended != nullptr) {
+        ended->reports->end();
         ended->end.wake();
-        if (const auto runLoop = ended->runLoop.lock()) {
-            runLoop->removeSource(ended->source, ended->mode);
-        }
     }
 }
 
 void HidSensor::_read(const DeliveryRef& delivery) {
     pthread_setname_np(pthread_self(), "hid reader");
     std::vector<std::byte> buffer(kLongestReport + 1);
-    while (_awaitRoom(delivery)) {
+    while (delivery->reports->awaitRoom()) {
         InputReport report = _nextReport(*delivery, buffer);
         const bool isLast = report.error != nullptr;
-        if (!_enqueue(delivery, std::move(report))) {
-            return;
-        }
-        delivery->source->signal();
-        if (isLast) {
+        if (!delivery->reports->add(std::move(report)) || isLast) {
             return;
         }
     }
@@ -271,49 +245,10 @@ InputReport HidSensor::_nextReport(const Delivery& delivery, std::vector<std::by
     }
 }
 
-// Waits until a report has room; false when the delivery has ended.
-bool HidSensor::_awaitRoom(const DeliveryRef& delivery) {
-    const MutexLock lock(_mutex);
-    while (_delivery == delivery && delivery->queue.size() == kMostQueued) {
-        _changed.wait(_mutex);
-    }
-    return _delivery == delivery;
-}
-
-bool HidSensor::_enqueue(const DeliveryRef& delivery, InputReport report) {
-    const MutexLock lock(_mutex);
-    if (_delivery != delivery) {
-        return false;
-    }
-    delivery->queue.push_back(std::move(report));
-    return true;
-}
-
-void HidSensor::_deliverOne(const DeliveryRef& delivery) {
-    InputReport report;
-    Callback callback;
-    bool more;
-    {
-        const MutexLock lock(_mutex);
-        if (_delivery != delivery || delivery->queue.empty()) {
-            return;
-        }
-        report = std::move(delivery->queue.front());
-        delivery->queue.pop_front();
-        more = !delivery->queue.empty();
-        _changed.notifyAll();
-        callback = _callback;
-    }
-    if (more) {
-        delivery->source->signal();
-    }
-    if (report.error != nullptr) {
-        _endDelivery();
-    }
-    if (callback != nullptr) {
-        const auto id = report.data.empty() ? 0 : std::to_integer<std::int64_t>(report.data[0]);
-        (*callback)(id, report.data, report.error);
-    }
+bool HidSensor::_receive(const InputReport& report) {
+    const auto id = report.data.empty() ? 0 : std::to_integer<std::int64_t>(report.data[0]);
+    _callback.call(id, report.data, report.error);
+    return report.error == nullptr;
 }
 
 class LinuxManager final : public WLHIDManager {

@@ -1,7 +1,6 @@
 #include "devices/simulator/hid_sensor.h"
 
 #include <chrono>
-#include <deque>
 #include <set>
 #include <string_view>
 #include <thread>
@@ -9,6 +8,7 @@
 
 #include <pthread.h>
 
+#include "devices/report_delivery.h"
 #include "devices/simulator/due_time.h"
 #include "devices/simulator/image_report.h"
 #include "devices/usage_match.h"
@@ -23,8 +23,6 @@ using platform::ErrorSlot;
 using platform::MutexLock;
 using platform::RunLoop;
 using Clock = std::chrono::steady_clock;
-
-constexpr std::size_t kMostQueued = 64;
 
 // The feature reports that set the modes which the sensor needs for images, and the value of both.
 constexpr std::int64_t kPowerModeReportID = 171;
@@ -46,7 +44,9 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
     }
 
     bool open(ErrorSlot error) override;
-    void setInputReportCallback(WLHIDInputReportCallback callback) override;
+    void setInputReportCallback(WLHIDInputReportCallback callback) override {
+        _callback.set(std::move(callback));
+    }
     bool setFeatureReportWithID(std::int64_t reportID,
                                 std::span<const std::byte> data,
                                 ErrorSlot error) override;
@@ -58,16 +58,7 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
 
   private:
     enum class State { Closed, Open, Unplugged };
-    using Callback = std::shared_ptr<const WLHIDInputReportCallback>;
-
-    // The device on a run loop. The reports that still wait when it ends are lost.
-    struct Delivery {
-        std::weak_ptr<RunLoop> runLoop;
-        std::string mode;
-        std::shared_ptr<platform::RunLoopSource> source;
-        bool producing = false;  // these two are guarded by the sensor's mutex
-        std::deque<SensorReport> queue;
-    };
+    using Delivery = devices::ReportDelivery<SensorReport>;
     using DeliveryRef = std::shared_ptr<Delivery>;
 
     bool _isOpen();
@@ -78,20 +69,21 @@ class Sensor final : public WLIOHIDDeviceInterface, public std::enable_shared_fr
     // The sensor's thread.
     void _startProducing();
     void _produce(const DeliveryRef& delivery, std::uint64_t number);
-    bool _enqueue(const DeliveryRef& delivery, SensorReport report, Clock::time_point due);
+    bool _take(const DeliveryRef& delivery, std::uint64_t number);
 
     // The run loop's thread.
-    void _deliverOne(const DeliveryRef& delivery);
+    bool _receive(const SensorReport& report);
 
     const HidDeviceProfile _profile;
     const double _speed;
 
+    devices::ReportCallback _callback;
+
     platform::Mutex _mutex;
-    platform::Condition _changed;
     State _state ZR_GUARDED_BY(_mutex) = State::Closed;
     std::set<std::int64_t> _modesOn ZR_GUARDED_BY(_mutex);  // by the ID of their feature report
-    Callback _callback ZR_GUARDED_BY(_mutex);
-    DeliveryRef _delivery ZR_GUARDED_BY(_mutex);  // null while it is not scheduled
+    DeliveryRef _delivery ZR_GUARDED_BY(_mutex);            // null while it is not scheduled
+    bool _isProducing ZR_GUARDED_BY(_mutex) = false;        // for the delivery
     std::uint64_t _nextReport ZR_GUARDED_BY(_mutex) = 1;
 };
 
@@ -103,15 +95,6 @@ bool Sensor::open(ErrorSlot error) {
     _state = State::Open;
     _nextReport = 1;
     return true;
-}
-
-void Sensor::setInputReportCallback(WLHIDInputReportCallback callback) {
-    Callback other;  // the one before goes without the lock: it may own anything
-    if (callback) {
-        other = std::make_shared<const WLHIDInputReportCallback>(std::move(callback));
-    }
-    const MutexLock lock(_mutex);
-    _callback.swap(other);
 }
 
 bool Sensor::setFeatureReportWithID(std::int64_t reportID,
@@ -137,28 +120,22 @@ void Sensor::scheduleWithRunLoop(const std::shared_ptr<RunLoop>& runLoop, std::s
         return;
     }
     _endDelivery();
-    const auto delivery = std::make_shared<Delivery>();
-    delivery->runLoop = runLoop;
-    delivery->mode = mode;
-    delivery->source = std::make_shared<platform::RunLoopSource>(
-        [weakSelf = weak_from_this(), weakDelivery = std::weak_ptr(delivery)] {
-            const auto self = weakSelf.lock();
-            const auto delivery = weakDelivery.lock();
-            if (self != nullptr && delivery != nullptr) {
-                self->_deliverOne(delivery);
-            }
+    DeliveryRef delivery =
+        Delivery::start(runLoop, mode, [weak = weak_from_this()](const SensorReport& report) {
+            const auto self = weak.lock();
+            return self != nullptr && self->_receive(report);
         });
-    runLoop->addSource(delivery->source, mode);
     {
         const MutexLock lock(_mutex);
-        _delivery = delivery;
+        _delivery = std::move(delivery);
+        _isProducing = false;
     }
     _startProducing();
 }
 
 void Sensor::unscheduleFromRunLoop(const std::shared_ptr<RunLoop>& runLoop, std::string_view mode) {
     const DeliveryRef delivery = _currentDelivery();
-    if (delivery != nullptr && delivery->runLoop.lock() == runLoop && delivery->mode == mode) {
+    if (delivery != nullptr && delivery->isOn(runLoop, mode)) {
         _endDelivery();
     }
 }
@@ -178,9 +155,7 @@ bool Sensor::close(ErrorSlot error) {
 
 void Sensor::_letGo() {
     _endDelivery();
-    Callback dropped;  // without the lock
-    const MutexLock lock(_mutex);
-    _callback.swap(dropped);
+    _callback.set({});
 }
 
 bool Sensor::_isOpen() {
@@ -198,12 +173,9 @@ void Sensor::_endDelivery() {
     {
         const MutexLock lock(_mutex);
         ended.swap(_delivery);
-        _changed.notifyAll();
     }
     if (ended != nullptr) {
-        if (const auto runLoop = ended->runLoop.lock()) {
-            runLoop->removeSource(ended->source, ended->mode);
-        }
+        ended->end();
     }
 }
 
@@ -213,7 +185,7 @@ void Sensor::_startProducing() {
     const bool ready = !_profile.needsFeatureReports || (_modesOn.contains(kPowerModeReportID) &&
                                                          _modesOn.contains(kStreamingModeReportID));
     if (ready && _profile.reportsPerSecond > 0 && _delivery != nullptr &&
-        !std::exchange(_delivery->producing, true)) {
+        !std::exchange(_isProducing, true)) {
         std::thread([self = shared_from_this(), delivery = _delivery, number = _nextReport] {
             self->_produce(delivery, number);
         }).detach();
@@ -229,61 +201,31 @@ void Sensor::_produce(const DeliveryRef& delivery, std::uint64_t number) {
         const bool last = report->unplugged;
         const auto reports = static_cast<double>(report->number - before);
         const auto due = dueTime(started, reports / _profile.reportsPerSecond, _speed);
-        if (!_enqueue(delivery, std::move(*report), due)) {
-            return;
-        }
-        delivery->source->signal();
-        if (last) {
+        if (!delivery->awaitTime(due) || !delivery->awaitRoom() ||
+            !_take(delivery, report->number) || !delivery->add(std::move(*report)) || last) {
             return;
         }
     }
 }
 
-// Waits until the report is due and has room; false when the delivery has ended.
-bool Sensor::_enqueue(const DeliveryRef& delivery, SensorReport report, Clock::time_point due) {
+// The next delivery begins after that report; false when the one that asks is not the sensor's any more.
+bool Sensor::_take(const DeliveryRef& delivery, std::uint64_t number) {
     const MutexLock lock(_mutex);
-    for (;;) {
-        if (_delivery != delivery) {
-            return false;
-        }
-        if (Clock::now() < due) {
-            _changed.waitUntil(_mutex, due);
-        } else if (delivery->queue.size() == kMostQueued) {
-            _changed.wait(_mutex);
-        } else {
-            _nextReport = report.number + 1;
-            delivery->queue.push_back(std::move(report));
-            return true;
-        }
+    if (_delivery != delivery) {
+        return false;
     }
+    _nextReport = number + 1;
+    return true;
 }
 
-void Sensor::_deliverOne(const DeliveryRef& delivery) {
-    SensorReport report;
-    Callback callback;
-    bool more;
-    {
-        const MutexLock lock(_mutex);
-        if (_delivery != delivery || delivery->queue.empty()) {
-            return;
-        }
-        report = std::move(delivery->queue.front());
-        delivery->queue.pop_front();
-        more = !delivery->queue.empty();
-        _changed.notifyAll();
-        callback = _callback;
-        if (report.unplugged) {
-            _state = State::Unplugged;
-        }
-    }
-    if (more) {
-        delivery->source->signal();
-    }
+bool Sensor::_receive(const SensorReport& report) {
     if (report.unplugged) {
-        _endDelivery();
-    } else if (callback != nullptr) {
-        (*callback)(report.id, report.data, report.error);
+        const MutexLock lock(_mutex);
+        _state = State::Unplugged;
+        return false;
     }
+    _callback.call(report.id, report.data, report.error);
+    return true;
 }
 
 // What a facility and its managers share.

@@ -8,6 +8,7 @@
 #include <map>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <variant>
 #include <vector>
@@ -77,6 +78,11 @@ struct UsbIdentity {
     std::optional<std::uint16_t> vendor = {};
     std::optional<std::uint16_t> product = {};
     std::string serial = {};
+
+    bool matches(std::uint16_t isVendor, std::uint16_t isProduct, std::string_view isSerial) const {
+        return vendor.value_or(isVendor) == isVendor && product.value_or(isProduct) == isProduct &&
+               (serial.empty() || serial == isSerial);
+    }
 };
 
 struct VideoMatch {

@@ -46,18 +46,11 @@ HidNode readNode(const Machine& machine, const std::string& name) {
     return node;
 }
 
-template <class T>
-bool isMeant(const std::optional<T>& wanted, const T& is) {
-    return !wanted.has_value() || *wanted == is;
-}
-
 }  // namespace
 
 bool matches(const HidNode& node, const HidDescription& described) {
-    const UsbIdentity& identity = described.identity;
-    return isMeant(described.bus, node.bus) && isMeant(identity.vendor, node.vendor) &&
-           isMeant(identity.product, node.product) &&
-           (identity.serial.empty() || identity.serial == node.serial);
+    return described.bus.value_or(node.bus) == node.bus &&
+           described.identity.matches(node.vendor, node.product, node.serial);
 }
 
 std::vector<HidNode> findHidNodes(const Machine& machine,

@@ -48,11 +48,9 @@ bool matches(const VideoNode& node, const VideoMatch& described) {
     const auto isMeant = [](const std::string& wanted, const std::string& is) {
         return wanted.empty() || wanted == is;
     };
-    const UsbIdentity& usb = described.usb;
     return isMeant(described.driver, node.driver) && isMeant(described.name, node.name) &&
-           isMeant(usb.serial, node.serial) && described.index.value_or(node.index) == node.index &&
-           usb.vendor.value_or(node.vendor) == node.vendor &&
-           usb.product.value_or(node.product) == node.product;
+           described.index.value_or(node.index) == node.index &&
+           described.usb.matches(node.vendor, node.product, node.serial);
 }
 
 }  // namespace linux_device

@@ -149,11 +149,10 @@ class FaultPairs : public test::Sweep {
             }
         };
         EXPECT_TRUE(ending.exception.empty() || ending.exception == "No HID Manager available?!");
-        const bool hasNone = ending.error == kUntouched;
         if (!withSlot) {
-            EXPECT_TRUE(hasNone && ending.teardownError == kUntouched);
-            return;
+            return;  // there is nothing to look at: a write would have ended the process
         }
+        const bool hasNone = ending.error == kUntouched;
         if (!hasNone) {
             checkSlot(ending.error);
         }

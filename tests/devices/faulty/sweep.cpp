@@ -1,6 +1,7 @@
 #include "tests/devices/faulty/sweep.h"
 
 #include <algorithm>
+#include <chrono>
 #include <thread>
 
 #include "devices/observed/capture.h"
@@ -63,6 +64,7 @@ platform::Services makeSmallDevice() {
     simulator::DeviceProfile profile;
     simulator::StreamProfile& camera = profile.capture.streams.back();
     camera.jitterMicroseconds = 0;
+    camera.events = {{.frame = 1, .code = 1}};
     camera.errorCounters = platform::Dictionary{
         {kRylCaptureStreamPropertyValue_I2CErrorCount, 1},
         {kRylCaptureStreamPropertyValue_MIPIErrorCount, 2},
@@ -120,11 +122,17 @@ Ending Sweep::run(const Subject& subject,
     const platform::ErrorSlot slot = withSlot ? &ending.error : nullptr;
     if (setup == nullptr ||
         setup->setupWithParameters(subject.parameters(timeout), nullptr, slot)) {
+        using Clock = std::chrono::steady_clock;
+        const Clock::time_point began = Clock::now();
         try {
             ending.result = experiment->run(slot);
         } catch (const std::exception& failure) {
             ending.exception = failure.what();
         }
+        // A stop that is lost would show in nothing else: a run that times out has a result.
+        const std::chrono::duration<double> seconds = Clock::now() - began;
+        EXPECT_TRUE(timeout == 0 || timeout < subject.generous || seconds.count() < timeout)
+            << "it waited for its time-out";
         if (auto* teardown = dynamic_cast<ZRTeardown*>(experiment.get())) {
             ending.isTornDown = teardown->teardown(withSlot ? &ending.teardownError : nullptr);
         }

@@ -162,7 +162,7 @@ class Suite {
             add(name, identity.*text);
         }
         for (const auto& [name, text] : identity.metadata) {
-            add("meta." + name, text);
+            _property("meta." + name, text);
         }
     }
 

@@ -71,7 +71,7 @@ TEST(ReportForms, EachNamesTheUnitAndThePlace) {
          {R"(name="uuid" value="6f0c1c1e-)", R"(name="unit" value="SN-7")",
           R"(name="part" value="P-1")", R"(name="lot" value="L&lt;2>")",
           R"(name="station" value="bench-3")", R"(name="operator" value="Ann")",
-          R"(name="meta.fixture" value="7")"}},
+          R"(name="meta.fixture" value="7")", R"(name="meta.note" value="")"}},
         {"html",
          {"· SN-7 · zrlab</title>", "<dt>Unit</dt><dd>SN-7</dd>", "<dt>Part</dt><dd>P-1</dd>",
           "<dt>Lot</dt><dd>L&lt;2&gt;</dd>", "<dt>Station</dt><dd>bench-3</dd>",

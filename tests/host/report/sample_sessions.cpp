@@ -263,7 +263,7 @@ SessionRecord identifiedSession() {
         .lot = "L<2>",
         .station = "bench-3",
         .operatorName = "Ann",
-        .metadata = {{"fixture", "7"}, {"unit", "of measure"}, {kHostile, kHostile}}};
+        .metadata = {{"fixture", "7"}, {"unit", "of measure"}, {"note", ""}, {kHostile, kHostile}}};
     session.runs.front().uuid = "6f0c1c1e-58a9-4c53-9e0e-3f3f4c0a7d11";
     return session;
 }

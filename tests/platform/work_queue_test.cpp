@@ -68,7 +68,8 @@ TEST(WorkQueue, WaitsForAnItemWithoutWork) {
         done.count_down();
     });
     done.wait();
-    EXPECT_LT(used, std::chrono::duration<double>(kWait).count() / 4);
+    // On a busy machine a thread that does not sleep gets a part of the time only.
+    EXPECT_LT(used, std::chrono::duration<double>(kWait).count() / 20);
 }
 
 // What an item captured moves with it, whether it lies inside the item or not, and goes once.

@@ -87,8 +87,11 @@ namespace {
 
 using Seconds = std::chrono::duration<double>;
 
-constexpr Seconds kTimeout{0.02};     // a run's: it keeps its experiment for so long
-constexpr Seconds kLongTimeout{5};    // of a run that must not end by it
+constexpr Seconds kTimeout{0.02};   // a run's: it keeps its experiment for so long
+constexpr Seconds kLongTimeout{3};  // of a run that must not end by it
+// Of the device. Its client is done with a frame before the next one, so that the allocations come in the same order
+// in each run.
+constexpr double kSpeed = 30;
 constexpr std::size_t kAskedFor = 3;  // frames or images
 
 // What a child reports as its exit status. It ends by a signal when an exception leaves a thread.
@@ -136,7 +139,7 @@ platform::Services makeDevice() {
         channel.riseAtFrame = 1;
         channel.riseBy = ++number;
     }
-    return simulator::makeDevice(profile, 0);
+    return simulator::makeDevice(profile, kSpeed);
 }
 
 // What a run of the host comes to.

@@ -85,16 +85,15 @@ class ReportDelivery {
         return true;
     }
 
-    // The loop loses its source, and the reports that wait are lost; one that is being received goes on.
+    // The loop loses its source, and the reports that wait are not received; one that is being received goes on.
     void end() {
-        std::deque<Report> lost;  // without the lock
         {
             const platform::MutexLock lock(_mutex);
             _hasEnded = true;
-            lost.swap(_waiting);
             _changed.notifyAll();
         }
-        if (const auto runLoop = _runLoop.lock()) {
+        const auto runLoop = _runLoop.lock();
+        if (runLoop != nullptr && _source != nullptr) {  // null when there was no memory for it
             runLoop->removeSource(_source, _mode);
         }
     }
@@ -108,7 +107,7 @@ class ReportDelivery {
         bool more;
         {
             const platform::MutexLock lock(_mutex);
-            if (_waiting.empty()) {
+            if (_hasEnded || _waiting.empty()) {
                 return;
             }
             report = std::move(_waiting.front());

@@ -182,7 +182,7 @@ std::vector<Scenario> queueScenarios() {
         {"queue.owner-leaves-inside-item", ownerLeavesInsideItem, 3},
         {"queue.delayed-after-owner", delayedAfterOwner, 3},
         {"queue.hold-ends-inside-item", holdEndsInsideItem, 3},
-        {"queue.hold-and-owner-end", holdAndOwnerEnd, 2},
+        {"queue.hold-and-owner-end", holdAndOwnerEnd, 3},
         {"queue.items-come-fast", itemsComeFast, 3},
         {"queue.starts-fail", startsFail, 3},
     };

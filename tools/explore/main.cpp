@@ -246,7 +246,7 @@ int main(int argc, char** argv) {
         fmt::print(
             "{}: {} with at most {} preemptions, {} random orders{}: passed\n", scenario.name,
             explored.isAll ? fmt::format("all {} orders", explored.orders)
-                           : fmt::format("CUT: the first {} orders, not all", explored.orders),
+                           : fmt::format("CUT: the first {} orders, not all,", explored.orders),
             preemptions, seeds, counts);
         std::fflush(stdout);
     }

@@ -1,5 +1,6 @@
 // The fault experiment's stop: every trigger against every other, frames that come after it, a host that
 // lets go.
+#include <algorithm>
 #include <map>
 #include <memory>
 #include <string>
@@ -23,11 +24,18 @@ namespace {
 enum class Frame { Lit, Unlit, WithoutMetadata };
 enum class Trigger { None, LastFrame, UnlitFrame, BadMetadata, TimeOut };
 
+constexpr std::string_view firstIs(Trigger trigger) {
+    constexpr std::string_view kNames[] = {"nothing", "last frame first", "unlit frame first",
+                                           "bad metadata first", "time-out first"};
+    return kNames[static_cast<std::size_t>(trigger)];
+}
+
 struct Settings {
     std::vector<Frame> frames;
     int stopCount;
-    bool hostKeeps = false;         // the experiment, until everything has ended
-    bool stopWaits = false;         // for a handler in progress
+    std::vector<Trigger> frameTriggers;  // that come first in some orders; the time-out in others
+    bool hostKeeps = false;              // the experiment, until everything has ended
+    bool stopWaits = false;              // for a handler in progress
     bool firstInsideStart = false;  // the service delivers its first frame before start() returns
 };
 
@@ -125,6 +133,9 @@ class Camera final : public test::OneStreamCapture {
         step("stop");
         expect(++_witness->stops == 1, "the stream is stopped twice");
         _witness->first = _witness->asks[thisThread()];
+        expect(
+            _witness->first != Trigger::TimeOut || _settings.frameTriggers.empty() || !stoodStill(),
+            "the frames did not stop the stream");
         if (_settings.stopWaits) {
             const platform::MutexLock lock(_mutex);
             while (_inside) {
@@ -230,6 +241,13 @@ std::function<void()> run(const Settings& settings) {
         expect(settings.hostKeeps ? received == settings.frames.size()
                                   : received <= settings.frames.size(),
                "{} frames were received", received);
+        const auto whole =
+            std::count_if(settings.frames.begin(),
+                          settings.frames.begin() + static_cast<std::ptrdiff_t>(witness->counted),
+                          [](Frame frame) { return frame != Frame::WithoutMetadata; });
+        expect(witness->processed == static_cast<std::uint64_t>(whole),
+               "{} of {} counted frames were processed", witness->processed, whole);
+        reach(firstIs(witness->first));
         for (const auto& buffer : witness->buffers) {
             expect(buffer.expired(), "a buffer is kept");
         }
@@ -241,25 +259,43 @@ std::function<void()> run(const Settings& settings) {
 }  // namespace
 
 std::vector<Scenario> faultStopScenarios() {
-    const auto scenario = [](std::string_view name, const Settings& settings, unsigned most) {
-        return Scenario{name, [settings] { return run(settings); }, most};
+    const auto scenario = [](std::string_view name, const Settings& settings) {
+        Scenario made{name, [settings] { return run(settings); }, 1, {firstIs(Trigger::TimeOut)}};
+        for (const Trigger trigger : settings.frameTriggers) {
+            made.reaches.push_back(firstIs(trigger));
+        }
+        return made;
     };
     using enum Frame;
+    using enum Trigger;
     return {
-        scenario("fault-stop.last-frame", {.frames = {Lit}, .stopCount = 1}, 1),
-        scenario("fault-stop.unlit-frame", {.frames = {Unlit}, .stopCount = 1}, 1),
-        scenario("fault-stop.bad-metadata", {.frames = {WithoutMetadata}, .stopCount = 1}, 1),
-        scenario("fault-stop.time-out", {.frames = {Lit}, .stopCount = 9}, 1),
+        scenario("fault-stop.last-frame",
+                 {.frames = {Lit}, .stopCount = 1, .frameTriggers = {LastFrame}}),
+        scenario("fault-stop.unlit-frame",
+                 {.frames = {Unlit}, .stopCount = 1, .frameTriggers = {UnlitFrame}}),
+        scenario("fault-stop.bad-metadata",
+                 {.frames = {WithoutMetadata}, .stopCount = 1, .frameTriggers = {BadMetadata}}),
+        scenario("fault-stop.time-out", {.frames = {Lit}, .stopCount = 9, .frameTriggers = {}}),
         scenario("fault-stop.last-frame-and-bad-metadata",
-                 {.frames = {Lit, WithoutMetadata}, .stopCount = 1}, 1),
-        scenario("fault-stop.all", {.frames = {Lit, Unlit, WithoutMetadata, Lit}, .stopCount = 2},
-                 0),
-        scenario("fault-stop.frames-after",
-                 {.frames = {Lit, Lit, Lit}, .stopCount = 1, .hostKeeps = true}, 0),
-        scenario("fault-stop.bad-frame-inside-start",
-                 {.frames = {WithoutMetadata, Lit}, .stopCount = 2, .firstInsideStart = true}, 0),
-        scenario("fault-stop.stop-waits-for-handler",
-                 {.frames = {Lit, WithoutMetadata, Unlit}, .stopCount = 2, .stopWaits = true}, 0),
+                 {.frames = {Lit, WithoutMetadata},
+                  .stopCount = 1,
+                  .frameTriggers = {LastFrame, BadMetadata}}),
+        scenario("fault-stop.unlit-frame-and-bad-metadata",
+                 {.frames = {Lit, Unlit, WithoutMetadata, Lit},
+                  .stopCount = 2,
+                  .frameTriggers = {UnlitFrame, BadMetadata}}),
+        scenario("fault-stop.frames-after", {.frames = {Lit, Lit, Lit},
+                                             .stopCount = 1,
+                                             .frameTriggers = {LastFrame},
+                                             .hostKeeps = true}),
+        scenario("fault-stop.bad-frame-inside-start", {.frames = {WithoutMetadata, Lit},
+                                                       .stopCount = 2,
+                                                       .frameTriggers = {BadMetadata},
+                                                       .firstInsideStart = true}),
+        scenario("fault-stop.stop-waits-for-handler", {.frames = {Lit, WithoutMetadata, Unlit},
+                                                       .stopCount = 2,
+                                                       .frameTriggers = {BadMetadata},
+                                                       .stopWaits = true}),
     };
 }
 

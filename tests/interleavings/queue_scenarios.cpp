@@ -177,14 +177,14 @@ std::function<void()> startsFail() {
 std::vector<Scenario> queueScenarios() {
     return {
         {"queue.two-posters", [] { return twoPosters(false); }, 3},
-        {"queue.two-posters-held", [] { return twoPosters(true); }, 2},
+        {"queue.two-posters-held", [] { return twoPosters(true); }, 3},
         {"queue.item-while-thread-ends", itemWhileThreadEnds, 3},
         {"queue.owner-leaves-inside-item", ownerLeavesInsideItem, 3},
         {"queue.delayed-after-owner", delayedAfterOwner, 3},
         {"queue.hold-ends-inside-item", holdEndsInsideItem, 3},
-        {"queue.hold-and-owner-end", holdAndOwnerEnd, 2},
-        {"queue.items-come-fast", itemsComeFast, 1},
-        {"queue.starts-fail", startsFail, 2},
+        {"queue.hold-and-owner-end", holdAndOwnerEnd, 3},
+        {"queue.items-come-fast", itemsComeFast, 3},
+        {"queue.starts-fail", startsFail, 3},
     };
 }
 

@@ -67,31 +67,45 @@ std::function<void()> signalsMerge() {
     return [counter] { expect(counter->runs == 1 || counter->runs == 2, "runs without a signal"); };
 }
 
-// A source is added, signalled and removed by others while the loop waits.
+// Others signal a source and add it while the loop waits, and remove all sources once it has run.
 std::function<void()> sourceComesAndGoes() {
     const auto loop = RunLoop::forThisThread();
     const auto idle = std::make_shared<Counter>(-1);
     loop->addSource(idle->source, platform::kRunLoopDefaultMode);
-    platform::startThread(
-        [loop, idle] { loop->removeSource(idle->source, platform::kRunLoopDefaultMode); });
+    const auto runs = std::make_shared<int>(0);
+    platform::startThread([loop, idle, runs] {
+        const auto comes = std::make_shared<std::shared_ptr<RunLoopSource>>();
+        *comes = std::make_shared<RunLoopSource>([idle, runs, comes] {
+            ++*runs;
+            platform::startThread([loop = RunLoop::current(), idle, source = std::move(*comes)] {
+                loop->removeSource(source, platform::kRunLoopDefaultMode);
+                loop->removeSource(idle->source, platform::kRunLoopDefaultMode);
+            });
+        });
+        const auto source = *comes;
+        source->signal();
+        loop->addSource(source, platform::kRunLoopDefaultMode);
+    });
     const RunLoopOutcome outcome = loop->run(platform::kRunLoopDefaultMode, kNoLimit);
-    return [idle, outcome] {
+    return [idle, runs, outcome] {
         expect(outcome == RunLoopOutcome::Finished, "the run did not end with its last source");
+        expect(*runs == 1, "a source that came with a signal ran {} times", *runs);
         expect(idle->runs == 0, "a source ran without a signal");
     };
 }
 
-// A stop from another thread ends a run that waits; before the run it does nothing.
+// A stop from another thread ends a run, also one that waits. The first comes at any moment, also before the
+// run, where it does nothing; the other one, which the run's source starts, comes during the run or after it.
 std::function<void()> stopWakes() {
     const auto loop = RunLoop::forThisThread();
-    const auto idle = std::make_shared<Counter>(-1);
-    loop->addSource(idle->source, platform::kRunLoopDefaultMode);
-    platform::startThread([loop] { loop->stop(); });
-    const RunLoopOutcome outcome = loop->run(platform::kRunLoopDefaultMode, 1);
-    return [idle, outcome] {
-        expect(outcome == RunLoopOutcome::Stopped || outcome == RunLoopOutcome::TimedOut,
-               "the run ended on its own");
+    const auto startStop = [] {
+        platform::startThread([loop = RunLoop::current()] { loop->stop(); });
     };
+    const auto source = std::make_shared<RunLoopSource>(startStop);
+    source->signal();
+    loop->addSource(source, platform::kRunLoopDefaultMode);
+    startStop();
+    return expectStopped(loop->run(platform::kRunLoopDefaultMode, kNoLimit));
 }
 
 // The loop ends with its thread while another thread signals a source of it.
@@ -109,7 +123,7 @@ std::function<void()> loopEndsWhileSignalled() {
 std::vector<Scenario> runLoopScenarios() {
     return {
         {"run-loop.signal-wakes", signalWakes, 3},
-        {"run-loop.signals-merge", signalsMerge, 2},
+        {"run-loop.signals-merge", signalsMerge, 3},
         {"run-loop.source-comes-and-goes", sourceComesAndGoes, 3},
         {"run-loop.stop-wakes", stopWakes, 3},
         {"run-loop.loop-ends-while-signalled", loopEndsWhileSignalled, 3},

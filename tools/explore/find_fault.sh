@@ -11,6 +11,7 @@ fi
 echo "$found"
 order=$(sed -n 's/^replay: interleavings .* --replay //p' <<<"$found")
 name=$(sed -n 's/^replay: interleavings \(.*\) --replay .*/\1/p' <<<"$found")
+[[ $name == "$scenario" ]] || { echo "found by another scenario than $scenario"; exit 1; }
 failure=$(sed -n 's/^[^ ]*: FAILED[^:]*: //p' <<<"$found" | head -n 1)
 [[ -n $failure && $failure == *"$message"* ]] || { echo "another failure than \"$message\""; exit 1; }
 replayed=$("$program" "$name" --replay "$order") && { echo "the replay passed"; exit 1; }

@@ -4,13 +4,15 @@
 //   interleavings SCENARIO --replay ORDER        prints every step of that order
 //   interleavings --list
 //
-// For each scenario whose name has that beginning: every order with at most the scenario's number of preemptions
+// For the scenario of that name, else each whose name has that beginning: every order with at most the scenario's number of preemptions
 // and N more (0), though with at most N preemptions, or the first N of these orders; then one random order for each
-// of N seeds (2000). Ends with status 1 at the first order that fails, and prints the command that replays it.
+// of N seeds (2000). Ends with status 1 at the first order that fails, and prints the command that replays it; also
+// when no order reaches what the scenario's must.
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <limits>
+#include <map>
 #include <random>
 #include <string>
 
@@ -79,6 +81,21 @@ Execution replay(const Scenario& scenario, const std::vector<unsigned>& chosen) 
     std::_Exit(1);
 }
 
+// How many orders of a scenario reached what.
+using Reached = std::map<std::string_view, std::size_t>;
+
+void judge(const Scenario& scenario,
+           const Execution& execution,
+           std::string_view how,
+           Reached& reached) {
+    if (!execution.failure.empty()) {
+        report(scenario, execution, how);
+    }
+    for (const std::string_view what : execution.reached) {
+        ++reached[what];
+    }
+}
+
 // Moves on to the next order with at most `most` preemptions; false when there is none.
 bool advance(Order& order, unsigned most) {
     for (; !order.empty(); order.pop_back()) {
@@ -98,7 +115,10 @@ struct Explored {
 };
 
 // At most `most` orders: a scenario of many steps has more than a night's worth.
-Explored exploreAll(const Scenario& scenario, unsigned preemptions, std::size_t most) {
+Explored exploreAll(const Scenario& scenario,
+                    unsigned preemptions,
+                    std::size_t most,
+                    Reached& reached) {
     Order order;
     std::size_t orders = 0;
     do {
@@ -109,15 +129,13 @@ Explored exploreAll(const Scenario& scenario, unsigned preemptions, std::size_t 
             return place < order.size() ? order[place].chosen : 0;
         });
         ++orders;
-        if (!execution.failure.empty()) {
-            report(scenario, execution, "");
-        }
+        judge(scenario, execution, "", reached);
         order = std::move(execution.order);
     } while (advance(order, preemptions));
     return {orders, true};
 }
 
-void exploreSeed(const Scenario& scenario, unsigned seed) {
+void exploreSeed(const Scenario& scenario, unsigned seed, Reached& reached) {
     std::mt19937 random(seed);
     // Some orders switch at every other step, some nearly never.
     const unsigned oneIn = 2U << (random() % 5);
@@ -126,9 +144,7 @@ void exploreSeed(const Scenario& scenario, unsigned seed) {
         const unsigned most = random() % 8 == 0 ? from.all : from.rare;
         return goesOn ? 0U : static_cast<unsigned>(random() % most);
     });
-    if (!execution.failure.empty()) {
-        report(scenario, execution, fmt::format(" with seed {}", seed));
-    }
+    judge(scenario, execution, fmt::format(" with seed {}", seed), reached);
 }
 
 std::vector<Scenario> scenarios() {
@@ -201,8 +217,10 @@ int main(int argc, char** argv) {
 
     warmUp();
     bool found = false;
+    const bool isWhole = std::any_of(all.begin(), all.end(),
+                                     [&](const Scenario& each) { return each.name == name; });
     for (const Scenario& scenario : all) {
-        if (!scenario.name.starts_with(name)) {
+        if (isWhole ? scenario.name != name : !scenario.name.starts_with(name)) {
             continue;
         }
         found = true;
@@ -214,15 +232,24 @@ int main(int argc, char** argv) {
             std::_Exit(execution.failure.empty() ? 0 : 1);
         }
         const unsigned preemptions = std::min(scenario.preemptions + more, most);
-        const Explored explored = exploreAll(scenario, preemptions, orders);
+        Reached reached;
+        const Explored explored = exploreAll(scenario, preemptions, orders, reached);
         for (unsigned seed = firstSeed; seed - firstSeed < seeds; ++seed) {
-            exploreSeed(scenario, seed);
+            exploreSeed(scenario, seed, reached);
         }
-        fmt::print("{}: {} orders with at most {} preemptions, {} random orders: passed\n",
-                   scenario.name,
-                   explored.isAll ? fmt::format("all {}", explored.orders)
-                                  : fmt::format("the first {}", explored.orders),
-                   preemptions, seeds);
+        std::string counts;
+        for (const std::string_view what : scenario.reaches) {
+            if (reached[what] == 0) {
+                fmt::print("{}: FAILED: no order reached: {}\n", scenario.name, what);
+                return 1;
+            }
+            counts += fmt::format("; {}: {}", what, reached[what]);
+        }
+        fmt::print(
+            "{}: {} with at most {} preemptions, {} random orders{}: passed\n", scenario.name,
+            explored.isAll ? fmt::format("all {} orders", explored.orders)
+                           : fmt::format("CUT: the first {} orders, not all,", explored.orders),
+            preemptions, seeds, counts);
         std::fflush(stdout);
     }
     if (!found) {

@@ -14,7 +14,8 @@ using Body = std::function<std::function<void()>()>;
 struct Scenario {
     std::string_view name;
     Body body;
-    unsigned preemptions;  // of the orders that the short form explores
+    unsigned preemptions;                        // of the orders that the short form explores
+    std::vector<std::string_view> reaches = {};  // what some of its orders must reach()
 };
 
 // The scenarios of each file.

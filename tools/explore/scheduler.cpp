@@ -105,6 +105,7 @@ struct World {
     unsigned startsThatMayFail = 0;
     bool traces = false;
     bool leavesOutApart = false;
+    bool stoodStill = false;
     TimePoint now = kBegin;
 };
 
@@ -192,6 +193,7 @@ Fiber* next(Stance stance) {
     const unsigned rare = add(
         [](const Fiber& fiber) { return !isReady(fiber) && fiber.deadline != TimePoint::max(); });
     if (ready == 0) {  // everything waits: time passes
+        world.stoodStill = true;
         const auto earliest = std::min_element(
             options.begin(), options.end(),
             [](const Fiber* a, const Fiber* b) { return a->deadline < b->deadline; });
@@ -400,6 +402,14 @@ unsigned thisThread() {
     return world.running->number;
 }
 
+bool stoodStill() {
+    return world.stoodStill;
+}
+
+void reach(std::string_view what) {
+    world.execution.reached.push_back(what);
+}
+
 void fail(std::string text) {
     if (world.execution.failure.empty()) {
         world.execution.failure = std::move(text);
@@ -424,6 +434,7 @@ Execution execute(const std::function<void()>& body,
     world.startsThatMayFail = 0;
     world.traces = traces;
     world.leavesOutApart = false;
+    world.stoodStill = false;
     world.now = kBegin;
     objectsMade = 0;
 

@@ -60,6 +60,10 @@ void yield();
 void letStartsFail(unsigned number);
 // The running thread's number; the scenario's own is 0.
 unsigned thisThread();
+// Whether time has passed in this execution because every thread waited.
+bool stoodStill();
+// The execution shows `what`, which must outlive it.
+void reach(std::string_view what);
 
 // A step at no object, with its text for the trace.
 template <class... Args>
@@ -83,6 +87,7 @@ struct Execution {
     Order order;          // as chosen
     std::string failure;  // empty: none
     std::string trace;    // one line per step, when asked for
+    std::vector<std::string_view> reached;
 };
 
 // Runs `body` as thread 0 and everything that it starts, to the end; then `after`, when nothing runs any more.

@@ -4,10 +4,10 @@
 //   interleavings SCENARIO --replay ORDER        prints every step of that order
 //   interleavings --list
 //
-// For the scenario of that name, else each whose name has that beginning: every order with at most the scenario's number of preemptions
-// and N more (0), though with at most N preemptions, or the first N of these orders; then one random order for each
-// of N seeds (2000). Ends with status 1 at the first order that fails, and prints the command that replays it; also
-// when no order reaches what the scenario's must.
+// For the scenario of that name, else each whose name has that beginning: every order with at most the scenario's
+// number of preemptions and N more (0), though with at most N preemptions, or the first N of these orders; then one
+// random order for each of N seeds (2000). Ends with status 1 at the first order that fails, and prints the command
+// that replays it; also when no order reaches what the scenario's must.
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>

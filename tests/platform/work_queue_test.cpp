@@ -56,14 +56,14 @@ TEST(WorkQueue, RunsTheItemsOfManyThreadsOneAtATimeInOrder) {
 }
 
 TEST(WorkQueue, WaitsForAnItemWithoutWork) {
-    constexpr std::chrono::milliseconds kWait{150};
+    constexpr std::chrono::milliseconds kWait{100};
     std::latch done(1);
     double before = 0;
     double used = 0;
     WorkQueue queue("idle", Priority::UserInteractive);
-    const WorkQueue::Hold hold(queue);  // one thread runs both
-    queue.async([&] { before = threadSeconds(); });
-    queue.after(kWait, [&] {
+    const WorkQueue::Hold hold(queue);                          // one thread runs both
+    queue.after(kWait / 2, [&] { before = threadSeconds(); });  // it has waited once
+    queue.after(kWait / 2 + kWait, [&] {
         used = threadSeconds() - before;
         done.count_down();
     });

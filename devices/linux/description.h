@@ -79,9 +79,12 @@ struct UsbIdentity {
     std::optional<std::uint16_t> product = {};
     std::string serial = {};
 
-    bool matches(std::uint16_t isVendor, std::uint16_t isProduct, std::string_view isSerial) const {
-        return vendor.value_or(isVendor) == isVendor && product.value_or(isProduct) == isProduct &&
-               (serial.empty() || serial == isSerial);
+    bool matches(std::uint16_t itsVendor,
+                 std::uint16_t itsProduct,
+                 std::string_view itsSerial) const {
+        return vendor.value_or(itsVendor) == itsVendor &&
+               product.value_or(itsProduct) == itsProduct &&
+               (serial.empty() || serial == itsSerial);
     }
 };
 

@@ -324,7 +324,7 @@ INSTANTIATE_TEST_SUITE_P(Runs,
                          ::testing::ValuesIn(allRuns()),
                          [](const auto& info) { return std::string(info.param.name); });
 
-// On a good road a teardown allocates nothing. Here there is no device to invalidate.
+// A teardown that succeeds allocates nothing. This one fails: there is no device to invalidate.
 TEST(FailingTeardown, ThrowsWhenAnAllocationOfItsErrorFails) {
     ZRVantorFaultExperiment experiment;
     long failing = 0;

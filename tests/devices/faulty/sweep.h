@@ -23,8 +23,8 @@ namespace test {
 // The frames and images that a run asks for. The device goes on sending until it is stopped.
 inline constexpr std::uint64_t kAskedFor = 3;
 
-// A small device: three cameras, the last one with a projector and an event before its first frame; two event
-// counters and another one; a sensor between two other HID devices; a display. It is as fast as its client.
+// A small device, as fast as its client: three cameras, a sensor between two other HID devices, a display, two event
+// counters and one of another subgroup. The last camera has a projector and sends an event before its first frame.
 platform::Services makeSmallDevice();
 
 // An experiment as the host knows it.
